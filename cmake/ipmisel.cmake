@@ -1,0 +1,35 @@
+# What every target of the project is built with. Flags belong to targets: ipmisel_flags carries them.
+find_program(IPMISEL_CCACHE ccache)
+if(IPMISEL_CCACHE AND NOT CMAKE_CXX_COMPILER_LAUNCHER)
+  set(CMAKE_CXX_COMPILER_LAUNCHER ${IPMISEL_CCACHE})
+endif()
+
+add_library(ipmisel_flags INTERFACE)
+target_include_directories(ipmisel_flags INTERFACE ${PROJECT_SOURCE_DIR} ${PROJECT_SOURCE_DIR}/include)
+target_compile_options(ipmisel_flags INTERFACE -Wall -Wextra -Wpedantic -Wshadow -Wformat=2 -Werror)
+if(IPMISEL_M32)
+  target_compile_options(ipmisel_flags INTERFACE -m32)
+  target_link_options(ipmisel_flags INTERFACE -m32)
+endif()
+if(IPMISEL_SANITIZE)
+  target_compile_options(ipmisel_flags INTERFACE -fsanitize=address,undefined
+                         -fno-sanitize-recover=all -fno-omit-frame-pointer)
+  target_link_options(ipmisel_flags INTERFACE -fsanitize=address,undefined)
+endif()
+
+# ipmisel_plugin_part(NAME sources... ): a static part of the plug-in. Nothing of it is exported.
+function(ipmisel_plugin_part name)
+  add_library(${name} STATIC ${ARGN})
+  target_link_libraries(${name} PUBLIC ipmisel_flags)
+  set_target_properties(${name} PROPERTIES CXX_VISIBILITY_PRESET hidden
+                        VISIBILITY_INLINES_HIDDEN ON)
+endfunction()
+
+# ipmisel_test(NAME SOURCES ... LIBRARIES ...): one GoogleTest program, one ctest entry a case.
+function(ipmisel_test name)
+  cmake_parse_arguments(ARG "" "" "SOURCES;LIBRARIES" ${ARGN})
+  add_executable(${name} ${ARG_SOURCES})
+  target_link_libraries(${name} PRIVATE ipmisel_flags ${ARG_LIBRARIES} ipmisel_gtest)
+  set_target_properties(${name} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/tests)
+  add_test(NAME ${name} COMMAND ${name})
+endfunction()

@@ -1,0 +1,51 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <variant>
+#include <vector>
+
+namespace tqrhost {
+
+/// An object path: class name and string keys.
+struct ObjectPath {
+    std::string className;
+    std::vector<std::pair<std::string, std::string>> keys;
+};
+
+using PropertyValue = std::variant<std::string, std::vector<std::uint8_t>, ObjectPath>;
+
+/// Where the instances of a collection go, piece by piece, so that the host holds no more than the
+/// open instance. An instance counts from CloseInstance on; one that is opened while another is
+/// still open replaces it. False refuses the piece; the plug-in is told kStatusFailed.
+class InstanceSink {
+public:
+    virtual ~InstanceSink() = default;
+    virtual bool OpenInstance(std::string_view className) = 0;
+    virtual bool AddProperty(std::string_view name, const PropertyValue& value) = 0;
+    virtual bool CloseInstance() = 0;
+};
+
+struct Instance {
+    std::string className;
+    std::vector<std::pair<std::string, PropertyValue>> properties;  ///< in the order written
+};
+
+/// A sink that gathers one instance and hands it over whole.
+class WholeInstanceSink : public InstanceSink {
+public:
+    bool OpenInstance(std::string_view className) override;
+    bool AddProperty(std::string_view name, const PropertyValue& value) override;
+    bool CloseInstance() override;
+
+protected:
+    /// False when the instance could not be taken.
+    virtual bool Take(const Instance& instance) = 0;
+
+private:
+    Instance open_;
+};
+
+}  // namespace tqrhost

@@ -1,0 +1,130 @@
+#pragma once
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "host/core/host.h"
+#include "host/spdriver/transport.h"
+#include "simulator/simulated_bmc.h"
+#include "tqr/splibrary.h"
+
+namespace ipmiseltest {
+
+/// Everything that is logged while it lives.
+class LogRecorder {
+public:
+    LogRecorder()
+        : identity_(tqrhost::AddLogConsumer(
+              NQORTQR20::ILogger::kTrace,
+              [this](NQORTQR20::ILogger::ETQRLogSeverity severity, std::string_view text) {
+                  lines_.emplace_back(severity, text);
+              })) {}
+    ~LogRecorder() { tqrhost::RemoveLogConsumer(identity_); }
+    LogRecorder(const LogRecorder&) = delete;
+    LogRecorder& operator=(const LogRecorder&) = delete;
+
+    /// The lines of one severity, in order.
+    std::vector<std::string> Lines(int severity) const {
+        std::vector<std::string> found;
+        for (const auto& [lineSeverity, text] : lines_) {
+            if (lineSeverity == severity) found.push_back(text);
+        }
+        return found;
+    }
+    const std::vector<std::pair<int, std::string>>& All() const { return lines_; }
+    void Clear() { lines_.clear(); }
+
+private:
+    std::vector<std::pair<int, std::string>> lines_;
+    int identity_;
+};
+
+/// A simulated BMC as the host's transport, which also keeps the request frames.
+class SimulatedTransport : public tqrhost::Transport {
+public:
+    SimulatedTransport(ipmisim::BmcDescription description,
+                       std::vector<std::vector<std::uint8_t>>* requests)
+        : bmc_(std::move(description)), requests_(requests) {}
+    std::optional<tqrhost::Response> Exchange(const tqrhost::RequestFrame& request) override {
+        requests_->emplace_back(request.bytes().begin(), request.bytes().end());
+        return bmc_.Execute(request.netFn(), request.lun(), request.command(), request.data());
+    }
+
+private:
+    ipmisim::SimulatedBmc bmc_;
+    std::vector<std::vector<std::uint8_t>>* requests_;
+};
+
+/// A case over one simulated BMC: describe it in `bmc`, then take Library().
+class BmcTest : public ::testing::Test {
+protected:
+    ipmisim::BmcDescription bmc;
+    LogRecorder log;
+    /// Request frames in the order in which they came, at least 15 bytes each.
+    std::vector<std::vector<std::uint8_t>> requests;
+
+    NQORTQR20::SPLibrary* Library() {
+        if (!library_) {
+            library_ = std::make_unique<NQORTQR20::SPLibrary>(
+                std::make_unique<SimulatedTransport>(bmc, &requests));
+        }
+        return library_.get();
+    }
+    /// The call-th use (0 for every use) of a Storage command answers a completion code.
+    void FailWith(std::uint8_t command, unsigned call, std::uint8_t completionCode) {
+        ipmisim::Fault fault;
+        fault.netFn = 0x0A;
+        fault.command = command;
+        if (call != 0) fault.call = call;
+        fault.kind = ipmisim::Fault::Kind::kCompletionCode;
+        fault.completionCode = completionCode;
+        bmc.faults.push_back(fault);
+    }
+    /// The call-th use (0 for every use) of a Storage command gets no response.
+    void Silence(std::uint8_t command, unsigned call) {
+        ipmisim::Fault fault;
+        fault.netFn = 0x0A;
+        fault.command = command;
+        if (call != 0) fault.call = call;
+        bmc.faults.push_back(fault);
+    }
+
+private:
+    std::unique_ptr<NQORTQR20::SPLibrary> library_;
+};
+
+/// The instances of a collection, in memory.
+class InstanceRecorder : public tqrhost::WholeInstanceSink {
+public:
+    std::vector<tqrhost::Instance> instances;
+    /// A property that the host refuses, as a full disk would: every time it is written.
+    std::string refusedProperty;
+
+    bool AddProperty(std::string_view name, const tqrhost::PropertyValue& value) override {
+        if (!refusedProperty.empty() && name == refusedProperty) return false;
+        return WholeInstanceSink::AddProperty(name, value);
+    }
+
+protected:
+    bool Take(const tqrhost::Instance& instance) override {
+        instances.push_back(instance);
+        return true;
+    }
+};
+
+/// The text of a property; empty optional when the instance has none of that name.
+inline std::optional<std::string> TextOf(const tqrhost::Instance& instance,
+                                         std::string_view name) {
+    for (const auto& [propertyName, value] : instance.properties) {
+        if (propertyName == name) return std::get<std::string>(value);
+    }
+    return std::nullopt;
+}
+
+}  // namespace ipmiseltest
