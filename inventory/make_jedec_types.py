@@ -1,0 +1,32 @@
+#!/usr/bin/env python3
+"""Writes jedec_types.cpp from jep106.csv, the names of JEDEC standard JEP106, banks 1 to 7.
+
+usage: inventory/make_jedec_types.py  (from anywhere; both files stand beside this script)
+"""
+import csv
+import pathlib
+
+HERE = pathlib.Path(__file__).resolve().parent
+BANKS, CODES = 7, 126
+
+names = {}
+with open(HERE / "jep106.csv", newline="", encoding="utf-8") as table:
+    for row in csv.DictReader(table):
+        names[int(row["bank"]), int(row["code"])] = row["name"]
+wanted = {(bank, code) for bank in range(BANKS) for code in range(1, CODES + 1)}
+if set(names) != wanted:
+    raise SystemExit(f"jep106.csv: expected every code 1 to {CODES} of {BANKS} banks, once each")
+
+lines = [
+    "// Made by make_jedec_types.py from jep106.csv; edit those.",
+    '#include "inventory/jedec_types.h"',
+    "",
+    "const char* const JEDEC_Types[kJedecBanks * kJedecCodes] = {",
+]
+for bank in range(BANKS):
+    lines.append(f"    // bank {bank + 1}")
+    for code in range(1, CODES + 1):
+        name = names[bank, code].replace("\\", "\\\\").replace('"', '\\"')
+        lines.append(f'    "{name}",' if name else "    nullptr,")
+lines.append("};")
+(HERE / "jedec_types.cpp").write_text("\n".join(lines) + "\n", encoding="utf-8")

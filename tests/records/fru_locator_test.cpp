@@ -1,0 +1,75 @@
+#include "records/fru_locator.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+namespace {
+
+using ::testing::ElementsAre;
+
+std::vector<std::string> StringsOf(const IPMIFRULocator& locator) {
+    std::vector<std::string> strings{"left over"};
+    locator.GetFRUDataString(strings);
+    return strings;
+}
+
+void Put(IPMIFRULocator* locator, int offset, const std::string& bytes) {
+    locator->SetFRUData(offset, reinterpret_cast<const unsigned char*>(bytes.data()),
+                        static_cast<unsigned>(bytes.size()));
+}
+
+TEST(FruLocator, MarkerSelectsTheFixedLayout) {
+    IPMIFRULocator locator;
+    Put(&locator, 10, std::string("\x01%\x00", 3));
+    Put(&locator, 17, "Board serial");
+    Put(&locator, 48, "Maker*cut at the star");
+    Put(&locator, 81, std::string(40, 'N'));
+    Put(&locator, 112, "S1");
+    Put(&locator, 144, "Product");
+    EXPECT_THAT(StringsOf(locator), ElementsAre("No chassis part number", "Product", "Board serial",
+                                                "Maker", std::string(30, 'N'), "S1"));
+}
+
+TEST(FruLocator, FixedLayoutAtTheEndOfTheDataStaysInside) {
+    IPMIFRULocator locator;
+    Put(&locator, 309, std::string("\x01%\x00", 3));
+    EXPECT_THAT(StringsOf(locator), ElementsAre("No chassis part number", "", "", "", "", ""));
+}
+
+TEST(FruLocator, WithoutTheMarkerPlausibleRunsAreKept) {
+    const struct {
+        std::string bytes;
+        std::vector<std::string> strings;
+    } cases[] = {
+        {std::string("ABC\0X\0(12)\0", 11), {"ABC", "(12)"}},
+        {"A]B[", {}},
+        {"FOO(", {"FOO("}},
+        {"FOO)", {}},
+        {"[1]#Q-7/B", {"[1]", "Q-7/B"}},
+    };
+    for (const auto& c : cases) {
+        IPMIFRULocator locator;
+        Put(&locator, 3, c.bytes);
+        EXPECT_EQ(StringsOf(locator), c.strings) << c.bytes;
+    }
+}
+
+TEST(FruLocator, RunAtTheEndIsKeptWithoutBracketTests) {
+    IPMIFRULocator locator;
+    Put(&locator, 308, "A)]B");
+    EXPECT_THAT(StringsOf(locator), ElementsAre("A)]B"));
+}
+
+TEST(FruLocator, DataOutsideTheBufferIsLeftOut) {
+    IPMIFRULocator locator;
+    const std::vector<unsigned char> bytes(400, 'A');
+    locator.SetFRUData(310, bytes.data(), 400);
+    locator.SetFRUData(312, bytes.data(), 1);
+    locator.SetFRUData(-1, bytes.data(), 1);
+    EXPECT_THAT(StringsOf(locator), ElementsAre("AA"));
+}
+
+}  // namespace
