@@ -5,6 +5,8 @@
 #include <map>
 #include <optional>
 #include <span>
+#include <unordered_map>
+#include <utility>
 #include <vector>
 
 namespace ipmisim {
@@ -54,10 +56,29 @@ public:
                                  std::span<const std::uint8_t> data);
 
 private:
-    // filled by simulator/simulated_bmc.cpp's owner
+    struct Command;
+    static const Command kCommands[];
+
+    Bytes Normal(std::uint8_t netFn, std::uint8_t command, std::span<const std::uint8_t> data);
+    std::optional<Bytes> GetDeviceId(std::span<const std::uint8_t> data);
+    std::optional<Bytes> GetFruInventoryAreaInfo(std::span<const std::uint8_t> data);
+    std::optional<Bytes> ReadFruData(std::span<const std::uint8_t> data);
+    std::optional<Bytes> GetSdrRepositoryInfo(std::span<const std::uint8_t> data);
+    std::optional<Bytes> ReserveSdrRepository(std::span<const std::uint8_t> data);
+    std::optional<Bytes> GetSdr(std::span<const std::uint8_t> data);
+    std::optional<Bytes> GetSelInfo(std::span<const std::uint8_t> data);
+    std::optional<Bytes> GetSelEntry(std::span<const std::uint8_t> data);
+    std::optional<Bytes> GetSelTime(std::span<const std::uint8_t> data);
+    std::optional<Bytes> GetAuxLogStatus(std::span<const std::uint8_t> data);
+
+    /// Where a record stands, by its ID; of several with one ID the first.
+    using RecordIndex = std::unordered_map<std::uint16_t, std::size_t>;
+
     BmcDescription description_;
+    RecordIndex selIndex_;
+    RecordIndex sdrIndex_;
     std::map<std::pair<std::uint8_t, std::uint8_t>, unsigned> calls_;
-    std::uint16_t sdrReservation_ = 0;
+    std::uint16_t sdrReservation_ = 0;  ///< 0 before the first
 };
 
 }  // namespace ipmisim

@@ -1,0 +1,109 @@
+#include "host/spdriver/loop_guard.h"
+
+#include <utility>
+
+#include "base/bytes.h"
+#include "base/log.h"
+#include "base/text.h"
+#include "host/spdriver/commands.h"
+
+namespace tqrhost {
+namespace {
+
+constexpr std::uint16_t kFirstRecord = 0x0000;
+constexpr std::uint16_t kNoNextRecord = 0xFFFF;
+
+/// What of a Get SEL Entry or Get SDR answer concerns a walk: completion code, next record ID, then
+/// the record, which begins with its own ID.
+struct RecordAnswer {
+    std::uint8_t completionCode;
+    std::uint16_t next;
+    std::optional<std::uint16_t> own;  ///< of a read at offset 0 only
+
+    RecordAnswer(const Response& response, std::uint8_t offset) {
+        ipmisel::ByteReader in(response);
+        completionCode = in.U8();
+        next = in.U16();
+        const std::uint16_t id = in.U16();
+        if (offset == 0 && in.ok()) own = id;
+    }
+};
+
+}  // namespace
+
+void LoopGuard::Walk::Restart() {
+    given_.clear();
+    ended = false;
+}
+
+bool LoopGuard::Walk::WasGiven(std::uint16_t record, std::uint8_t offset) const {
+    const auto atOffset = given_.find(offset);
+    return atOffset != given_.end() && atOffset->second[record];
+}
+
+void LoopGuard::Walk::Given(std::uint16_t record, std::uint8_t offset) {
+    auto& records = given_[offset];
+    if (records.empty()) records.resize(0x10000);
+    records[record] = true;
+}
+
+LoopGuard::LoopGuard(std::unique_ptr<Transport> transport) : transport_(std::move(transport)) {}
+
+std::optional<Response> LoopGuard::Exchange(const RequestFrame& request) {
+    if (request.netFn() == kNetFnStorage) {
+        switch (request.command()) {
+            case kGetSelInfo:
+                eventLog_.Restart();
+                break;
+            case kGetSdrRepositoryInfo:
+            case kReserveSdrRepository:
+                sensorRepository_.Restart();
+                break;
+            case kGetSelEntry:
+                return Read(&eventLog_, true, request);
+            case kGetSdr:
+                return Read(&sensorRepository_, false, request);
+            default:
+                break;
+        }
+    }
+    return transport_->Exchange(request);
+}
+
+std::optional<Response> LoopGuard::Read(Walk* walk, bool isEventLog, const RequestFrame& request) {
+    // Reservation ID, record ID, offset, count.
+    ipmisel::ByteReader in(request.data());
+    in.U16();
+    const std::uint16_t record = in.U16();
+    const std::uint8_t offset = in.U8();
+    if (!in.ok()) return transport_->Exchange(request);
+
+    if (walk->ended && record == kFirstRecord && offset == 0) walk->Restart();
+    if (walk->WasGiven(record, offset)) {
+        ipmisel::WriteLog(ipmisel::kNotice,
+                          ipmisel::Format("The BMC leads the walk over its %s in a circle: "
+                                          "record 0x%04x was read before.",
+                                          isEventLog ? "event log" : "sensor repository", record));
+        walk->Restart();
+        return std::nullopt;
+    }
+    auto response = transport_->Exchange(request);
+    if (!response) {
+        walk->Restart();
+        return response;
+    }
+    const RecordAnswer answer(*response, offset);
+    if (answer.completionCode != 0) {
+        walk->Restart();
+        return response;
+    }
+    walk->Given(record, offset);
+    // The first record is asked for by 0x0000 and comes back in a circle under its own ID.
+    if (record == kFirstRecord && answer.own) walk->Given(*answer.own, offset);
+    // Every walk over the event log ends at a next record ID of 0xFFxx; over the repository only
+    // 0xFFFF ends them all, and the rest of the last record may still be read after it.
+    if (isEventLog ? answer.next >> 8 == 0xFF : answer.next == kNoNextRecord) walk->ended = true;
+    return response;
+}
+
+}  // namespace tqrhost
