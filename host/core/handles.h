@@ -1,0 +1,25 @@
+#pragma once
+
+#include <string>
+#include <utility>
+
+#include "host/core/live.h"
+#include "host/core/sink.h"
+#include "tqr/plugin.h"
+
+// What stands behind the handles that a plug-in holds.
+
+namespace NQORTQR20 {
+
+struct TCPluginCallbacks : tqrhost::Live<TCPluginCallbacks> {
+    explicit TCPluginCallbacks(std::string pathOfPlugin) : path(std::move(pathOfPlugin)) {}
+    std::string path;
+};
+
+struct fdriIOHandle : tqrhost::Live<fdriIOHandle> {
+    explicit fdriIOHandle(tqrhost::InstanceSink& instanceSink) : sink(instanceSink) {}
+    tqrhost::InstanceSink& sink;
+    bool open = false;  ///< an instance is
+};
+
+}  // namespace NQORTQR20

@@ -1,0 +1,147 @@
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "host/core/handles.h"
+#include "host/core/host.h"
+#include "host/core/live.h"
+#include "tqr/plugin.h"
+
+namespace NQORTQR20 {
+
+// Values under construction belong to the plug-in until it deletes them; one that it forgets is
+// leaked and not collected at the end, so that a leak checker shows it.
+struct TCIMReference : tqrhost::Live<TCIMReference> {
+    tqrhost::ObjectPath path;
+};
+
+struct TCIMValueArray : tqrhost::Live<TCIMValueArray> {
+    std::vector<std::uint8_t> values;
+};
+
+namespace {
+
+template <typename T>
+bool IsLive(const T* handle) {
+    return tqrhost::Live<T>::Is(handle);
+}
+
+/// Does the work of an operation; whatever goes wrong inside stays inside.
+template <typename Work>
+TTQRStatusCode Guarded(Work work) {
+    try {
+        return {work() ? kStatusOk : kStatusFailed};
+    } catch (...) {
+        return {kStatusFailed};
+    }
+}
+
+bool TakesProperty(const fdriIOHandle* output, const char* name) {
+    return IsLive(output) && output->open && name != nullptr;
+}
+
+}  // namespace
+
+TTQRStatusCode fdrGetInstance(fdriIOHandle* output, const char* className) {
+    return Guarded([&] {
+        if (!IsLive(output) || className == nullptr) return false;
+        output->open = false;
+        output->open = output->sink.OpenInstance(className);
+        return output->open;
+    });
+}
+
+TTQRStatusCode fdrAddProperty(fdriIOHandle* output, const char* name, const char* value) {
+    return Guarded([&] {
+        return TakesProperty(output, name) && value != nullptr &&
+               output->sink.AddProperty(name, std::string(value));
+    });
+}
+
+TTQRStatusCode fdrAddInstance(fdriIOHandle* output) {
+    return Guarded([&] {
+        if (!IsLive(output) || !output->open) return false;
+        output->open = false;
+        return output->sink.CloseInstance();
+    });
+}
+
+TTQRStatusCode fdrNewCIMValueArray(TCIMValueArray** array) {
+    return Guarded([&] {
+        if (array == nullptr) return false;
+        *array = nullptr;
+        *array = new TCIMValueArray;
+        return true;
+    });
+}
+
+TTQRStatusCode fdrArrayAddUint8(TCIMValueArray* array, unsigned char value) {
+    return Guarded([&] {
+        if (!IsLive(array)) return false;
+        array->values.push_back(value);
+        return true;
+    });
+}
+
+TTQRStatusCode fdrAddArrayProperty(fdriIOHandle* output, const char* name, TCIMValueArray* array) {
+    return Guarded([&] {
+        return TakesProperty(output, name) && IsLive(array) &&
+               output->sink.AddProperty(name, array->values);
+    });
+}
+
+TTQRStatusCode fdrDeleteCIMValueArray(TCIMValueArray* array) {
+    if (!IsLive(array)) return {kStatusFailed};
+    delete array;
+    return {kStatusOk};
+}
+
+TTQRStatusCode fdrNewCIMReference(TCIMReference** reference, fdriIOHandle* output) {
+    return Guarded([&] {
+        if (reference == nullptr) return false;
+        *reference = nullptr;
+        if (!IsLive(output)) return false;
+        *reference = new TCIMReference;
+        return true;
+    });
+}
+
+TTQRStatusCode fdrSetReferenceClassName(TCIMReference* reference, const char* className) {
+    return Guarded([&] {
+        if (!IsLive(reference) || className == nullptr) return false;
+        reference->path.className = className;
+        return true;
+    });
+}
+
+TTQRStatusCode fdrReferenceAddString(TCIMReference* reference, const char* key, const char* value) {
+    return Guarded([&] {
+        if (!IsLive(reference) || key == nullptr || value == nullptr) return false;
+        reference->path.keys.emplace_back(key, value);
+        return true;
+    });
+}
+
+TTQRStatusCode fdrAddReferenceProperty(fdriIOHandle* output, const char* name,
+                                       TCIMReference* reference) {
+    return Guarded([&] {
+        return TakesProperty(output, name) && IsLive(reference) &&
+               output->sink.AddProperty(name, reference->path);
+    });
+}
+
+TTQRStatusCode fdrDeleteCIMReference(TCIMReference* reference) {
+    if (!IsLive(reference)) return {kStatusFailed};
+    delete reference;
+    return {kStatusOk};
+}
+
+}  // namespace NQORTQR20
+
+namespace tqrhost {
+
+OutputHandle::OutputHandle(InstanceSink& sink)
+    : handle_(std::make_unique<NQORTQR20::fdriIOHandle>(sink)) {}
+OutputHandle::~OutputHandle() = default;
+
+}  // namespace tqrhost
