@@ -10,6 +10,7 @@
 #include "host/core/host.h"
 #include "host/core/live.h"
 #include "host/core/provider.h"
+#include "tqr/log.h"
 #include "tqr/plugin.h"
 
 namespace {
@@ -48,6 +49,21 @@ std::map<void*, fdrPluginCallbacks>& Residents() {
 
 std::string PathOfPlugin(const std::filesystem::path& folder) {
     return (folder / "ipmisel").string();
+}
+
+/// Calls into the plug-in; an exception that it lets out becomes its result.
+template <typename Call, typename Result>
+Result Contained(Call call, Result failed) {
+    std::string what = "an unknown exception";
+    try {
+        return call();
+    } catch (const std::exception& exception) {
+        what = exception.what();
+    } catch (...) {
+    }
+    NQORTQR20::fdrWriteLog(NQORTQR20::ILogger::kError,
+                           ("Plug-in ended by an exception: " + what).c_str());
+    return failed;
 }
 
 std::string LoaderMessage() {
@@ -143,9 +159,8 @@ Plugin::Plugin(const std::filesystem::path& file) : impl_(std::make_unique<Impl>
     }
     if (registration.done) {
         impl_->callbacks = registration.callbacks;
-    } else if (const auto resident = Residents().find(impl_->library.get());
-               resident != Residents().end()) {
-        impl_->callbacks = resident->second;
+    } else if (const auto resident = Residents().extract(impl_->library.get())) {
+        impl_->callbacks = resident.mapped();
     } else {
         fail("it does not register itself with this host; name a plug-in with --plugin");
     }
@@ -170,8 +185,12 @@ TTQRStatusCode Plugin::Collect(const std::vector<std::string>& classNames, Insta
     std::vector<const char*> names;
     names.reserve(classNames.size());
     for (const std::string& name : classNames) names.push_back(name.c_str());
-    return impl_->callbacks->getData(impl_->context.get(), output.get(), names.data(),
-                                     static_cast<int>(names.size()));
+    return Contained(
+        [&] {
+            return impl_->callbacks->getData(impl_->context.get(), output.get(), names.data(),
+                                             static_cast<int>(names.size()));
+        },
+        TTQRStatusCode{kStatusFailed});
 }
 
 void* Plugin::Symbol(const char* name) const { return dlsym(impl_->library.get(), name); }
@@ -181,7 +200,8 @@ std::optional<int> Plugin::RunExporter(const char* name, InstanceSink& sink) {
     const auto exporter = reinterpret_cast<Exporter>(Symbol(name));
     if (exporter == nullptr) return std::nullopt;
     OutputHandle output(sink);
-    return exporter(impl_->context.get(), output.get());
+    return Contained([&] { return exporter(impl_->context.get(), output.get()); },
+                     int{kStatusFailed});
 }
 
 PluginContext::PluginContext(const std::filesystem::path& pluginFolder)

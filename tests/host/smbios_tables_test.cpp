@@ -1,0 +1,156 @@
+#include "host/smbios/smbios_tables.h"
+
+#include <gtest/gtest.h>
+
+#include <fstream>
+
+namespace {
+
+using namespace tqrhost;
+using Bytes = std::vector<std::uint8_t>;
+
+const Bytes kSystem{1,   8,   0x10, 0,   1, 2,   9,   0,  // maker 1, product 2, version 9
+                    'A', 'c', 'm',  'e', 0, 'S', '1', ' ', ' ', 0, 0};
+const Bytes kBare{32, 5, 0x11, 0, 7, 0, 0};
+const Bytes kEnd{127, 4, 0x12, 0, 0, 0};
+
+Bytes Join(std::initializer_list<Bytes> parts) {
+    Bytes all;
+    for (const Bytes& part : parts) all.insert(all.end(), part.begin(), part.end());
+    return all;
+}
+
+/// Makes `bytes` add up to 0 by the byte at `at`.
+void SetChecksum(std::span<std::uint8_t> bytes, std::size_t at) {
+    bytes[at] = 0;
+    unsigned sum = 0;
+    for (const std::uint8_t byte : bytes) sum += byte;
+    bytes[at] = static_cast<std::uint8_t>(0x100 - sum % 0x100);
+}
+
+Bytes EntryPoint2(std::uint16_t length, std::uint8_t count) {
+    Bytes bytes{'_', 'S', 'M', '_', 0, 0x1F, 2, 8, 0, 1, 0, 0, 0, 0, 0, 0, '_', 'D', 'M', 'I', '_'};
+    const auto low = static_cast<std::uint8_t>(length);
+    const auto high = static_cast<std::uint8_t>(length >> 8);
+    for (const int byte : {0, int{low}, int{high}, 0, 0, 0x0F, 0, int{count}, 0, 0x28}) {
+        bytes.push_back(static_cast<std::uint8_t>(byte));
+    }
+    SetChecksum(std::span(bytes).subspan(0x10), 5);
+    SetChecksum(bytes, 4);
+    return bytes;
+}
+
+Bytes EntryPoint3(std::uint8_t length) {
+    Bytes bytes{'_', 'S', 'M', '3', '_', 0, 0x18, 3, 5, 0, 1, 0, length, 0, 0, 0};
+    bytes.resize(0x18, 0xE0);
+    SetChecksum(bytes, 5);
+    return bytes;
+}
+
+TEST(SmbiosTable, IsCutIntoItsStructures) {
+    EXPECT_EQ(SplitSmbiosTable(Join({kSystem, kBare, kEnd, kBare})),
+              (SmbiosStructures{kSystem, kBare}));
+    EXPECT_EQ(SplitSmbiosTable(Join({kSystem, kBare}), 1), SmbiosStructures{kSystem});
+}
+
+TEST(SmbiosTable, EveryTruncationKeepsTheWholeStructuresBeforeIt) {
+    const Bytes table = Join({kSystem, kBare, kEnd});
+    for (std::size_t length = 0; length < table.size(); ++length) {
+        const Bytes cut(table.begin(), table.begin() + static_cast<std::ptrdiff_t>(length));
+        const std::size_t whole = length < kSystem.size()                  ? 0
+                                  : length < kSystem.size() + kBare.size() ? 1
+                                                                           : 2;
+        EXPECT_EQ(SplitSmbiosTable(cut).size(), whole) << length;
+    }
+}
+
+TEST(SmbiosTable, ImpossibleLengthEndsTheWalk) {
+    for (const int length : {0, 3, 200}) {
+        Bytes poisoned = kBare;
+        poisoned[1] = static_cast<std::uint8_t>(length);
+        EXPECT_EQ(SplitSmbiosTable(Join({kSystem, poisoned, kEnd})), SmbiosStructures{kSystem});
+    }
+}
+
+TEST(SmbiosTable, StringsAreFoundByTheirNumber) {
+    EXPECT_EQ(SmbiosString(kSystem, 1), "Acme");
+    EXPECT_EQ(SmbiosString(kSystem, 2), "S1  ");
+    for (const std::size_t number : {0, 3, 4, 255}) EXPECT_EQ(SmbiosString(kSystem, number), "");
+    EXPECT_EQ(SmbiosString(kBare, 1), "");
+    EXPECT_EQ(SmbiosStringAt(kSystem, 4), "Acme");
+    EXPECT_EQ(SmbiosStringAt(kSystem, 6), "");  // no string 9
+    EXPECT_EQ(SmbiosStringAt(kSystem, 8), "");  // past the formatted area
+    for (std::size_t length = 0; length < kSystem.size() - 1; ++length) {
+        const Bytes cut(kSystem.begin(), kSystem.begin() + static_cast<std::ptrdiff_t>(length));
+        EXPECT_EQ(SmbiosStringAt(cut, 5), "") << length;
+    }
+}
+
+TEST(SmbiosTable, ProductNameComesWithoutTrailingBlanks) {
+    EXPECT_EQ(SystemProductName({{}, kBare, kSystem}), "S1");
+    EXPECT_EQ(SystemProductName({kBare}), "");
+    EXPECT_EQ(SystemProductName({{1}}), "");
+}
+
+TEST(SmbiosEntryPoint, BothFormsAreReadAndDamageIsSeen) {
+    const Bytes second = EntryPoint2(0x1234, 7);
+    ASSERT_TRUE(ReadSmbiosEntryPoint(second));
+    EXPECT_EQ(ReadSmbiosEntryPoint(second)->tableLength, 0x1234U);
+    EXPECT_EQ(ReadSmbiosEntryPoint(second)->numberOfStructures, 7);
+    const Bytes third = EntryPoint3(0x34);
+    ASSERT_TRUE(ReadSmbiosEntryPoint(third));
+    EXPECT_EQ(ReadSmbiosEntryPoint(third)->tableLength, 0x34U);
+    EXPECT_EQ(ReadSmbiosEntryPoint(third)->numberOfStructures, std::nullopt);
+    for (const Bytes& good : {second, third}) {
+        for (std::size_t at = 0; at < good.size(); ++at) {
+            Bytes bad = good;
+            ++bad[at];
+            EXPECT_FALSE(ReadSmbiosEntryPoint(bad)) << at;
+            bad.resize(at);
+            EXPECT_FALSE(ReadSmbiosEntryPoint(bad)) << at;
+        }
+    }
+    Bytes old = EntryPoint2(0x40, 1);  // states one byte less than it has, as SMBIOS 2.1 did
+    old[5] = 0x1E;
+    SetChecksum(std::span(old).first(0x1E), 4);
+    EXPECT_TRUE(ReadSmbiosEntryPoint(old));
+}
+
+class SystemSmbios : public ::testing::Test {
+protected:
+    void SetUp() override {
+        std::string name = (std::filesystem::temp_directory_path() / "smbiosXXXXXX").string();
+        ASSERT_NE(mkdtemp(name.data()), nullptr);
+        folder = name;
+    }
+    void TearDown() override { std::filesystem::remove_all(folder); }
+    void Write(const char* file, const Bytes& bytes) const {
+        std::ofstream(folder / file, std::ios::binary)
+            .write(reinterpret_cast<const char*>(bytes.data()),
+                   static_cast<std::streamsize>(bytes.size()));
+    }
+    std::filesystem::path folder;
+};
+
+TEST_F(SystemSmbios, SmallerBoundHolds) {
+    EXPECT_EQ(ReadSystemSmbios(folder), SmbiosStructures());
+    Write("DMI", Join({kSystem, kBare, kBare, kEnd}));
+    EXPECT_EQ(ReadSystemSmbios(folder), SmbiosStructures());
+    const auto systemOnly = static_cast<std::uint8_t>(kSystem.size());
+    const struct {
+        Bytes entryPoint;
+        SmbiosStructures structures;
+    } cases[] = {{EntryPoint3(200), {kSystem, kBare, kBare}},
+                 {EntryPoint3(systemOnly), {kSystem}},
+                 {EntryPoint3(0), {}},
+                 {EntryPoint2(0xFFFF, 9), {kSystem, kBare, kBare}},
+                 {EntryPoint2(0xFFFF, 2), {kSystem, kBare}},
+                 {EntryPoint2(systemOnly, 9), {kSystem}},
+                 {Bytes(0x18, 0), {}}};
+    for (const auto& c : cases) {
+        Write("smbios_entry_point", c.entryPoint);
+        EXPECT_EQ(ReadSystemSmbios(folder), c.structures);
+    }
+}
+
+}  // namespace
