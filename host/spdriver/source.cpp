@@ -1,0 +1,90 @@
+#include <algorithm>
+#include <iterator>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "host/spdriver/kinds.h"
+#include "host/spdriver/transport.h"
+
+namespace tqrhost {
+namespace {
+
+struct Kind {
+    std::string_view name;   ///< with its colon where a place follows
+    std::string_view usage;  ///< as the user writes it
+    bool joins;              ///< several of them make one machine
+    Source (*open)(const std::string& place, const SourceOptions& options);
+};
+
+// What is not built in has no line here.
+constexpr Kind kKinds[] = {
+#ifdef IPMISEL_FREEIPMI
+    {"inband", "inband", false, OpenInband},
+    {"lan:", "lan:HOST[:PORT]", true, OpenLan},
+#endif
+    {"sim:", "sim:FILE", false, OpenSimulated},
+    {"replay:", "replay:FILE", false, OpenReplay},
+};
+
+bool IsOfKind(std::string_view source, const Kind& kind) {
+    return kind.name.back() == ':' ? source.starts_with(kind.name) : source == kind.name;
+}
+
+const Kind& FindKind(const std::string& source) {
+    const auto kind = std::find_if(std::begin(kKinds), std::end(kKinds),
+                                   [&](const Kind& k) { return IsOfKind(source, k); });
+    if (kind != std::end(kKinds)) return *kind;
+    std::string known;
+    for (const Kind& k : kKinds) known += (known.empty() ? "" : ", ") + std::string(k.usage);
+    throw SourceError("this build has no source \"" + source + "\"; use one of " + known);
+}
+
+std::string PlaceOf(const std::string& source, const Kind& kind) {
+    const std::string place = source.substr(kind.name.size());
+    if (place.empty() && kind.name.back() == ':') {
+        throw SourceError("the source \"" + source + "\" names no place; write it as " +
+                          std::string(kind.usage));
+    }
+    return place;
+}
+
+/// The password is asked for at most once, however many nodes want it.
+SourceOptions AskOnce(SourceOptions options) {
+    if (!options.password) return options;
+    options.password = [ask = std::move(options.password),
+                        answer = std::make_shared<std::optional<std::string>>()] {
+        if (!*answer) *answer = ask();
+        return **answer;
+    };
+    return options;
+}
+
+}  // namespace
+
+Source OpenSources(const std::vector<std::string>& sources, const SourceOptions& options) {
+    if (sources.empty()) throw SourceError("no source is named");
+    const SourceOptions askOnce = AskOnce(options);
+    for (const std::string& source : sources) {
+        if (FindKind(source).joins || sources.size() == 1) continue;
+        throw SourceError("the source \"" + source +
+                          "\" stands alone; only several of the kind lan: make one machine");
+    }
+    Source machine;
+    for (const std::string& source : sources) {
+        const Kind& kind = FindKind(source);
+        Source part = kind.open(PlaceOf(source, kind), askOnce);
+        if (machine.nodes.empty()) machine.facts = std::move(part.facts);
+        std::move(part.nodes.begin(), part.nodes.end(), std::back_inserter(machine.nodes));
+    }
+    return machine;
+}
+
+#ifndef IPMISEL_FREEIPMI
+std::span<const WorkaroundInfo> KnownWorkarounds() { return {}; }
+#endif
+
+}  // namespace tqrhost
