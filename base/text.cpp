@@ -146,6 +146,7 @@ int IPMIselGetString(const unsigned char* block, char* out, int blockLength, int
     return getString(block, out, blockLength, index);
 }
 
+// NOLINTNEXTLINE(performance-unnecessary-value-param): its callers know it by this signature
 bool isPrintable(std::string text) {
     return std::any_of(text.begin(), text.end(), [](char c) { return c >= 33 && c <= 126; });
 }

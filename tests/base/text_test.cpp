@@ -19,9 +19,8 @@ namespace {
 
 /// A buffer on the heap, so that the address sanitizer sees a write outside of it.
 struct Buffer {
-    Buffer(unsigned int size, const char* content) : bytes(new char[size]), length(size) {
-        std::memset(bytes.get(), '#', size);
-        std::strncpy(bytes.get(), content, size);
+    Buffer(unsigned int size, const std::string& content) : bytes(new char[size]()), length(size) {
+        content.copy(bytes.get(), size);
     }
     std::string Text() const { return std::string(BoundedView(bytes.get(), length)); }
     std::unique_ptr<char[]> bytes;
@@ -41,8 +40,7 @@ TEST(StringCch, CatStaysInsideTheBuffer) {
     constexpr unsigned int kAll = UINT_MAX;
     const struct {
         unsigned int size;
-        const char* before;
-        const char* source;
+        const char *before, *source;
         unsigned int count;
         const char* after;
     } cases[] = {{8, "AB", "CD", kAll, "ABCD"},          {8, "AB", "CDEFG", kAll, "ABCDEFG"},
@@ -64,26 +62,24 @@ TEST(StringCch, CatStaysInsideTheBuffer) {
 }
 
 TEST(StringCch, PrintfFormatsAndCuts) {
-    Buffer hex(16, "");
-    StringCchPrintf(hex.bytes.get(), 16, "%02X ", 5);
-    EXPECT_EQ(hex.Text(), "05 ");
-    Buffer cut(4, "");
-    StringCchPrintf(cut.bytes.get(), 4, "%d", 123456);
-    EXPECT_EQ(cut.Text(), "123");
+    Buffer buffer(4, "");
+    StringCchPrintf(buffer.bytes.get(), 4, "%02X ", 5);
+    EXPECT_EQ(buffer.Text(), "05 ");
+    StringCchPrintf(buffer.bytes.get(), 4, "%d", 123456);
+    EXPECT_EQ(buffer.Text(), "123");
 }
 
 TEST(StringCch, NoBufferIsNoWork) {
     char untouched = '#';
-    StringCchCopy(&untouched, 0, "A");
-    StringCchCat(&untouched, 0, "A");
-    StringCchCatN(&untouched, 0, "A", 1);
-    StringCchPrintf(&untouched, 0, "%d", 1);
-    CopyOut(&untouched, 0, "A");
+    for (char* const buffer : {&untouched, static_cast<char*>(nullptr)}) {
+        const unsigned int size = buffer == nullptr ? 4 : 0;
+        StringCchCopy(buffer, size, "A");
+        StringCchCat(buffer, size, "A");
+        StringCchCatN(buffer, size, "A", 1);
+        StringCchPrintf(buffer, size, "%d", 1);
+        CopyOut(buffer, size, "A");
+    }
     EXPECT_EQ(untouched, '#');
-    StringCchCopy(nullptr, 4, "A");
-    StringCchCat(nullptr, 4, "A");
-    StringCchPrintf(nullptr, 4, "%d", 1);
-    CopyOut(nullptr, 4, "A");
 }
 
 TEST(GetString, FirstStringWithoutAndLaterOnesWithTheirNul) {
@@ -154,8 +150,7 @@ TEST(Format, HoldsAnyLength) {
 TEST(FormatIntegers, FillsOnlyPlainIntegerConversions) {
     const int values[] = {-5, 0xAB};
     const struct {
-        const char* format;
-        const char* text;
+        const char *format, *text;
     } cases[] = {{"a %d b %x c", "a -5 b ab c"},
                  {"%i/%X", "-5/AB"},
                  {"%u", "4294967291"},

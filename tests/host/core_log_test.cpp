@@ -1,6 +1,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <set>
 #include <stdexcept>
 
 #include "host/core/host.h"
@@ -11,7 +12,6 @@ namespace {
 
 using namespace NQORTQR20;
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 using tqrhost::AddLogConsumer;
 using tqrhost::RemoveLogConsumer;
 

@@ -102,58 +102,55 @@ TEST_F(Output, MisuseIsAnsweredWithThree) {
     tqrhost::PluginContext context("/plugins");
     const TPluginManagerProvider* provider = nullptr;
     const char* path = nullptr;
-    const auto refused = [](TTQRStatusCode status) { return status.code == kStatusFailed; };
-
-    // No instance is open.
-    EXPECT_TRUE(refused(fdrAddProperty(output, "A", "1")));
-    EXPECT_TRUE(refused(fdrAddArrayProperty(output, "A", array)));
-    EXPECT_TRUE(refused(fdrAddReferenceProperty(output, "A", reference)));
-    EXPECT_TRUE(refused(fdrAddInstance(output)));
-
-    // Each argument in turn is null.
-    EXPECT_TRUE(refused(fdrGetInstance(nullptr, "Class")));
-    EXPECT_TRUE(refused(fdrGetInstance(output, nullptr)));
-    ASSERT_FALSE(refused(fdrGetInstance(output, "Class")));
-    EXPECT_TRUE(refused(fdrAddProperty(nullptr, "A", "1")));
-    EXPECT_TRUE(refused(fdrAddProperty(output, nullptr, "1")));
-    EXPECT_TRUE(refused(fdrAddProperty(output, "A", nullptr)));
-    EXPECT_TRUE(refused(fdrAddInstance(nullptr)));
-    EXPECT_TRUE(refused(fdrNewCIMValueArray(nullptr)));
-    EXPECT_TRUE(refused(fdrArrayAddUint8(nullptr, 1)));
-    EXPECT_TRUE(refused(fdrAddArrayProperty(nullptr, "A", array)));
-    EXPECT_TRUE(refused(fdrAddArrayProperty(output, nullptr, array)));
-    EXPECT_TRUE(refused(fdrAddArrayProperty(output, "A", nullptr)));
-    EXPECT_TRUE(refused(fdrDeleteCIMValueArray(nullptr)));
-    EXPECT_TRUE(refused(fdrNewCIMReference(nullptr, output)));
-    EXPECT_TRUE(refused(fdrNewCIMReference(&none, nullptr)));
+    const auto expectRefused = [](const char* why, std::initializer_list<TTQRStatusCode> answers) {
+        int operation = 0;
+        for (const TTQRStatusCode answer : answers) {
+            EXPECT_EQ(answer.code, kStatusFailed) << why << ", operation " << ++operation;
+        }
+    };
+    expectRefused("no instance is open",
+                  {fdrAddProperty(output, "A", "1"), fdrAddArrayProperty(output, "A", array),
+                   fdrAddReferenceProperty(output, "A", reference), fdrAddInstance(output)});
+    ASSERT_EQ(fdrGetInstance(output, "Class").code, 0);
+    expectRefused("no handle", {fdrGetInstance(nullptr, "Class"),
+                                fdrAddProperty(nullptr, "A", "1"),
+                                fdrAddInstance(nullptr),
+                                fdrNewCIMValueArray(nullptr),
+                                fdrArrayAddUint8(nullptr, 1),
+                                fdrAddArrayProperty(nullptr, "A", array),
+                                fdrAddArrayProperty(output, "A", nullptr),
+                                fdrDeleteCIMValueArray(nullptr),
+                                fdrNewCIMReference(nullptr, output),
+                                fdrNewCIMReference(&none, nullptr),
+                                fdrSetReferenceClassName(nullptr, "Class"),
+                                fdrReferenceAddString(nullptr, "Key", "1"),
+                                fdrAddReferenceProperty(nullptr, "A", reference),
+                                fdrAddReferenceProperty(output, "A", nullptr),
+                                fdrDeleteCIMReference(nullptr),
+                                fdrGetHandle(nullptr, &provider),
+                                fdrGetHandle(context.get(), nullptr),
+                                fdrGetPluginPath(nullptr, &path),
+                                fdrGetPluginPath(context.get(), nullptr),
+                                fdrShowNotice(nullptr, "text", nullptr)});
     EXPECT_EQ(none, nullptr);
-    EXPECT_TRUE(refused(fdrSetReferenceClassName(nullptr, "Class")));
-    EXPECT_TRUE(refused(fdrSetReferenceClassName(reference, nullptr)));
-    EXPECT_TRUE(refused(fdrReferenceAddString(nullptr, "Key", "1")));
-    EXPECT_TRUE(refused(fdrReferenceAddString(reference, nullptr, "1")));
-    EXPECT_TRUE(refused(fdrReferenceAddString(reference, "Key", nullptr)));
-    EXPECT_TRUE(refused(fdrAddReferenceProperty(nullptr, "A", reference)));
-    EXPECT_TRUE(refused(fdrAddReferenceProperty(output, nullptr, reference)));
-    EXPECT_TRUE(refused(fdrAddReferenceProperty(output, "A", nullptr)));
-    EXPECT_TRUE(refused(fdrDeleteCIMReference(nullptr)));
-    EXPECT_TRUE(refused(fdrGetHandle(nullptr, &provider)));
-    EXPECT_TRUE(refused(fdrGetHandle(context.get(), nullptr)));
-    EXPECT_TRUE(refused(fdrGetPluginPath(nullptr, &path)));
-    EXPECT_TRUE(refused(fdrGetPluginPath(context.get(), nullptr)));
-    EXPECT_TRUE(refused(fdrShowNotice(nullptr, "text", nullptr)));
-    EXPECT_TRUE(refused(fdrShowNotice(context.get(), nullptr, "text")));
-
-    // A handle that was given back.
-    ASSERT_FALSE(refused(fdrDeleteCIMValueArray(array)));
-    EXPECT_TRUE(refused(fdrDeleteCIMValueArray(array)));
-    EXPECT_TRUE(refused(fdrArrayAddUint8(array, 1)));
-    EXPECT_TRUE(refused(fdrAddArrayProperty(output, "A", array)));
-    ASSERT_FALSE(refused(fdrDeleteCIMReference(reference)));
-    EXPECT_TRUE(refused(fdrDeleteCIMReference(reference)));
-    EXPECT_TRUE(refused(fdrAddReferenceProperty(output, "A", reference)));
-
-    EXPECT_FALSE(refused(fdrAddInstance(output)));
+    expectRefused(
+        "no text",
+        {fdrAddProperty(output, nullptr, "1"), fdrAddProperty(output, "A", nullptr),
+         fdrAddArrayProperty(output, nullptr, array), fdrSetReferenceClassName(reference, nullptr),
+         fdrReferenceAddString(reference, nullptr, "1"),
+         fdrReferenceAddString(reference, "Key", nullptr),
+         fdrAddReferenceProperty(output, nullptr, reference),
+         fdrShowNotice(context.get(), nullptr, "text")});
+    fdrDeleteCIMValueArray(array);
+    fdrDeleteCIMReference(reference);
+    expectRefused("given back",
+                  {fdrDeleteCIMValueArray(array), fdrArrayAddUint8(array, 1),
+                   fdrAddArrayProperty(output, "A", array), fdrDeleteCIMReference(reference),
+                   fdrAddReferenceProperty(output, "A", reference)});
+    EXPECT_EQ(fdrAddInstance(output).code, 0);  // none of it has touched the open instance
     EXPECT_THAT(sink.instances[0].properties, IsEmpty());
+    expectRefused("closed", {fdrAddInstance(output), fdrAddProperty(output, "A", "1")});
+    expectRefused("no class", {fdrGetInstance(output, nullptr)});
 }
 
 TEST(Context, LeadsToPathProviderAndNotices) {
