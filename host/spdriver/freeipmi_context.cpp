@@ -29,7 +29,8 @@ constexpr Advice kAdvice[] = {
     {IPMI_ERR_PRIVILEGE_LEVEL_INSUFFICIENT,
      "the user's privilege does not suffice; ask for more with --privilege, or use another user"},
     {IPMI_ERR_PRIVILEGE_LEVEL_CANNOT_BE_OBTAINED,
-     "the user may not have the privilege asked for; try --privilege operator or user"},
+     "the user may not have the privilege asked for; try --privilege operator, or --workaround "
+     "opensesspriv"},
     {IPMI_ERR_AUTHENTICATION_TYPE_UNAVAILABLE,
      "the BMC refuses this way to log in; try --workaround authcap"},
     {IPMI_ERR_CIPHER_SUITE_ID_UNAVAILABLE,

@@ -156,11 +156,13 @@ int TryOpen(const Session& session, std::uint8_t suite, FreeIpmiContext* opened)
     return IPMI_ERR_SUCCESS;
 }
 
-/// Whether an error says that the BMC does not have the suite. Nothing else is tried a second time:
-/// a BMC may lock a user out after a few wrong passwords.
+/// Whether an error says that the BMC does not have the suite: by a status of its own, by another
+/// status, or by an answer cut short, as some refuse it. All of them come before the password is
+/// used. Nothing else is tried a second time: a BMC may lock a user out after a few wrong
+/// passwords.
 bool SuiteIsMissing(int error) {
     return error == IPMI_ERR_CIPHER_SUITE_ID_UNAVAILABLE ||
-           error == IPMI_ERR_BAD_RMCPPLUS_STATUS_CODE;
+           error == IPMI_ERR_BAD_RMCPPLUS_STATUS_CODE || error == IPMI_ERR_IPMI_ERROR;
 }
 
 }  // namespace
