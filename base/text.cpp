@@ -146,7 +146,8 @@ int IPMIselGetString(const unsigned char* block, char* out, int blockLength, int
     return getString(block, out, blockLength, index);
 }
 
-// NOLINTNEXTLINE(performance-unnecessary-value-param): its callers know it by this signature
+// Texts by value: callers know the routines by these signatures.
+// NOLINTBEGIN(performance-unnecessary-value-param)
 bool isPrintable(std::string text) {
     return std::any_of(text.begin(), text.end(), [](char c) { return c >= 33 && c <= 126; });
 }
@@ -162,6 +163,7 @@ std::string GetPrintableString(std::string text) {
     }
     return clean;
 }
+// NOLINTEND(performance-unnecessary-value-param)
 
 std::vector<std::string> multiStringTok(char* text, unsigned int length, char separator) {
     std::vector<std::string> pieces;

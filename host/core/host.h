@@ -26,7 +26,7 @@ struct MachineFacts {
     bool integratedBmc = false;
     bool ipmiDriver = true;
     bool ipmiLan = false;
-    std::optional<std::string> localTime;            ///< CIM text form, held still; else the clock
+    std::optional<std::string> localTime;           ///< CIM text form, held still; else the clock
     std::vector<std::vector<std::uint8_t>> smbios;  ///< raw structures, string set included
 };
 
