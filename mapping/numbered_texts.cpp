@@ -5,6 +5,8 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <span>
+#include <utility>
 
 #include "base/log.h"
 #include "base/text.h"
@@ -16,6 +18,18 @@ constexpr std::size_t kLongestPiece =
     511;                                  // a longer line is read in pieces, each a line of its own
 constexpr off_t kLargestFile = 16 << 20;  // far beyond any real one
 
+/// Reads until the span is full or the file ends; the number of bytes read.
+std::size_t ReadAll(int file, std::span<char> room) {
+    std::size_t have = 0;
+    while (have < room.size()) {
+        const ssize_t count = read(file, room.data() + have, room.size() - have);
+        if (count < 0 && errno == EINTR) continue;
+        if (count <= 0) break;
+        have += static_cast<std::size_t>(count);
+    }
+    return have;
+}
+
 /// Nothing when the file cannot be opened or is no plain file of a sensible size.
 std::optional<std::string> ReadTextFile(const std::string& path) {
     // Not blocking: a pipe in the file's place must not hold the collection up.
@@ -24,15 +38,9 @@ std::optional<std::string> ReadTextFile(const std::string& path) {
     std::optional<std::string> contents;
     struct stat facts {};
     if (fstat(file, &facts) == 0 && S_ISREG(facts.st_mode) && facts.st_size <= kLargestFile) {
-        contents.emplace(static_cast<std::size_t>(facts.st_size), '\0');
-        std::size_t have = 0;
-        while (have < contents->size()) {
-            const ssize_t count = read(file, contents->data() + have, contents->size() - have);
-            if (count < 0 && errno == EINTR) continue;
-            if (count <= 0) break;
-            have += static_cast<std::size_t>(count);
-        }
-        contents->resize(have);
+        std::string text(static_cast<std::size_t>(facts.st_size), '\0');
+        text.resize(ReadAll(file, text));
+        contents = std::move(text);
     }
     close(file);
     return contents;

@@ -103,9 +103,9 @@ std::string UnitWords(NQORTQR20::TCPluginCallbacks* context, const s_SDR_Mod_Uni
 
 std::string OnesComplementText(char value) {
     const auto byte = static_cast<std::uint8_t>(value);
-    const std::string text = (byte & 0x80) != 0
-                                 ? "-" + std::to_string(static_cast<std::uint8_t>(~byte))
-                                 : std::to_string(byte);
+    const bool negative = (byte & 0x80) != 0;
+    std::string text =
+        negative ? "-" + std::to_string(static_cast<std::uint8_t>(~byte)) : std::to_string(byte);
     WriteLog(kTrace, "IPMIMapping::GetOnesComplement() function completed.");
     return text;
 }

@@ -1,0 +1,192 @@
+#include "mapping/numbered_texts.h"
+
+#include <set>
+
+#include "tests/mapping/mapping_fixture.h"
+
+namespace {
+
+using ipmiseltest::TextFolder;
+using ::testing::ElementsAre;
+
+/// Every number that the plug-in asks for.
+std::set<int> AskedNumbers() {
+    constexpr int kRanges[][2] = {
+        {100, 111}, {120, 122}, {130, 131},  {140, 141}, {150, 151}, {160, 161}, {170, 178},
+        {180, 181}, {190, 191}, {200, 208},  {210, 217}, {220, 223}, {230, 236}, {240, 245},
+        {250, 259}, {260, 265}, {270, 277},  {280, 286}, {290, 292}, {300, 313}, {320, 335},
+        {346, 349}, {350, 357}, {360, 369},  {370, 372}, {373, 378}, {380, 384}, {385, 387},
+        {390, 394}, {400, 406}, {410, 411},  {412, 417}, {420, 428}, {430, 444}, {450, 458},
+        {460, 463}, {464, 476}, {477, 479},  {480, 481}, {490, 493}, {500, 503}, {510, 513},
+        {515, 520}, {525, 527}, {531, 531},  {535, 541}, {543, 544}, {650, 662}, {721, 727},
+        {730, 822}, {856, 865}, {1000, 1040}};
+    std::set<int> numbers;
+    for (const auto& range : kRanges) {
+        for (int number = range[0]; number <= range[1]; ++number) numbers.insert(number);
+    }
+    return numbers;
+}
+
+TEST(NumberedTexts, LookupRules) {
+    const auto filler = [](std::size_t length, const char* rest) {
+        return std::string(length, 'x') + rest;
+    };
+    const struct {
+        std::string contents;
+        std::size_t capacity;
+        const char* text;
+    } cases[] = {
+        {"4=four\n5=five\n6=six\n", 256, "five"},
+        {"535=longer\n15=other\n5=own\n", 256, "longer"},  // the key counts anywhere
+        {"; see 5= here\n5=own\n", 256, " here"},
+        {"a=5=b\n", 256, "5=b"},  // after the first equals sign of the line
+        {"5=a=b\n", 256, "a=b"},
+        {"5 =blank\n", 256, ""},
+        {"5=carriage\r\n", 256, "carriage"},
+        {"5=last", 256, "las"},  // the last character goes whatever it is
+        {"5=\n5=second\n", 256, ""},
+        {"5=", 256, ""},
+        {"", 256, ""},
+        {std::string("5=ab\0cd\n", 8), 256, "a"},  // a NUL ends what a line shows
+        {std::string("x\0 5=no\n5=yes\n", 14), 256, "yes"},
+        // A long line is read in pieces of 511 bytes.
+        {filler(511, "5=tail\n"), 256, "tail"},
+        {filler(510, "5=tail\n"), 256, ""},
+        {filler(509, "5=tail\n"), 256, ""},
+        {filler(505, "5=abcdefg\n"), 256, "abc"},
+        {"first line\n" + filler(511, "5=tail\n"), 256, "tail"},
+        {"5=abcdef\n", 8, "abcdef"},
+        {"5=abcdef\n", 7, "abcde"},  // the cut takes the line end, and then one more goes
+        {"5=abcdef\n", 2, ""},
+        {"5=abcdef\n", 0, ""},
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(ipmisel::FindNumberedText(c.contents, 5, c.capacity), c.text)
+            << c.contents << " " << c.capacity;
+    }
+}
+
+TEST(NumberedTexts, EveryNumberFindsItsOwnLine) {
+    std::set<int> present;
+    IPMIMapping mapping;
+    const tqrhost::PluginContext context(IPMISEL_TEXTS);
+    std::ifstream file(IPMISEL_TEXTS "/ipmisel.INI");
+    int previous = -1;
+    for (std::string line; std::getline(file, line);) {
+        if (line.starts_with(';')) continue;
+        SCOPED_TRACE(line);
+        const std::size_t equals = line.find('=');
+        ASSERT_NE(equals, std::string::npos);
+        const int number = std::stoi(line.substr(0, equals));
+        const std::string text = line.substr(equals + 1);
+        EXPECT_GT(number, previous);
+        previous = number;
+        present.insert(number);
+
+        const bool isUnit = number >= 721 && number <= 822;
+        char out[128];
+        EXPECT_EQ(mapping.GetString(context.get(), number, out, isUnit ? 64 : 128), 0);
+        EXPECT_EQ(out, text);
+        // The only formats are those whose integers are given.
+        const int integers = number == 347                                     ? 2
+                             : number == 286 || number == 543 || number == 544 ? 1
+                                                                               : 0;
+        EXPECT_EQ(std::count(text.begin(), text.end(), '%'), integers);
+    }
+    for (const int number : AskedNumbers()) EXPECT_TRUE(present.contains(number)) << number;
+    // The message puts the sensor's own name in the place of an entity of this name.
+    EXPECT_EQ(ipmisel::FetchText(context.get(), 1002), "Unknown");
+}
+
+TEST(NumberedTexts, DecodersAskForTheseNumbersAndNoOthers) {
+    std::set<int> asked;
+    const int consumer = tqrhost::AddLogConsumer(
+        NQORTQR20::ILogger::kError,
+        [&](NQORTQR20::ILogger::ETQRLogSeverity, std::string_view line) {
+            constexpr std::string_view kMissing = "Could not find data_number ";
+            if (line.starts_with(kMissing)) {
+                asked.insert(std::stoi(std::string(line.substr(kMissing.size()))));
+            }
+        });
+    IPMIMapping mapping;
+    const TextFolder folder("");  // no number is there, so each is logged
+    const tqrhost::PluginContext context(folder.path());
+    const ipmiseltest::MachineType machine("SIM-1");
+    char out[256];
+    const auto decode = [&](int type, int data1, int data2, int data3) {
+        out[0] = '\0';
+        mapping.GetSensorOffset(context.get(), type, data1, data2, data3, 0x6F, out, sizeof out);
+    };
+    for (int data1 = 0; data1 <= 0xFF; ++data1) {
+        mapping.GetThresholdOffset(context.get(), data1, 0, 0, out, sizeof out, nullptr);
+        for (int type = 0; type <= 0x0F; ++type) {
+            mapping.GetGenericOffset(context.get(), data1, 0x21, 0xFF, type, 0x02, 0xA0, out,
+                                     sizeof out);
+        }
+    }
+    for (int type = 0; type <= 0xFF; ++type) {
+        for (int data1 = 0; data1 <= 0x0F; ++data1) decode(type, 0x40 | data1, 0x21, 0);
+        decode(type, 0x80, 0, 0);
+        decode(type, 0xF0, 0, 0);
+    }
+    for (const int type : {0x0F, 0x10, 0x12, 0x21, 0x23}) {
+        for (int offset = 0; offset <= 8; ++offset) {
+            for (int data2 = 0; data2 <= 0xFF; ++data2) decode(type, 0xC0 | offset, data2, 0x20);
+        }
+    }
+    for (int code = 0; code <= 0xFF; ++code) {
+        const auto byte = static_cast<std::uint8_t>(code);
+        const s_SDR_Mod_Units units{
+            1, static_cast<std::uint8_t>((byte & 0x38) | 0x02), byte, byte, 0, 1, 0, 0, 0};
+        mapping.GetSensorUnits(context.get(), &units, 1, out, sizeof out);
+    }
+    tqrhost::RemoveLogConsumer(consumer);
+
+    // The source texts and the entity names are asked for elsewhere.
+    std::set<int> expected = AskedNumbers();
+    std::erase_if(expected, [](int n) { return (n >= 535 && n <= 544) || n >= 1000; });
+    EXPECT_EQ(asked, expected);
+}
+
+TEST(GetString, LogsWhyThereIsNoTextAndLeavesTheBufferEmpty) {
+    const ipmiseltest::LogRecorder log;
+    IPMIMapping mapping;
+    char out[16] = "stale";
+    EXPECT_NE(mapping.GetString(nullptr, 7, out, sizeof out), 0);
+    EXPECT_STREQ(out, "");
+    EXPECT_THAT(log.Lines(0), ElementsAre("fdrGetPluginPath failed."));
+
+    const TextFolder folder;
+    const tqrhost::PluginContext context(folder.path());
+    EXPECT_NE(mapping.GetString(context.get(), 7, out, sizeof out), 0);
+    std::filesystem::create_directory(folder.File());  // no file, though it can be opened
+    EXPECT_NE(mapping.GetString(context.get(), 8, out, sizeof out), 0);
+    const std::string could = "Could not open file " + folder.File().string();
+    EXPECT_THAT(log.Lines(1), ElementsAre(could + ". Did not obtain string #7\n",
+                                          could + ". Did not obtain string #8\n"));
+
+    const TextFolder texts("1=a\n");
+    const tqrhost::PluginContext other(texts.path());
+    EXPECT_NE(mapping.GetString(other.get(), 7, out, sizeof out), 0);
+    EXPECT_EQ(log.Lines(0).back(), "Could not find data_number 7");
+    EXPECT_EQ(log.Lines(3).back(), "Path found for ipmisel INI file: " + texts.File().string());
+}
+
+TEST(GetString, ReadsTheFileAnewAndKeepsNoDescriptor) {
+    const auto descriptors = [] {
+        return std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {});
+    };
+    const TextFolder folder("1=before\n");
+    const tqrhost::PluginContext context(folder.path());
+    IPMIMapping mapping;
+    char out[16];
+    const auto open = descriptors();
+    EXPECT_EQ(mapping.GetString(context.get(), 1, out, sizeof out), 0);
+    std::ofstream(folder.File()) << "1=after\n";
+    EXPECT_EQ(mapping.GetString(context.get(), 1, out, sizeof out), 0);
+    EXPECT_STREQ(out, "after");
+    EXPECT_NE(mapping.GetString(context.get(), 2, out, sizeof out), 0);
+    EXPECT_EQ(descriptors(), open);
+}
+
+}  // namespace
