@@ -53,6 +53,11 @@ public:
         WriteLog(severity, line);
         return Fail();
     }
+    /// Ends the scope without its completed line although all is well; kOk, to be returned.
+    unsigned Silence() {
+        ended_ = true;
+        return kOk;
+    }
 
 private:
     const char* name_;
