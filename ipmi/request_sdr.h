@@ -1,8 +1,10 @@
 #pragma once
 
-#include <cstdio>
+#include <cstdint>
+#include <span>
 #include <vector>
 
+#include "ipmi/debug_file.h"
 #include "ipmi/ipmi_message.h"
 #include "records/rows.h"
 #include "tqr/plugin.h"
@@ -28,4 +30,18 @@ public:
     // Debugging aids: "./sdr.out". No step of the collection calls them.
     unsigned IPMIOpenFile(NQORTQR20::TCPluginCallbacks* context);
     unsigned IPMICloseFile(NQORTQR20::TCPluginCallbacks* context);
+
+private:
+    /// Get SDR of `count` bytes of the current record.
+    unsigned ReadRecord(const ipmisel::IPMICommand& command, std::uint8_t offset,
+                        std::uint8_t count);
+    /// Writes the reply as "%02X " groups: cut at the field, and without a NUL when it fills it.
+    void StoreText(std::span<char> field) const;
+    bool IsSensorRecord() const;
+
+    std::uint8_t recordType_ = 0;  ///< of the last record header
+    ipmisel::IPMIRecordID reservationId_;
+    ipmisel::IPMIRecordID recordId_;      ///< of the record to read next; 0x0000 is the first
+    ipmisel::IPMIRecordID nextRecordId_;  ///< as the last record header told it
+    ipmisel::DebugFile debugFile_;
 };

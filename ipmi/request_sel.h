@@ -1,7 +1,6 @@
 #pragma once
 
-#include <cstdio>
-
+#include "ipmi/debug_file.h"
 #include "ipmi/ipmi_message.h"
 #include "records/rows.h"
 #include "tqr/plugin.h"
@@ -25,4 +24,10 @@ public:
     unsigned IPMIOpenFile(NQORTQR20::TCPluginCallbacks* context);
     unsigned IPMICloseFile(NQORTQR20::TCPluginCallbacks* context);
 
+private:
+    /// The reply as text: "%02X " groups and a line feed, as far as 255 characters reach.
+    std::string ResponseText() const;
+
+    ipmisel::IPMIRecordID nextRecordId_;  ///< of the entry to read next
+    ipmisel::DebugFile debugFile_;
 };

@@ -1,0 +1,111 @@
+#include "ipmi/ipmi_message.h"
+
+#include <algorithm>
+
+namespace ipmisel {
+namespace {
+
+constexpr std::uint8_t kFrameStart = 0x01;
+constexpr std::uint8_t kBmcAddress = 0x20;
+constexpr std::size_t kCountAt = 5;
+constexpr std::size_t kDataAt = 9;
+constexpr std::size_t kCompletionCodeAt = 4;
+constexpr std::size_t kResponseAt = 8;
+
+// Generic completion codes from 0xC0 on, IPMI 2.0 table 5-2; the last two have no text. Texts that
+// end without a full stop have always done so.
+constexpr std::uint8_t kFirstCompletionCode = 0xC0;
+constexpr std::array<std::string_view, 24> kCompletionCodes{
+    "Node Busy.",
+    "Invalid Command.",
+    "Command invalid for given LUN.",
+    "Timeout while processing command.",
+    "Out of space.",
+    "Reservation Canceled or Invalid Reservation ID.",
+    "Request data truncated.",
+    "Request data length",
+    "Request data field length",
+    "Parameter out of range.",
+    "Cannot return number of requested data bytes.",
+    "Requested Sensor, data, or record not present.",
+    "Invalid data field in Request",
+    "Command illegal for specified sensor or record type.",
+    "Command response could not be provided.",
+    "Cannot execute duplicated request.",
+    "Command response could not be provided. SDR Repository in update mode.",
+    "Command response could not be provided. Device in firmware update mode.",
+    "Command response could not be provided. BMC initialization or initialization agent in "
+    "progress",
+    "Destination unavailable.",
+    "Cannot execute command. Insufficient privilege level.",
+    "Cannot execute command. Command, or request parameter(s), not supported in present state.",
+};
+static_assert(kCompletionCodes[0xCB - kFirstCompletionCode].starts_with("Requested Sensor"));
+static_assert(!kCompletionCodes[0xD5 - kFirstCompletionCode].empty());
+static_assert(kCompletionCodes[0xD6 - kFirstCompletionCode].empty());
+
+constexpr std::uint8_t kEraseInProgress = 0x81;
+
+}  // namespace
+
+std::string_view CompletionCodeText(std::uint8_t code, bool eraseTextToo) {
+    if (code == kEraseInProgress && eraseTextToo) {
+        return "Cannot execute command, SEL erase in progress.\n";
+    }
+    const std::size_t index = static_cast<std::size_t>(code) - kFirstCompletionCode;
+    if (index < kCompletionCodes.size() && !kCompletionCodes[index].empty()) {
+        return kCompletionCodes[index];
+    }
+    return "Unknown error\n";
+}
+
+}  // namespace ipmisel
+
+unsigned IPMIMessage::Exchange(const ipmisel::IPMICommand& command,
+                               std::span<const std::uint8_t> data) {
+    using namespace ipmisel;
+    netFn_ = command.netFn;
+    lun_ = command.lun;
+    command_ = command.command;
+    data = data.first(std::min(data.size(), kFrameLength - kDataAt));
+    requestHeader_ = {kFrameStart, kBmcAddress, netFn_, lun_, command_};
+    requestHeader_[kCountAt] = static_cast<std::uint8_t>(data.size());
+    std::copy(data.begin(), data.end(), requestHeader_.begin() + kDataAt);
+
+    // Nothing of an earlier reply stays behind the frame.
+    transferBuffer_.fill(0);
+    std::copy(requestHeader_.begin(), requestHeader_.end(), transferBuffer_.begin());
+    if (LogEnabled(kTrace)) {
+        WriteLog(kTrace, std::string("Contents of buffer to send (") + command.bufferName +
+                             "):" + DumpFrame(requestHeader_, command.frameDigits));
+    }
+
+    length_ = command.length;
+    if (transport_ == nullptr ||
+        !transport_->sendIPMICommand(transferBuffer_.data(), &length_,
+                                     static_cast<int>(transferBuffer_.size()), true)) {
+        WriteLog(command.sendFailureSeverity, command.sendFailure);
+        return command.sendFailureResult;
+    }
+    const std::uint8_t completionCode = transferBuffer_[kCompletionCodeAt];
+    if (completionCode != 0) {
+        std::string line = command.errorPrefix;
+        line += CompletionCodeText(completionCode, command.eraseText);
+        WriteLog(command.errorSeverity, line);
+        return kFailed;
+    }
+    return kOk;
+}
+
+std::span<const std::uint8_t> IPMIMessage::Response() const {
+    using ipmisel::kResponseAt;
+    const std::span<const std::uint8_t> all = std::span(transferBuffer_).subspan(kResponseAt);
+    if (length_ < 0) return {};
+    return all.first(std::min(all.size(), static_cast<std::size_t>(length_) + 1));
+}
+
+ipmisel::ByteReader IPMIMessage::Reply() const {
+    ipmisel::ByteReader in(Response());
+    in.Skip(1);
+    return in;
+}

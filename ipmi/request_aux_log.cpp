@@ -1,0 +1,45 @@
+#include "ipmi/request_aux_log.h"
+
+#include <array>
+#include <cstdint>
+#include <string>
+
+using namespace ipmisel;
+
+namespace {
+
+// Compatibility: the line speaks of the system event log (AuxLog.CompletionCodeFailsWithCountZero).
+constexpr IPMICommand kGetAuxLogStatus{
+    .command = 0x5A,
+    .sendFailure = "Failure in sending command to obtain AUX Log Status.",
+    .errorPrefix = "IPMI error in obtaining system event log info: "};
+constexpr std::array<std::uint8_t, 1> kStatusRequest{0x01};
+
+/// Bytes between the completion code and the number of entries.
+constexpr std::size_t kBeforeCount = 7;
+
+constexpr TraceScope::Words kConstructor{" Constructor entered.\n", " Constructor exited.\n",
+                                         kInfo};
+constexpr TraceScope::Words kOperation{" entered.\n", " exited.\n", kInfo};
+
+}  // namespace
+
+IPMIRequestAuxLog::IPMIRequestAuxLog(NQORTQR20::SPLibrary* transport) : IPMIMessage(transport) {
+    TraceScope trace("IPMIRequestAuxLog::IPMIRequestAuxLog()", kConstructor);
+}
+
+unsigned IPMIRequestAuxLog::IPMIGetAuxLogStatus(unsigned int* entryCount) {
+    TraceScope trace("IPMIRequestAuxLog::IPMIGetAuxLogStatus()", kOperation);
+    *entryCount = 0;
+    if (Exchange(kGetAuxLogStatus, kStatusRequest) != kOk) return trace.Fail();
+    if (LogEnabled(kInfo)) {
+        WriteLog(kInfo, "IPMIRequestAuxLog::Response Length = " + std::to_string(length()) +
+                            "\nrspBuf = " + DumpBytes(Response(), Digits::kLowerHex));
+    }
+    ByteReader reply = Reply();
+    reply.Skip(kBeforeCount);
+    *entryCount = reply.U16();  // 0 when the reply is shorter
+    return kOk;
+}
+
+unsigned IPMIRequestAuxLog::IPMIReadExtendedData(s_AuxLog_entry*, unsigned int) { return kOk; }
