@@ -14,8 +14,8 @@
 namespace ipmisel {
 namespace {
 
-constexpr std::size_t kLongestPiece =
-    511;                                  // a longer line is read in pieces, each a line of its own
+// A longer line is read in pieces, each a line of its own.
+constexpr std::size_t kLongestPiece = 511;
 constexpr off_t kLargestFile = 16 << 20;  // far beyond any real one
 
 /// Reads until the span is full or the file ends; the number of bytes read.
