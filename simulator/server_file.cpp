@@ -18,7 +18,7 @@ constexpr std::uint32_t kMost32 = std::numeric_limits<std::uint32_t>::max();
 /// "yyyymmddhhmmss.mmmmmm+utc", the form of a CIM date-time (DSP0004).
 std::string LocalTime(const JsonValue& value) {
     constexpr std::string_view kForm = "dddddddddddddd.ddddddsddd";
-    const std::string text = value.Text();
+    std::string text = value.Text();
     const bool fits =
         std::equal(text.begin(), text.end(), kForm.begin(), kForm.end(), [](char c, char form) {
             if (form == 'd') return c >= '0' && c <= '9';

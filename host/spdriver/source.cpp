@@ -44,7 +44,7 @@ const Kind& FindKind(const std::string& source) {
 }
 
 std::string PlaceOf(const std::string& source, const Kind& kind) {
-    const std::string place = source.substr(kind.name.size());
+    std::string place = source.substr(kind.name.size());
     if (place.empty() && kind.name.back() == ':') {
         throw SourceError("the source \"" + source + "\" names no place; write it as " +
                           std::string(kind.usage));

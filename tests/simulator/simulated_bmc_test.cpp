@@ -1,219 +1,149 @@
 #include "simulator/simulated_bmc.h"
 
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <array>
-#include <chrono>
-#include <numeric>
+#include <initializer_list>
 #include <string>
+
+#include "base/bytes.h"
+#include "simulator/server_file.h"
 
 namespace ipmisim {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::Optional;
-
-constexpr std::uint8_t kStorage = 0x0A;
-constexpr std::uint8_t kReserve = 0x22, kGetSdr = 0x23, kGetSelInfo = 0x40, kGetSelEntry = 0x43;
-
-/// 16 bytes that all differ, with the record ID in front.
-std::array<std::uint8_t, 16> Entry(std::uint16_t id) {
-    std::array<std::uint8_t, 16> entry{};
-    std::iota(entry.begin(), entry.end(), std::uint8_t{0xA0});
-    entry[0] = static_cast<std::uint8_t>(id);
-    entry[1] = static_cast<std::uint8_t>(id >> 8);
-    entry[2] = 0x02;
-    return entry;
-}
-
-Fault MakeFault(std::uint8_t command, std::optional<unsigned> call, Fault::Kind kind) {
-    Fault fault;
-    fault.netFn = kStorage;
-    fault.command = command;
-    fault.call = call;
-    fault.kind = kind;
-    return fault;
-}
-
-class Bmc : public ::testing::Test {
-protected:
-    BmcDescription description;
-
-    std::optional<Bytes> Storage(std::uint8_t command, const Bytes& data = {}) {
-        if (!bmc_) bmc_.emplace(description);
-        return bmc_->Execute(kStorage, 0, command, data);
-    }
-    /// Get SEL Entry or Get SDR.
-    Bytes Read(std::uint8_t command, std::uint16_t id, std::uint8_t offset, std::uint8_t count,
-               std::uint16_t reservation = 0) {
-        return Storage(command,
-                       {static_cast<std::uint8_t>(reservation),
-                        static_cast<std::uint8_t>(reservation >> 8), static_cast<std::uint8_t>(id),
-                        static_cast<std::uint8_t>(id >> 8), offset, count})
-            .value_or(Bytes{});
-    }
-
-private:
-    std::optional<SimulatedBmc> bmc_;
+/// Request: NetFn, command, data. Answer: completion code, data; "none" for no response.
+struct Case {
+    const char* request;
+    const char* answer;
 };
 
-TEST_F(Bmc, SelEntryIsFoundByIdFirstAndLastAndChained) {
-    description.selEntries = {Entry(0x0010), Entry(0x0203), Entry(0x0005)};
-    const struct {
-        std::uint16_t asked, own, next;
-    } cases[] = {{0x0000, 0x0010, 0x0203},
-                 {0x0010, 0x0010, 0x0203},
-                 {0x0203, 0x0203, 0x0005},
-                 {0x0005, 0x0005, 0xFFFF},
-                 {0xFFFF, 0x0005, 0xFFFF}};
-    for (const auto& c : cases) {
-        Bytes expected{0x00, static_cast<std::uint8_t>(c.next),
-                       static_cast<std::uint8_t>(c.next >> 8)};
-        const auto entry = Entry(c.own);
-        expected.insert(expected.end(), entry.begin(), entry.end());
-        EXPECT_EQ(Read(kGetSelEntry, c.asked, 0, 0xFF), expected) << c.asked;
-    }
-    EXPECT_THAT(Read(kGetSelEntry, 0x0011, 0, 0xFF), ElementsAre(0xCB));
-}
-
-TEST_F(Bmc, SelEntryHonoursOffsetAndCount) {
-    description.selEntries = {Entry(1)};
-    EXPECT_THAT(Read(kGetSelEntry, 1, 7, 3), ElementsAre(0, 0xFF, 0xFF, 0xA7, 0xA8, 0xA9));
-    EXPECT_THAT(Read(kGetSelEntry, 1, 14, 9), ElementsAre(0, 0xFF, 0xFF, 0xAE, 0xAF));
-    EXPECT_THAT(Read(kGetSelEntry, 1, 15, 0xFF), ElementsAre(0, 0xFF, 0xFF, 0xAF));
-    EXPECT_THAT(Read(kGetSelEntry, 1, 16, 1), ElementsAre(0xC9));
-    EXPECT_THAT(Read(kGetSelEntry, 1, 0, 0), ElementsAre(0, 0xFF, 0xFF));
-}
-
-TEST_F(Bmc, EmptyLogAndRepositoryHaveNoFirstRecord) {
-    EXPECT_THAT(Read(kGetSelEntry, 0x0000, 0, 0xFF), ElementsAre(0xCB));
-    EXPECT_THAT(Read(kGetSdr, 0xFFFF, 0, 0xFF), ElementsAre(0xCB));
-    EXPECT_THAT(Storage(kGetSelInfo), Optional(ElementsAre(0, 0x51, 0, 0, 0xFF, 0xFF, 0xFF, 0xFF,
-                                                           0xFF, 0xFF, 0xFF, 0xFF, 0xFF, 0xFF, 0)));
-}
-
-TEST_F(Bmc, InfosCountAndSayTheNewestTime) {
-    description.selVersion = 0x02;
-    description.sdrVersion = 0x15;
-    description.selEntries.assign(0x1234, Entry(7));
-    description.selEntries.back()[2] = 0xE0;  // has no time stamp
-    description.sdrRecords.assign(0x0102, Bytes(300));
-    EXPECT_THAT(Storage(kGetSelInfo),
-                Optional(ElementsAre(0, 0x02, 0x34, 0x12, 0xFF, 0xFF, 0xA3, 0xA4, 0xA5, 0xA6, 0xFF,
-                                     0xFF, 0xFF, 0xFF, 0)));
-    EXPECT_THAT(Storage(0x20), Optional(ElementsAre(0, 0x15, 0x02, 0x01, 0, 0, 0xFF, 0xFF, 0xFF,
-                                                    0xFF, 0xFF, 0xFF, 0xFF, 0xFF, 0x02)));
-}
-
-TEST_F(Bmc, SdrWantsTheLatestReservationForReadsWithAnOffset) {
-    description.sdrRecords = {{0x03, 0x00, 0x51, 0x01, 0x02, 0xB5, 0xB6}, {0x04, 0x01, 0x51}};
-    EXPECT_THAT(Read(kGetSdr, 0, 0, 2), ElementsAre(0, 0x04, 0x01, 0x03, 0x00));
-    EXPECT_THAT(Read(kGetSdr, 0, 5, 2), ElementsAre(0xC5));  // none made yet, and 0 is none
-    EXPECT_THAT(Storage(kReserve), Optional(ElementsAre(0, 1, 0)));
-    EXPECT_THAT(Storage(kReserve), Optional(ElementsAre(0, 2, 0)));
-    EXPECT_THAT(Read(kGetSdr, 3, 5, 2, 1), ElementsAre(0xC5));
-    EXPECT_THAT(Read(kGetSdr, 3, 5, 9, 2), ElementsAre(0, 0x04, 0x01, 0xB5, 0xB6));
-    EXPECT_THAT(Read(kGetSdr, 3, 2, 0xFF, 2), ElementsAre(0, 4, 1, 0x51, 1, 2, 0xB5, 0xB6));
-    EXPECT_THAT(Read(kGetSdr, 3, 7, 1, 2), ElementsAre(0xC9));
-    EXPECT_THAT(Read(kGetSdr, 0x0104, 2, 4, 2), ElementsAre(0, 0xFF, 0xFF, 0x51));
-}
-
-TEST_F(Bmc, RecordsOfNoLengthOrOfOneIdDoNoHarm) {
-    description.sdrRecords = {{}, {0x07}, {0x09, 0x00, 0xA2}, {0x09, 0x00, 0xB2}};
-    EXPECT_THAT(Read(kGetSdr, 0x0000, 0, 0xFF), ElementsAre(0xC9));
-    EXPECT_THAT(Read(kGetSdr, 0x0007, 0, 0xFF), ElementsAre(0, 0x09, 0x00, 0x07));
-    EXPECT_THAT(Read(kGetSdr, 0x0009, 0, 0xFF), ElementsAre(0, 0x09, 0x00, 0x09, 0x00, 0xA2));
-}
-
-TEST_F(Bmc, FruAnswersItsSizeAndAtMostTheCount) {
-    description.fru[3] = {0xD0, 0xD1, 0xD2, 0xD3};
-    description.fru[4] = Bytes(0x0102);
-    EXPECT_THAT(Storage(0x10, {3}), Optional(ElementsAre(0, 4, 0, 0)));
-    EXPECT_THAT(Storage(0x10, {4}), Optional(ElementsAre(0, 0x02, 0x01, 0)));
-    EXPECT_THAT(Storage(0x10, {9}), Optional(ElementsAre(0xCB)));
-    EXPECT_THAT(Storage(0x11, {3, 1, 0, 2}), Optional(ElementsAre(0, 2, 0xD1, 0xD2)));
-    EXPECT_THAT(Storage(0x11, {3, 3, 0, 16}), Optional(ElementsAre(0, 1, 0xD3)));
-    EXPECT_THAT(Storage(0x11, {3, 4, 0, 16}), Optional(ElementsAre(0xC9)));
-    EXPECT_THAT(Storage(0x11, {3, 0, 1, 16}), Optional(ElementsAre(0xC9)));
-    EXPECT_THAT(Storage(0x11, {4, 0, 1, 16}), Optional(ElementsAre(0, 2, 0, 0)));
-    EXPECT_THAT(Storage(0x11, {0, 0, 0, 16}), Optional(ElementsAre(0xCB)));
-}
-
-TEST_F(Bmc, WhatIsNotDescribedIsNoCommand) {
-    description.replies = {{kStorage, 0x5B, {0x01}, {0x12, 0x34}}, {0x2E, 0x00, {}, {0x56}}};
-    SimulatedBmc bmc(description);
-    const struct {
-        std::uint8_t netFn, command;
-        Bytes data, answer;
-    } cases[] = {
-        {0x06, 0x01, {}, {0xC1}},
-        {kStorage, 0x5A, {0x01}, {0xC1}},
-        {kStorage, 0x42, {}, {0xC1}},
-        {0x06, 0x40, {}, {0xC1}},  // of another NetFn
-        {kStorage, 0x5B, {0x01, 0x77}, {0x00, 0x12, 0x34}},
-        {kStorage, 0x5B, {0x02}, {0xC1}},
-        {kStorage, 0x5B, {}, {0xC1}},
-        {0x2E, 0x00, {0x99}, {0x00, 0x56}},
-        {kStorage, kGetSelEntry, {0, 0, 0, 0, 0}, {0xC7}},
-    };
-    for (const auto& c : cases) {
-        EXPECT_EQ(bmc.Execute(c.netFn, 0, c.command, c.data), c.answer)
-            << int{c.netFn} << " " << int{c.command};
+void Expect(SimulatedBmc& bmc, std::initializer_list<Case> cases) {
+    for (const Case& c : cases) {
+        Bytes request;
+        const auto values = ipmisel::ScanHexRow(c.request, 16);
+        request.assign(values->begin(), values->end());
+        const auto answer = bmc.Execute(request[0], 0, request[1], std::span(request).subspan(2));
+        std::string text = answer ? DumpBytes(*answer, ipmisel::Digits::kLowerHex) : "none ";
+        text.pop_back();
+        EXPECT_EQ(text, c.answer) << c.request;
     }
 }
 
-TEST_F(Bmc, DescribedValuesAreAnswered) {
-    description.deviceId = {0x20, 0x01, 0x02};
-    description.selTime = 0x65E70340;
-    description.auxLogCount = 0x1234;
-    EXPECT_THAT(Storage(0x48), Optional(ElementsAre(0, 0x40, 0x03, 0xE7, 0x65)));
-    // Bytes 16 and 17 of the reply frame, whose byte 8 is the completion code.
-    EXPECT_THAT(Storage(0x5A, {1}), Optional(ElementsAre(0, 0, 0, 0, 0, 0, 0, 0, 0x34, 0x12)));
-    EXPECT_THAT(SimulatedBmc(description).Execute(0x06, 0, 0x01, {}),
-                Optional(ElementsAre(0, 0x20, 0x01, 0x02)));
+/// The BMC that a description of a simulated server's one BMC makes.
+SimulatedBmc Bmc(const std::string& json) {
+    return SimulatedBmc(ParseServer("{\"bmcs\": [" + json + "]}", "test").bmcs.front());
 }
 
-TEST_F(Bmc, FaultsStrikeTheCallTheyName) {
-    description.selEntries = {Entry(1)};
-    description.selTime = 0x44332211;
-    auto code = MakeFault(0x48, 2, Fault::Kind::kCompletionCode);
-    code.completionCode = 0xC3;
-    auto cut = MakeFault(0x48, 3, Fault::Kind::kTruncate);
-    cut.truncate = 2;
-    auto data = MakeFault(0x48, 4, Fault::Kind::kData);
-    data.data = {0x99};
-    auto wide = MakeFault(0x48, 5, Fault::Kind::kTruncate);
-    wide.truncate = 99;
-    description.faults = {
-        MakeFault(0x48, 1, Fault::Kind::kNoResponse),        code, cut, data, wide,
-        MakeFault(kGetSelInfo, {}, Fault::Kind::kNoResponse)};
-    EXPECT_EQ(Storage(0x48), std::nullopt);
-    EXPECT_THAT(Storage(0x48), Optional(ElementsAre(0xC3)));
-    EXPECT_EQ(Storage(kGetSelInfo), std::nullopt);
-    EXPECT_THAT(Storage(0x48), Optional(ElementsAre(0, 0x11, 0x22)));
-    EXPECT_THAT(Storage(0x48), Optional(ElementsAre(0, 0x99)));
-    EXPECT_THAT(Storage(0x48), Optional(ElementsAre(0, 0x11, 0x22, 0x33, 0x44)));
-    EXPECT_THAT(Storage(0x48), Optional(ElementsAre(0, 0x11, 0x22, 0x33, 0x44)));
-    EXPECT_EQ(Storage(kGetSelInfo), std::nullopt);
+TEST(SimulatedBmc, SelEntriesAreFoundByIdChainedAndReadInParts) {
+    auto bmc = Bmc(R"({"sel": {"version": "02", "time": 1709640000, "entries": [
+        "1000 02 a3a4a5a6 a7a8 a9 aa ab ac ad ae af", "0302 02 b3b4b5b6 b7b8 b9 ba bb bc bd be bf",
+        "0500 e0 c3c4c5c6 c7c8 c9 ca cb cc cd ce cf"]}})");
+    Expect(bmc,
+           {
+               // The newest time is that of the last record that has one.
+               {"0a 40", "00 02 03 00 ff ff b3 b4 b5 b6 ff ff ff ff 00"},
+               {"0a 48", "00 40 09 e7 65"},
+               {"0a 43 0 0 00 00 0 ff", "00 03 02 10 00 02 a3 a4 a5 a6 a7 a8 a9 aa ab ac ad ae af"},
+               {"0a 43 0 0 10 00 7 3", "00 03 02 a7 a8 a9"},
+               {"0a 43 0 0 03 02 e 9", "00 05 00 be bf"},
+               {"0a 43 0 0 05 00 f ff", "00 ff ff cf"},
+               {"0a 43 0 0 ff ff f 1", "00 ff ff cf"},
+               {"0a 43 0 0 05 00 0 0", "00 ff ff"},
+               {"0a 43 0 0 05 00 10 1", "c9"},
+               {"0a 43 0 0 04 00 0 ff", "cb"},
+               {"0a 43 0 0 05 00 0", "c7"},
+           });
 }
 
-TEST_F(Bmc, LatencyIsKept) {
-    description.latencyMicroseconds = 20'000;
-    const auto before = std::chrono::steady_clock::now();
-    Storage(kGetSelInfo);
-    EXPECT_GE(std::chrono::steady_clock::now() - before, std::chrono::milliseconds(20));
+TEST(SimulatedBmc, SdrWantsTheLatestReservationForReadsWithAnOffset) {
+    auto bmc = Bmc(R"({"sdr": {"version": "15", "records": ["0300 51 01 02 b5 b6", "0401 51"]}})");
+    Expect(bmc, {
+                    {"0a 20", "00 15 02 00 f5 ff ff ff ff ff ff ff ff ff 02"},
+                    {"0a 23 0 0 0 0 0 2", "00 04 01 03 00"},
+                    {"0a 23 0 0 0 0 5 2", "c5"},  // none was made, and 0 is none
+                    {"0a 22", "00 01 00"},
+                    {"0a 22", "00 02 00"},
+                    {"0a 23 1 0 3 0 5 2", "c5"},
+                    {"0a 23 2 0 3 0 5 9", "00 04 01 b5 b6"},
+                    {"0a 23 2 0 3 0 2 ff", "00 04 01 51 01 02 b5 b6"},
+                    {"0a 23 2 0 3 0 7 1", "c9"},
+                    {"0a 23 2 0 4 1 2 4", "00 ff ff 51"},
+                });
 }
 
-TEST_F(Bmc, TheLargestLogIsReadToItsEnd) {
+TEST(SimulatedBmc, OddDescriptionsDoNoHarm) {
+    auto empty = Bmc("{}");
+    Expect(empty, {{"0a 40", "00 51 00 00 ff ff ff ff ff ff ff ff ff ff 00"},
+                   {"0a 43 0 0 0 0 0 ff", "cb"},
+                   {"0a 23 0 0 ff ff 0 ff", "cb"},
+                   {"0a 10 0", "cb"},
+                   {"0a 11 0 0 0 10", "cb"},
+                   {"0a 5a 1", "c1"},
+                   {"0a 42", "c1"},
+                   {"06 01", "c1"},
+                   {"06 40", "c1"}});
+    // Without an ID, with half of one, two of one ID.
+    auto odd = Bmc(R"({"sdr": {"records": ["", "07", "0900 a2", "0900 b2"]}})");
+    Expect(odd, {{"0a 23 0 0 0 0 0 ff", "c9"},
+                 {"0a 23 0 0 7 0 0 ff", "00 09 00 07"},
+                 {"0a 23 0 0 9 0 0 ff", "00 09 00 09 00 a2"}});
+}
+
+TEST(SimulatedBmc, OtherCommandsAnswerWhatIsDescribed) {
+    auto bmc = Bmc(R"({"device_id": "20 01 02", "aux_log": {"count": 4660},
+        "fru": {"3": "d0 d1 d2 d3"},
+        "replies": [{"netfn": "0a", "command": "5b", "request": "01", "response": "12 34"},
+                    {"netfn": "2e", "command": "00", "response": "56"}]})");
+    Expect(bmc, {
+                    {"06 01", "00 20 01 02"},
+                    // Bytes 16 and 17 of the reply frame, whose byte 8 is the completion code.
+                    {"0a 5a 1", "00 00 00 00 00 00 00 00 34 12"},
+                    {"0a 10 3", "00 04 00 00"},
+                    {"0a 11 3 1 0 2", "00 02 d1 d2"},
+                    {"0a 11 3 3 0 10", "00 01 d3"},
+                    {"0a 11 3 4 0 10", "c9"},
+                    {"0a 11 3 0 1 10", "c9"},
+                    {"0a 5b 1 77", "00 12 34"},
+                    {"0a 5b 2", "c1"},
+                    {"0a 5b", "c1"},
+                    {"2e 00 99", "00 56"},
+                });
+}
+
+TEST(SimulatedBmc, FaultsStrikeTheCallTheyName) {
+    auto bmc = Bmc(R"({"sel": {"time": 1144201745}, "faults": [
+        {"netfn": "0a", "command": "48", "call": 1, "no_response": true},
+        {"netfn": "0a", "command": "48", "call": 2, "completion_code": "c3"},
+        {"netfn": "0a", "command": "48", "call": 3, "truncate": 2},
+        {"netfn": "0a", "command": "48", "call": 4, "data": "99"},
+        {"netfn": "0a", "command": "48", "call": 5, "truncate": 99},
+        {"netfn": "0a", "command": "40", "no_response": true}]})");
+    Expect(bmc, {{"0a 48", "none"},
+                 {"0a 48", "c3"},
+                 {"0a 40", "none"},
+                 {"0a 48", "00 11 22"},
+                 {"0a 48", "00 99"},
+                 {"0a 48", "00 11 22 33 44"},
+                 {"0a 48", "00 11 22 33 44"},
+                 {"0a 40", "none"}});
+}
+
+TEST(SimulatedBmc, TheLargestLogIsReadToItsEnd) {
+    BmcDescription description;
     for (unsigned id = 1; id <= 0xFFFE; ++id) {
-        description.selEntries.push_back(Entry(static_cast<std::uint16_t>(id)));
+        description.selEntries.push_back(
+            {static_cast<std::uint8_t>(id), static_cast<std::uint8_t>(id >> 8)});
     }
+    SimulatedBmc bmc(description);
+    Expect(bmc,
+           {{"0a 43 0 0 ff 7f 0 2", "00 00 80 ff 7f"}, {"0a 43 0 0 ff ff 0 2", "00 ff ff fe ff"}});
+    Bytes request(6, 0x00);
     unsigned reads = 0;
-    for (std::uint16_t next = 0; next != 0xFFFF; ++reads) {
-        const Bytes answer = Read(kGetSelEntry, next, 0, 0xFF);
-        ASSERT_EQ(answer.size(), 19u) << next;
-        next = static_cast<std::uint16_t>(answer[1] | answer[2] << 8);
+    for (; request[2] != 0xFF || request[3] != 0xFF; ++reads) {
+        const auto answer = bmc.Execute(0x0A, 0, 0x43, request);
+        ASSERT_TRUE(answer && answer->size() == 3) << reads;
+        request[2] = (*answer)[1];
+        request[3] = (*answer)[2];
     }
     EXPECT_EQ(reads, 0xFFFEu);
 }
