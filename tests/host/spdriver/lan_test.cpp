@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <chrono>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -56,17 +57,13 @@ TEST_F(Lan, APlaceThatCannotBeIsRefusedAtOnce) {
     const struct {
         const char* place;
         const char* reason;
-    } cases[] = {
-        {":623", "no host is named"},
-        {"[]:623", "no host is named"},
-        {"host:", "the port is no number from 1 to 65535"},
-        {"host:0", "the port is no number from 1 to 65535"},
-        {"host:65536", "the port is no number from 1 to 65535"},
-        {"host:6x", "the port is no number from 1 to 65535"},
-        {"::1", "an IPv6 address stands in brackets"},
-        {"[::1", "the address has no closing bracket"},
-        {"[::1]x:623", "something stands between address and port"},
-    };
+    } cases[] = {{":623", "no host is named"},
+                 {"host:", "the port is no number from 1 to 65535"},
+                 {"host:65536", "the port is no number from 1 to 65535"},
+                 {"host:6x", "the port is no number from 1 to 65535"},
+                 {"::1", "an IPv6 address stands in brackets"},
+                 {"[::1", "the address has no closing bracket"},
+                 {"[::1]x:623", "something stands between address and port"}};
     for (const auto& c : cases) {
         EXPECT_THAT(Refusal(c.place), HasSubstr(c.reason)) << c.place;
     }
@@ -74,21 +71,26 @@ TEST_F(Lan, APlaceThatCannotBeIsRefusedAtOnce) {
 }
 
 TEST_F(Lan, AccessThatCannotBeIsRefusedAtOnce) {
+    const struct {
+        std::function<void(SourceOptions*)> change;
+        const char* reason;
+    } cases[] = {
+        {[](auto* o) { o->privilege = "king"; }, "\"king\"; use one of user, operator, admin"},
+        {[](auto* o) {
+             o->workarounds = {"authcap", "magic"};
+         },
+         "\"magic\"; use one of authcap,"},
+        {[](auto* o) { o->cipherSuite = 4; }, "cipher suite 4 is not supported"},
+        {[](auto* o) { o->user = std::string(17, 'u'); }, "user name is longer than the 16 bytes"},
+        {[](auto* o) { o->password = [] { return std::string(21, 'p'); }; },
+         "password is longer than the 20 bytes"},
+    };
     const SourceOptions good = options;
-    options.privilege = "king";
-    EXPECT_THAT(Refusal("127.0.0.1"), HasSubstr("\"king\"; use one of user, operator, admin"));
-    options = good;
-    options.workarounds = {"opensesspriv", "magic"};
-    EXPECT_THAT(Refusal("127.0.0.1"), HasSubstr("\"magic\"; use one of authcap, "));
-    options = good;
-    options.cipherSuite = 4;
-    EXPECT_THAT(Refusal("127.0.0.1"), HasSubstr("cipher suite 4 is not supported"));
-    options = good;
-    options.user = std::string(17, 'u');
-    EXPECT_THAT(Refusal("127.0.0.1"), HasSubstr("user name is longer than the 16 bytes"));
-    options = good;
-    options.password = [] { return std::string(21, 'p'); };
-    EXPECT_THAT(Refusal("127.0.0.1"), HasSubstr("password is longer than the 20 bytes"));
+    for (const auto& c : cases) {
+        options = good;
+        c.change(&options);
+        EXPECT_THAT(Refusal("127.0.0.1"), HasSubstr(c.reason));
+    }
 }
 
 TEST_F(Lan, ANameThatDoesNotResolveAndSilenceAreTold) {
@@ -131,20 +133,24 @@ TEST_F(LanSim, TheLogIsReadFromSeveralNodes) {
     EXPECT_EQ(source.nodes[0]->Exchange(StorageRequest(0x5B)), Response{0xC1});
 }
 
-TEST_F(LanSim, WrongUserPasswordAndSuiteAreToldApart) {
+TEST_F(LanSim, WhatFailsAtTheLogInIsToldApart) {
+    const struct {
+        std::function<void(SourceOptions*)> change;
+        const char* reason;
+    } cases[] = {
+        {[](auto* o) { o->password = [] { return std::string("wrong"); }; }, "wrong password"},
+        {[](auto* o) { o->user = "nobody"; }, "does not know the user name"},
+        {[](auto* o) { o->workarounds.clear(); }, "--workaround opensesspriv"},
+        {[](auto* o) { o->cipherSuite = 17; }, "the BMC"},
+    };
     IpmiSim sim({});
     const SourceOptions good = options;
-    options.password = [] { return std::string("wrong"); };
-    EXPECT_THAT(Refusal(sim.Place()), HasSubstr("wrong password"));
+    for (const auto& c : cases) {
+        options = good;
+        c.change(&options);
+        EXPECT_THAT(Refusal(sim.Place()), HasSubstr(c.reason));
+    }
     options = good;
-    options.user = "nobody";
-    EXPECT_THAT(Refusal(sim.Place()), HasSubstr("does not know the user name"));
-    options = good;
-    options.workarounds.clear();
-    EXPECT_THAT(Refusal(sim.Place()), HasSubstr("--workaround opensesspriv"));
-    options = good;
-    options.cipherSuite = 17;
-    EXPECT_NE(Refusal(sim.Place()), "");
     options.cipherSuite = 3;
     EXPECT_EQ(Refusal(sim.Place()), "");
 }

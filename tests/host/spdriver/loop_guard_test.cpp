@@ -2,64 +2,49 @@
 
 #include <gtest/gtest.h>
 
-#include <map>
 #include <memory>
+#include <utility>
 #include <vector>
 
 #include "tests/host/spdriver/requests.h"
+#include "tests/support/bmc_fixture.h"
 
 namespace {
 
 using ipmiseltest::ReadRequest;
 using ipmiseltest::StorageRequest;
-using tqrhost::Response;
 
-constexpr std::uint8_t kSel = 0x43, kSdr = 0x23, kSelInfo = 0x40, kSdrInfo = 0x20, kReserve = 0x22;
+constexpr std::uint8_t kSel = 0x43, kSdr = 0x23;
 
-/// What one read of a record gives: the ID that it has itself and the next.
-struct Link {
-    std::uint16_t own, next;
-    std::uint8_t completionCode = 0;
-    bool silent = false;
-};
-
-/// A BMC that chains its records as it is told, by the ID asked for.
-class ChainedTransport : public tqrhost::Transport {
-public:
-    ChainedTransport(const std::map<std::uint16_t, Link>* links, unsigned* asked)
-        : links_(links), asked_(asked) {}
-    std::optional<Response> Exchange(const tqrhost::RequestFrame& request) override {
-        ++*asked_;
-        if (request.command() != kSel && request.command() != kSdr) return Response{0x00};
-        const auto data = request.data();
-        if (data.size() < 5) return Response{0xC7};
-        const Link& link = links_->at(static_cast<std::uint16_t>(data[2] | data[3] << 8));
-        if (link.silent) return std::nullopt;
-        if (link.completionCode != 0) return Response{link.completionCode};
-        const auto low = [](std::uint16_t id) { return static_cast<std::uint8_t>(id); };
-        const auto high = [](std::uint16_t id) { return static_cast<std::uint8_t>(id >> 8); };
-        return Response{0, low(link.next), high(link.next), low(link.own), high(link.own)};
-    }
-
-private:
-    const std::map<std::uint16_t, Link>* links_;
-    unsigned* asked_;
-};
-
+/// Both walks over a BMC whose records have the given IDs; of two with one ID the first is found,
+/// so that a repeated ID closes a circle.
 class Guard : public ::testing::TestWithParam<std::uint8_t> {
 protected:
-    std::map<std::uint16_t, Link> links;
-    unsigned asked = 0;
-    tqrhost::LoopGuard guard{std::make_unique<ChainedTransport>(&links, &asked)};
+    std::vector<std::vector<std::uint8_t>> asked;
+    std::unique_ptr<tqrhost::LoopGuard> guard;
 
-    std::optional<Response> Read(std::uint16_t id, std::uint8_t offset = 0) {
-        return guard.Exchange(ReadRequest(GetParam(), id, offset));
+    void Records(const std::vector<std::uint16_t>& ids, std::vector<ipmisim::Fault> faults = {}) {
+        ipmisim::BmcDescription bmc;
+        for (const std::uint16_t id : ids) {
+            const auto low = static_cast<std::uint8_t>(id),
+                       high = static_cast<std::uint8_t>(id >> 8);
+            bmc.selEntries.push_back({low, high});
+            bmc.sdrRecords.push_back({low, high, 0x51, 0x01, 0x00});
+        }
+        bmc.faults = std::move(faults);
+        guard = std::make_unique<tqrhost::LoopGuard>(
+            std::make_unique<ipmiseltest::SimulatedTransport>(bmc, &asked));
     }
-    void Send(std::uint8_t command) { guard.Exchange(StorageRequest(command)); }
+    bool Read(std::uint16_t id, std::uint8_t command = GetParam()) {
+        const auto answer = guard->Exchange(ReadRequest(command, id));
+        return answer && answer->front() == 0;
+    }
+    void Send(std::uint8_t command) { guard->Exchange(StorageRequest(command)); }
     /// Reads along the chain; the number of records that were given.
-    unsigned Walk(std::uint16_t id = 0) {
+    unsigned Walk() {
+        std::uint16_t id = 0;
         for (unsigned given = 0; given < 10; ++given) {
-            const auto answer = Read(id);
+            const auto answer = guard->Exchange(ReadRequest(GetParam(), id));
             if (!answer || answer->front() != 0) return given;
             id = static_cast<std::uint16_t>((*answer)[1] | (*answer)[2] << 8);
             if (id == 0xFFFF) return given + 1;
@@ -70,79 +55,69 @@ protected:
 
 INSTANTIATE_TEST_SUITE_P(Commands, Guard, ::testing::Values(kSel, kSdr));
 
-TEST_P(Guard, ACircleIsCutAtTheFirstRecordGivenTwice) {
+TEST_P(Guard, AWalkGivesEachRecordOnceAndCanBeMadeAgain) {
     const struct {
         const char* what;
-        std::map<std::uint16_t, Link> links;
+        std::vector<std::uint16_t> ids;
         unsigned given;
-    } cases[] = {
-        {"back to the middle", {{0, {1, 2}}, {2, {2, 3}}, {3, {3, 2}}}, 3},
-        {"back to the first by its own ID", {{0, {1, 2}}, {2, {2, 1}}, {1, {1, 2}}}, 2},
-        {"back to the first by 0x0000", {{0, {1, 2}}, {2, {2, 0}}}, 2},
-        {"on the spot", {{0, {1, 2}}, {2, {2, 2}}}, 2},
-    };
+    } cases[] = {{"no circle", {1, 2, 3}, 3},
+                 {"back to the middle", {1, 2, 3, 2}, 3},
+                 {"back to the first by its own ID", {1, 2, 1}, 2},
+                 {"back to the first by 0x0000", {1, 2, 0}, 2},
+                 {"on the spot", {1, 2, 2}, 2}};
     for (const auto& c : cases) {
-        links = c.links;
+        Records(c.ids);
         EXPECT_EQ(Walk(), c.given) << c.what;
-        // A refused read ends the walk, so that the next one gets as far.
         EXPECT_EQ(Walk(), c.given) << c.what;
     }
-}
-
-TEST_P(Guard, AWholeWalkCanBeMadeAgain) {
-    links = {{0, {1, 2}}, {2, {2, 3}}, {3, {3, 0xFFFF}}};
-    EXPECT_EQ(Walk(), 3u);
-    EXPECT_EQ(Walk(), 3u);
-    EXPECT_EQ(asked, 6u);
 }
 
 TEST_P(Guard, AFailedReadEndsTheWalk) {
-    for (const Link failure : {Link{0, 0, 0xCB}, Link{0, 0, 0, true}}) {
-        links = {{0, {1, 2}}, {2, failure}};
+    for (const auto kind :
+         {ipmisim::Fault::Kind::kNoResponse, ipmisim::Fault::Kind::kCompletionCode}) {
+        Records({1, 2, 3}, {{0x0A, GetParam(), 2, kind, 0xCB, 0, {}}});
         EXPECT_EQ(Walk(), 1u);
-        EXPECT_EQ(Walk(), 1u);
+        EXPECT_EQ(Walk(), 3u);
     }
 }
 
-TEST_P(Guard, TheCommandThatBeginsAWalkForgetsTheLast) {
-    links = {{0, {1, 2}}, {2, {2, 3}}};
+TEST_P(Guard, TheCommandsThatBeginAWalkForgetTheLast) {
     const bool isSel = GetParam() == kSel;
-    EXPECT_TRUE(Read(0) && Read(2));
-    Send(isSel ? kReserve : kSelInfo);  // the other walk's
-    EXPECT_FALSE(Read(2));
-    EXPECT_TRUE(Read(0) && Read(2));
-    Send(isSel ? kSelInfo : kReserve);
-    EXPECT_TRUE(Read(0) && Read(2));
-    if (!isSel) {
-        Send(kSdrInfo);
+    for (const std::uint8_t begin : {isSel ? 0x40 : 0x22, isSel ? 0x40 : 0x20}) {
+        Records({1, 2, 3});
+        EXPECT_TRUE(Read(0) && Read(2));
+        Send(isSel ? 0x22 : 0x40);  // begins the other walk
+        EXPECT_FALSE(Read(2));
+        EXPECT_TRUE(Read(0) && Read(2));
+        Send(begin);
         EXPECT_TRUE(Read(0) && Read(2));
     }
 }
 
-TEST_P(Guard, PartsOfOneRecordAreReadsOfTheirOwn) {
-    links = {{0, {1, 0xFFFF}}};
-    EXPECT_TRUE(Read(0) && Read(0, 20) && Read(0, 47));
-    EXPECT_FALSE(Read(0, 20));
+TEST_P(Guard, OtherPartsOfTheLastRecordAreGivenAfterIt) {
+    Records({1});
+    Send(0x22);
+    const auto part = [](std::uint8_t offset) {
+        return StorageRequest(GetParam(), {1, 0, 0, 0, offset, 1});
+    };
+    EXPECT_TRUE(guard->Exchange(part(0)) && guard->Exchange(part(2)) && guard->Exchange(part(3)));
+    EXPECT_FALSE(guard->Exchange(part(2)));
 }
 
 TEST_P(Guard, WhatIsNoReadOfARecordGoesThrough) {
-    links = {{0, {1, 2}}};
+    Records({1, 2});
     for (int i = 0; i < 3; ++i) {
-        EXPECT_TRUE(guard.Exchange(StorageRequest(0x11, {0, 0, 0, 16})));
-        EXPECT_EQ(guard.Exchange(StorageRequest(GetParam(), {0, 0, 0})), Response{0xC7});
+        EXPECT_TRUE(guard->Exchange(StorageRequest(0x11, {0, 0, 0, 16})));
+        EXPECT_TRUE(guard->Exchange(StorageRequest(GetParam(), {0, 0, 0})));
     }
+    EXPECT_EQ(asked.size(), 6u);
 }
 
 // A walk over the event log ends at any next record ID of 0xFFxx; the locator walk goes on.
-TEST(LoopGuard, OnlyTheEventLogEndsAtAnyHighByteFf) {
-    const std::map<std::uint16_t, Link> links{{0, {1, 0xFF10}}, {0xFF10, {0xFF10, 0}}};
-    unsigned asked = 0;
-    tqrhost::LoopGuard guard(std::make_unique<ChainedTransport>(&links, &asked));
-    EXPECT_TRUE(guard.Exchange(ReadRequest(kSel, 0)));
-    EXPECT_TRUE(guard.Exchange(ReadRequest(kSel, 0)));
-    EXPECT_TRUE(guard.Exchange(ReadRequest(kSdr, 0)));
-    EXPECT_TRUE(guard.Exchange(ReadRequest(kSdr, 0xFF10)));
-    EXPECT_FALSE(guard.Exchange(ReadRequest(kSdr, 0)));
+TEST_P(Guard, OnlyTheEventLogEndsAtAHighByteFf) {
+    Records({1, 0xFF10, 2});
+    EXPECT_TRUE(Read(0));
+    EXPECT_EQ(Read(0), GetParam() == kSel);
 }
 
 }  // namespace
