@@ -75,6 +75,13 @@ std::string ErrorAdvice(const std::string& place, int error) {
            ipmi_ctx_strerror(error) + "); check how it is reached";
 }
 
+void LogNoResponse(const RequestFrame& request, const char* why) {
+    if (!ipmisel::LogEnabled(ipmisel::kNotice)) return;
+    ipmisel::WriteLog(ipmisel::kNotice,
+                      ipmisel::Format("No response to NetFn 0x%02x command 0x%02x: %s.",
+                                      request.netFn(), request.command(), why));
+}
+
 std::optional<Response> FreeIpmiTransport::Exchange(const RequestFrame& request) {
     // FreeIPMI's raw form: command and data there; command, completion code and data back.
     std::vector<std::uint8_t> out{request.command()};
@@ -84,13 +91,8 @@ std::optional<Response> FreeIpmiTransport::Exchange(const RequestFrame& request)
                                     static_cast<unsigned>(out.size()), in.data(),
                                     static_cast<unsigned>(in.size()));
     if (length < 2) {
-        if (ipmisel::LogEnabled(ipmisel::kNotice)) {
-            ipmisel::WriteLog(ipmisel::kNotice,
-                              ipmisel::Format("No response to NetFn 0x%02x command 0x%02x: %s.",
-                                              request.netFn(), request.command(),
-                                              length < 0 ? ipmi_ctx_errormsg(context_.get())
-                                                         : "the answer is too short"));
-        }
+        LogNoResponse(request,
+                      length < 0 ? ipmi_ctx_errormsg(context_.get()) : "the answer is too short");
         return std::nullopt;
     }
     return Response(in.begin() + 1, in.begin() + length);

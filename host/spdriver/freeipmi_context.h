@@ -24,6 +24,9 @@ FreeIpmiContext MakeContext();
 /// One line for the user: what failed at `place` and what to do, for an error number of FreeIPMI.
 std::string ErrorAdvice(const std::string& place, int error);
 
+/// One notice line of the host's own.
+void LogNoResponse(const RequestFrame& request, const char* why);
+
 /// The BMC at the other end of an open context.
 class FreeIpmiTransport : public Transport {
 public:

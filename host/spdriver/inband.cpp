@@ -65,7 +65,7 @@ Source OpenInbandDevice(const std::vector<std::filesystem::path>& devices,
     return source;
 }
 
-Source OpenInband(const std::string& /*place*/, const SourceOptions& /*options*/) {
+Source OpenInband(const std::vector<std::string>& /*places*/, const SourceOptions& /*options*/) {
     return OpenInbandDevice({"/dev/ipmi0", "/dev/ipmi/0", "/dev/ipmidev/0"}, ReadSystemSmbios());
 }
 

@@ -6,26 +6,27 @@
 
 #include "host/spdriver/transport.h"
 
-// The kinds of source, one file each. `place` is what follows the name of the kind. All throw
-// SourceError.
+// The kinds of source, one file each. `places` is what follows the name of the kind: one, or for a
+// kind that joins several. All throw SourceError.
 
 namespace tqrhost {
 
-/// A simulated server that the file `place` describes.
-Source OpenSimulated(const std::string& place, const SourceOptions& options);
-/// The exchanges of the capture file `place`.
-Source OpenReplay(const std::string& place, const SourceOptions& options);
+/// A simulated server that a file describes.
+Source OpenSimulated(const std::vector<std::string>& places, const SourceOptions& options);
+/// The exchanges of a capture file.
+Source OpenReplay(const std::vector<std::string>& places, const SourceOptions& options);
 
 #ifdef IPMISEL_FREEIPMI
 /// This machine's BMC through the kernel's driver.
-Source OpenInband(const std::string& place, const SourceOptions& options);
+Source OpenInband(const std::vector<std::string>& places, const SourceOptions& options);
 /// The same over given device files and SMBIOS structures. Without a device, but with an IPMI
 /// device record (type 38), the source opens with a node that never answers, so that the missing
 /// driver can be reported.
 Source OpenInbandDevice(const std::vector<std::filesystem::path>& devices,
                         std::vector<std::vector<std::uint8_t>> smbios);
-/// A BMC over the network: HOST, HOST:PORT, [ADDRESS] or [ADDRESS]:PORT.
-Source OpenLan(const std::string& place, const SourceOptions& options);
+/// BMCs over the network, each HOST, HOST:PORT, [ADDRESS] or [ADDRESS]:PORT. The sessions are
+/// opened together.
+Source OpenLan(const std::vector<std::string>& places, const SourceOptions& options);
 #endif
 
 }  // namespace tqrhost

@@ -110,7 +110,8 @@ void ReadExchange(const JsonValue& line,
 
 }  // namespace
 
-Source OpenReplay(const std::string& place, const SourceOptions& /*options*/) {
+Source OpenReplay(const std::vector<std::string>& places, const SourceOptions& /*options*/) {
+    const std::string& place = places.front();
     Source source;
     std::vector<std::unique_ptr<ReplayTransport>> nodes;
     std::size_t number = 0;

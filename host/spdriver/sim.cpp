@@ -24,7 +24,8 @@ private:
 
 }  // namespace
 
-Source OpenSimulated(const std::string& place, const SourceOptions& /*options*/) {
+Source OpenSimulated(const std::vector<std::string>& places, const SourceOptions& /*options*/) {
+    const std::string& place = places.front();
     ipmisim::ServerDescription server;
     try {
         server = ipmisim::ReadServerFile(place);

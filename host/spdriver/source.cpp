@@ -17,7 +17,8 @@ struct Kind {
     std::string_view name;   ///< with its colon where a place follows
     std::string_view usage;  ///< as the user writes it
     bool joins;              ///< several of them make one machine
-    Source (*open)(const std::string& place, const SourceOptions& options);
+    /// One place, or several of a kind that joins: their nodes follow each other.
+    Source (*open)(const std::vector<std::string>& places, const SourceOptions& options);
 };
 
 // What is not built in has no line here.
@@ -73,14 +74,10 @@ Source OpenSources(const std::vector<std::string>& sources, const SourceOptions&
         throw SourceError("the source \"" + source +
                           "\" stands alone; only several of the kind lan: make one machine");
     }
-    Source machine;
-    for (const std::string& source : sources) {
-        const Kind& kind = FindKind(source);
-        Source part = kind.open(PlaceOf(source, kind), askOnce);
-        if (machine.nodes.empty()) machine.facts = std::move(part.facts);
-        std::move(part.nodes.begin(), part.nodes.end(), std::back_inserter(machine.nodes));
-    }
-    return machine;
+    const Kind& kind = FindKind(sources.front());
+    std::vector<std::string> places;
+    for (const std::string& source : sources) places.push_back(PlaceOf(source, kind));
+    return kind.open(places, askOnce);
 }
 
 #ifndef IPMISEL_FREEIPMI
