@@ -8,7 +8,8 @@ using namespace ipmisel;
 
 namespace {
 
-// Compatibility: the line speaks of the system event log (AuxLog.CompletionCodeFailsWithCountZero).
+// Compatibility: the line speaks of the system event log
+// (Exchange.EveryCommandReportsNoAnswerAndCompletionCodes).
 constexpr IPMICommand kGetAuxLogStatus{
     .command = 0x5A,
     .sendFailure = "Failure in sending command to obtain AUX Log Status.",

@@ -1,0 +1,164 @@
+#include "ipmi/ipmi_message.h"
+
+#include <filesystem>
+#include <functional>
+
+#include "ipmi/diff_time.h"
+#include "ipmi/request_aux_log.h"
+#include "ipmi/request_sdr.h"
+#include "ipmi/request_sel.h"
+#include "tests/support/bmc_fixture.h"
+
+namespace {
+
+using namespace ipmisel;
+using ::testing::ElementsAre;
+using ::testing::Pair;
+
+TEST(CompletionCodes, HaveTheirTexts) {
+    const std::pair<int, const char*> cases[] = {
+        {0x80, "Unknown error\n"},
+        {0xBF, "Unknown error\n"},
+        {0xC0, "Node Busy."},
+        {0xC5, "Reservation Canceled or Invalid Reservation ID."},
+        {0xC7, "Request data length"},
+        {0xD4, "Cannot execute command. Insufficient privilege level."},
+        {0xD3, "Destination unavailable."},
+        {0xD6, "Unknown error\n"},
+        {0xFF, "Unknown error\n"},
+    };
+    for (const auto& [code, text] : cases) {
+        EXPECT_EQ(CompletionCodeText(static_cast<std::uint8_t>(code), true), text) << code;
+    }
+    EXPECT_EQ(CompletionCodeText(0x81, true), "Cannot execute command, SEL erase in progress.\n");
+    EXPECT_EQ(CompletionCodeText(0x81, false), "Unknown error\n");
+    EXPECT_EQ(IPMIMessage::GetNetFnLun(0x0A, 0x07), 0x2B);
+}
+
+class Exchange : public ipmiseltest::BmcTest {
+protected:
+    unsigned count = 77;
+    s_SEL_row row = {};
+    unsigned char info[kSdrInfoTextLength] = {};
+    s_SDR_entry entry = {};
+    NQORTQR20::TCIMDateTime difference;
+    bool notBehind = false;
+
+    unsigned SelInfo() { return IPMIRequestSEL(Library()).IPMIGetSELInfo(nullptr, &count); }
+    unsigned AuxStatus() { return IPMIRequestAuxLog(Library()).IPMIGetAuxLogStatus(&count); }
+};
+
+TEST_F(Exchange, SelInfoInFull) {
+    ipmisim::Fault answer;
+    answer.netFn = 0x0A;
+    answer.command = 0x40;
+    answer.kind = ipmisim::Fault::Kind::kData;
+    answer.data = {0x51, 0x34, 0x12, 0xEE};
+    bmc.faults = {answer};
+    EXPECT_EQ(SelInfo(), kOk);
+    EXPECT_EQ(count, 4660U);
+    ASSERT_EQ(requests.size(), 1U);
+    EXPECT_EQ(DumpBytes(requests[0], Digits::kUpperHex),
+              "01 20 0A 00 40 00 00 00 00 00 00 00 00 00 00 ");
+    EXPECT_THAT(log.All(), ElementsAre(Pair(4, "IPMIRequestSEL::IPMIGetSELInfo() entered."),
+                                       Pair(4,
+                                            "Contents of buffer to send (rspBuf):\n\t1 32 10 0 64 "
+                                            "\n\t0 0 0 0 0 \n\t0 0 0 0 0 "),
+                                       Pair(4, "IPMIGetSELInfo::tempbuf = 00 51 34 12 EE \n"),
+                                       Pair(4, "IPMIGetSELInfo::num_SELentries = 4660"),
+                                       Pair(4, "IPMIRequestSEL::IPMIGetSELInfo() completed.")));
+}
+
+TEST_F(Exchange, AuxLogStatusInFull) {
+    bmc.auxLogCount = 0x1234;
+    EXPECT_EQ(AuxStatus(), kOk);
+    EXPECT_EQ(count, 4660U);
+    const std::string name = "IPMIRequestAuxLog::IPMI";
+    EXPECT_THAT(log.All(), ElementsAre(Pair(3, name + "RequestAuxLog() Constructor entered.\n"),
+                                       Pair(3, name + "RequestAuxLog() Constructor exited.\n"),
+                                       Pair(3, name + "GetAuxLogStatus() entered.\n"),
+                                       Pair(4,
+                                            "Contents of buffer to send (rspBuf):\n\t1 32 10 0 90 "
+                                            "\n\t1 0 0 0 1 \n\t0 0 0 0 0 "),
+                                       Pair(3,
+                                            "IPMIRequestAuxLog::Response Length = 9\n"
+                                            "rspBuf = 00 00 00 00 00 00 00 00 34 12 "),
+                                       Pair(3, name + "GetAuxLogStatus() exited.\n")));
+}
+
+TEST_F(Exchange, WrongSelVersionFails) {
+    bmc.selVersion = 0x02;
+    EXPECT_EQ(SelInfo(), kFailed);
+    EXPECT_EQ(count, 77U);
+    EXPECT_THAT(log.Lines(kError),
+                ElementsAre("The SEL Version does not match the Current IPMI Version\n"));
+}
+
+// No operation has a completed line when its command fails.
+TEST_F(Exchange, EveryCommandReportsNoAnswerAndCompletionCodes) {
+    const struct {
+        std::uint8_t command;
+        std::function<unsigned()> run;
+        std::string notSent;  // after "Failure in sending command to "
+        std::string prefix;   // after "IPMI error in "
+        bool erase;
+    } cases[] = {
+        {0x40, [&] { return SelInfo(); }, "obtain SEL info.",
+         "obtaining system event log info: ", true},
+        {0x43, [&] { return IPMIRequestSEL(Library()).IPMIGetSELEntry(nullptr, &row, 1); },
+         "obtain SEL Entry.", "obtaining system event log entry: ", true},
+        {0x20, [&] { return IPMIRequestSDR(Library()).IPMIGetSDRInfo(nullptr, info); },
+         "obtain SDR info.", "obtaining sensor data record info: ", false},
+        {0x22, [&] { return IPMIRequestSDR(Library()).IPMIReserveSDR(nullptr); }, "reserve SDR.",
+         "reserving sensor data record: ", false},
+        {0x23, [&] { return IPMIRequestSDR(Library()).IPMIGetSDRHeader(nullptr, &entry); },
+         "obtain SDR Header.", "obtaining sensor data record header: ", false},
+        {0x23, [&] { return IPMIRequestSDR(Library()).IPMIGetSDRUnits(nullptr, &entry); },
+         "obtain SDR Units.", "obtaining sensor data record units: ", false},
+        {0x23, [&] { return IPMIRequestSDR(Library()).IPMIGetSDRString(nullptr, &entry); },
+         "obtain SDR String.", "obtaining sensor data record string: ", false},
+        {0x5A, [&] { return AuxStatus(); }, "obtain AUX Log Status.",
+         "obtaining system event log info: ", false},
+        {0x48, [&] { return GetDiffTime(nullptr, &difference, &notBehind, Library()); },
+         "obtain system event log device time.", "obtaining system event log device time: ", false},
+    };
+    for (const std::uint8_t command : {0x40, 0x43, 0x20, 0x22, 0x23, 0x5A, 0x48}) {
+        const unsigned uses = command == 0x23 ? 3 : 1;
+        for (unsigned use = 0; use < uses; ++use) {
+            Silence(command, 3 * use + 1);
+            FailWith(command, 3 * use + 2, 0x81);
+            FailWith(command, 3 * use + 3, 0xC5);
+        }
+    }
+    for (const auto& c : cases) {
+        log.Clear();
+        for (int i = 0; i < 3; ++i) EXPECT_EQ(c.run(), kFailed) << c.notSent;
+        EXPECT_THAT(log.Lines(kError), ElementsAre("Failure in sending command to " + c.notSent));
+        EXPECT_THAT(log.Lines(kWarning),
+                    ElementsAre("IPMI error in " + c.prefix +
+                                    (c.erase ? "Cannot execute command, SEL erase in progress.\n"
+                                             : "Unknown error\n"),
+                                "IPMI error in " + c.prefix +
+                                    "Reservation Canceled or Invalid Reservation ID."));
+        EXPECT_EQ(log.Lines(kTrace).back().find("Contents of buffer"), 0U) << c.notSent;
+    }
+    EXPECT_EQ(count, 0U) << "of the auxiliary log, whose operation clears it first";
+    EXPECT_EQ(difference.ToString(), NQORTQR20::TCIMDateTime().ToString());
+}
+
+TEST(DebugFiles, OpenAndClose) {
+    const auto before = std::filesystem::current_path();
+    std::filesystem::current_path(testing::TempDir());
+    IPMIRequestSDR sdr(nullptr);
+    EXPECT_EQ(sdr.IPMIOpenFile(nullptr), kOk);
+    EXPECT_EQ(sdr.IPMICloseFile(nullptr), kOk);
+    EXPECT_TRUE(std::filesystem::remove("sdr.out"));
+    std::filesystem::current_path(before);
+    ipmiseltest::LogRecorder log;
+    EXPECT_EQ(sdr.IPMICloseFile(nullptr), kFailed);
+    EXPECT_THAT(log.All(), ElementsAre(Pair(4, "IPMIRequestSDR::IPMICloseFile() entered."),
+                                       Pair(0, "Could not close file SDR_FILE"),
+                                       Pair(4, "Could not close file SDR_FILE")));
+}
+
+}  // namespace
