@@ -8,7 +8,6 @@
 #include <limits>
 
 #include "host/spdriver/transport.h"
-#include "ipmi/diff_time.h"
 #include "ipmi/request_aux_log.h"
 #include "ipmi/request_sdr.h"
 #include "ipmi/request_sel.h"
