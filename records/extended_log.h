@@ -13,9 +13,9 @@ class IPMIExtendedSELDataEntry {
 public:
     void SetType(unsigned char type);
     void SetSeverity(unsigned char severity);
-    void SetOperation(const unsigned char* operation);  ///< two bytes
-    void SetSubclass(unsigned char subclass);           ///< stores the byte only
-    void SetClass(unsigned char classCode);             ///< after SetSubclass: makes both texts
+    void SetOperation(const unsigned char* operation);   ///< two bytes
+    void SetSubclass(unsigned char subclass);            ///< stores the byte only
+    void SetClass(unsigned char classCode);              ///< after SetSubclass: makes both texts
     void SetFRUInstance(const unsigned char* instance);  ///< four bytes
     void SetGUID(const unsigned char* guid);             ///< ten bytes
     void SetExtendedData(std::string text);

@@ -28,11 +28,12 @@ public:
     int ScanSDRDataFile(NQORTQR20::TCPluginCallbacks* context, std::FILE* unused,
                         const unsigned char* headerText, const unsigned char* unitsText,
                         const unsigned char* stringText);
-    /// A variant that scans a header line only. No step of the collection calls it.
+    /// A variant that scans a header line of a file only; 0, or 1 when there is none. No step of
+    /// the collection calls it.
     int ScanSDRDataFile_Test(NQORTQR20::TCPluginCallbacks* context, std::FILE* file);
 
-    /// Texts of a sensor: ID string, entity name, entity instance. `this` may stand for no sensor:
-    /// see the static form. Always 0. No step of the collection calls it.
+    /// Texts of a sensor: ID string, entity name, entity instance; empty ones for a null entry.
+    /// Always 0. No step of the collection calls it.
     static int GetSensorSDREntities(const IPMISDREntry* entry,
                                     NQORTQR20::TCPluginCallbacks* context, IPMIMapping* mapping,
                                     char* idString, char* entityName, char* entityInstance,
@@ -65,12 +66,18 @@ public:
 /// The sensor cache: owned entries, last record of the repository first.
 using SDRCache = std::list<IPMISDREntry*>;
 
-/// Fills the cache from the texts; `first` becomes its last element, owned by the cache from then
-/// on. 1 when the repository information is bad, else 0. See the source for what stays out.
+/// Fills the cache from the texts, up to the first one that is empty. 1 when the repository
+/// information is bad, else 0.
+///
+/// `first` takes the first record and is the cache's own from then on; it stays the caller's when
+/// the cache does not hold it afterwards (bad information, no record, an empty first text). The
+/// entries of the other records are made here and belong to the cache.
 int CreateSDRCache(NQORTQR20::TCPluginCallbacks* context, IPMISDREntry* first, SDRCache* cache,
                    const std::vector<s_SDR_entry>* entries, const unsigned char* infoText);
-/// Frees every entry; the list keeps its nodes. Always 0.
+/// Frees every entry; the list keeps its nodes, with null pointers. Always 0.
 int DeleteSDRCache(NQORTQR20::TCPluginCallbacks* context, SDRCache* cache);
-/// The last record of the repository with this sensor number; null when there is none.
+/// The last record of the repository with this sensor number; null when there is none, as in an
+/// empty cache.
 IPMISDREntry* GetSensorSDR(unsigned char sensorNumber, const SDRCache* cache);
+/// Prints the first entry on standard output. No step of the collection calls it.
 int PrintSDRCache(const SDRCache* cache);

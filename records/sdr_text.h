@@ -1,0 +1,13 @@
+#pragma once
+
+#include <string>
+
+#include "records/sdr_entry.h"
+
+namespace ipmisel {
+
+/// The identity and unit fields and the ID string of a sensor record, in hexadecimal; ends in a
+/// line feed.
+std::string SdrFieldsText(const IPMISDREntry& entry);
+
+}  // namespace ipmisel
