@@ -14,6 +14,7 @@
 
 #include "host/spdriver/commands.h"
 #include "host/spdriver/freeipmi_context.h"
+#include "host/spdriver/stop.h"
 
 namespace tqrhost {
 namespace {
@@ -520,7 +521,7 @@ std::optional<Response> LanSession::WaitFor(const Ask& ask, Clock::time_point de
         found = std::find_if(outstanding_.begin(), outstanding_.end(), isOurs);
         if (found == outstanding_.end() && outstanding_.empty()) Send(ask, true);
         const auto now = Clock::now();
-        if (now >= deadline) return std::nullopt;
+        if (now >= deadline || Stopped() != StopReason::kNone) return std::nullopt;
         if (found != outstanding_.end() && found->second.tries >= kTriesBeforeReopening &&
             !reopened_) {
             return std::nullopt;
@@ -554,9 +555,10 @@ std::optional<Response> LanSession::Exchange(const Ask& ask) {
         FillWindow();
         return response;
     }
-    const auto deadline = Clock::now() + options_.timeout;
+    const auto deadline = std::min(Clock::now() + options_.timeout, StopTime());
     auto answer = WaitFor(ask, deadline);
-    if (!answer && Clock::now() < deadline && Reopen()) answer = WaitFor(ask, deadline);
+    if (!answer && Clock::now() < deadline && Stopped() == StopReason::kNone && Reopen())
+        answer = WaitFor(ask, deadline);
     if (!answer) {
         // What is still out is nobody's any more, and a late answer to it is not believed.
         for (const auto& [rqSeq, request] : outstanding_) {

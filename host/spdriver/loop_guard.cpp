@@ -50,6 +50,7 @@ void LoopGuard::Walk::Given(std::uint16_t record, std::uint8_t offset) {
 LoopGuard::LoopGuard(std::unique_ptr<Transport> transport) : transport_(std::move(transport)) {}
 
 std::optional<Response> LoopGuard::Exchange(const RequestFrame& request) {
+    endedCircle_ = false;
     if (request.netFn() == kNetFnStorage) {
         switch (request.command()) {
             case kGetSelInfo:
@@ -85,6 +86,7 @@ std::optional<Response> LoopGuard::Read(Walk* walk, bool isEventLog, const Reque
                                           "record 0x%04x was read before.",
                                           isEventLog ? "event log" : "sensor repository", record));
         walk->Restart();
+        endedCircle_ = true;
         return std::nullopt;
     }
     auto response = transport_->Exchange(request);

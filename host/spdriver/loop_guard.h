@@ -21,6 +21,8 @@ class LoopGuard : public Transport {
 public:
     explicit LoopGuard(std::unique_ptr<Transport> transport);
     std::optional<Response> Exchange(const RequestFrame& request) override;
+    /// Whether the last read got no answer because it was one round too many.
+    bool EndedCircle() const { return endedCircle_; }
 
 private:
     /// What one walk has been given.
@@ -40,6 +42,7 @@ private:
     std::unique_ptr<Transport> transport_;
     Walk eventLog_;
     Walk sensorRepository_;
+    bool endedCircle_ = false;
 };
 
 }  // namespace tqrhost

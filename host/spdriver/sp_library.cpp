@@ -10,8 +10,18 @@
 #include <vector>
 
 #include "host/core/host.h"
+#include "host/spdriver/completeness.h"
 #include "host/spdriver/loop_guard.h"
 #include "host/spdriver/transport.h"
+
+namespace NQORTQR20 {
+
+struct SPLibrary::Impl {
+    std::unique_ptr<tqrhost::ReadingWatch> transport;  ///< null when there is no way to the BMC
+    bool integratedBmc;
+};
+
+}  // namespace NQORTQR20
 
 namespace tqrhost {
 namespace {
@@ -54,6 +64,17 @@ void OpenMachine(Source source) {
     }
 }
 
+NodeCompleteness CompletenessOf(const NQORTQR20::SPLibrary& library) {
+    const auto& watch = library.impl_->transport;
+    return watch ? watch->Account() : NodeCompleteness();
+}
+
+std::vector<NodeCompleteness> GetCompleteness() {
+    std::vector<NodeCompleteness> accounts;
+    for (const auto& node : Nodes()) accounts.push_back(CompletenessOf(*node));
+    return accounts;
+}
+
 void CloseMachine() {
     Nodes().clear();
     SetMachineFacts({});
@@ -63,14 +84,12 @@ void CloseMachine() {
 
 namespace NQORTQR20 {
 
-struct SPLibrary::Impl {
-    std::unique_ptr<tqrhost::Transport> transport;  ///< null when there is no way to the BMC
-    bool integratedBmc;
-};
-
 SPLibrary::SPLibrary(std::unique_ptr<tqrhost::Transport> transport, bool integratedBmc)
     : impl_(std::make_unique<Impl>()) {
-    if (transport) impl_->transport = std::make_unique<tqrhost::LoopGuard>(std::move(transport));
+    if (transport) {
+        impl_->transport = std::make_unique<tqrhost::ReadingWatch>(
+            std::make_unique<tqrhost::LoopGuard>(std::move(transport)));
+    }
     impl_->integratedBmc = integratedBmc;
 }
 

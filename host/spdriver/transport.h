@@ -77,6 +77,30 @@ struct WorkaroundInfo {
 /// The known deviations of BMCs that a user may ask to put up with.
 std::span<const WorkaroundInfo> KnownWorkarounds();
 
+/// One read that brought nothing, or too little.
+struct ReadFault {
+    std::string what;     ///< the command, as the IPMI standard calls it
+    std::string record;   ///< record or FRU device ID, four hexadecimal digits; empty without one
+    std::string problem;  ///< "no response", "completion code cb", "short answer", ...
+    bool ofLogOrSensors;  ///< else of a FRU device
+    bool operator==(const ReadFault&) const = default;
+};
+/// What a node announced of a source, and what was read of it.
+struct SourceAccount {
+    std::optional<unsigned> announced;  ///< empty when it was not asked, or did not say
+    unsigned read = 0;
+};
+/// How whole the reading of a node is, as the host saw it go by.
+struct NodeCompleteness {
+    SourceAccount log;
+    SourceAccount sensors;
+    std::vector<ReadFault> faults;
+    /// Event log and sensor repository were read as far as they were announced, without a fault.
+    bool Whole() const;
+};
+/// One for each node of the open machine.
+std::vector<NodeCompleteness> GetCompleteness();
+
 /// Makes the nodes and facts of a source the machine that SPLibrary and the core speak of; until
 /// the next call, or CloseMachine.
 void OpenMachine(Source source);

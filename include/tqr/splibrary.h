@@ -2,9 +2,15 @@
 
 #include <memory>
 
+namespace NQORTQR20 {
+class SPLibrary;
+}
 namespace tqrhost {
 class Transport;
-}
+struct NodeCompleteness;
+/// How whole the reading through a library object is, as the host saw it.
+NodeCompleteness CompletenessOf(const NQORTQR20::SPLibrary& library);
+}  // namespace tqrhost
 
 namespace NQORTQR20 {
 
@@ -39,6 +45,7 @@ public:
     bool sendIPMICommand(unsigned char* buffer, int* length, int bufferSize, bool flag);
 
 private:
+    friend tqrhost::NodeCompleteness tqrhost::CompletenessOf(const SPLibrary& library);
     struct Impl;
     std::unique_ptr<Impl> impl_;
 };

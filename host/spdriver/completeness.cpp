@@ -1,0 +1,143 @@
+#include "host/spdriver/completeness.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "base/bytes.h"
+#include "base/text.h"
+#include "host/spdriver/commands.h"
+#include "host/spdriver/stop.h"
+
+namespace tqrhost {
+namespace {
+
+constexpr std::size_t kMostFaults = 1000;
+constexpr std::uint8_t kNotPresent = 0xCB;
+constexpr std::uint8_t kOutOfRange = 0xC9;
+
+// Answers, completion code included: version and count; next record ID and one byte of a record;
+// the count of FRU bytes.
+constexpr std::size_t kInfoAnswer = 4;
+constexpr std::size_t kRecordAnswer = 4;
+constexpr std::size_t kWholeSelEntry = 19;
+constexpr std::size_t kFruAnswer = 2;
+constexpr std::size_t kCountAt = 2;
+
+const char* StopText(StopReason reason) {
+    return reason == StopReason::kDeadline ? "deadline" : "interrupted";
+}
+
+}  // namespace
+
+bool NodeCompleteness::Whole() const {
+    const auto whole = [](const SourceAccount& source) {
+        return !source.announced || source.read >= *source.announced;
+    };
+    const bool faulty = std::any_of(faults.begin(), faults.end(),
+                                    [](const ReadFault& fault) { return fault.ofLogOrSensors; });
+    return !faulty && whole(log) && whole(sensors);
+}
+
+ReadingWatch::ReadingWatch(std::unique_ptr<LoopGuard> guard) : guard_(std::move(guard)) {}
+
+std::optional<Response> ReadingWatch::Exchange(const RequestFrame& request) {
+    std::optional<Response> response;
+    if (Stopped() == StopReason::kNone) response = guard_->Exchange(request);
+    if (request.netFn() == kNetFnStorage) Note(request, response);
+    return response;
+}
+
+void ReadingWatch::Note(const RequestFrame& request, const std::optional<Response>& response) {
+    switch (request.command()) {
+        case kGetSelInfo:
+            NoteInfo(&account_.log, "Get SEL Info", response, kCountAt);
+            break;
+        case kGetSelEntry:
+            NoteRecord(&account_.log, "Get SEL Entry", request, response);
+            break;
+        case kGetSdrRepositoryInfo:
+            NoteInfo(&account_.sensors, "Get SDR Repository Info", response, kCountAt);
+            break;
+        case kReserveSdrRepository:
+            if (const std::string problem = ProblemOf(response, 3); !problem.empty()) {
+                AddFault({"Reserve SDR Repository", "", problem, true});
+            }
+            break;
+        case kGetSdr:
+            NoteRecord(&account_.sensors, "Get SDR", request, response);
+            break;
+        case kReadFruData:
+            NoteFru(request, response);
+            break;
+        default:
+            break;
+    }
+}
+
+void ReadingWatch::NoteInfo(SourceAccount* source, const char* what,
+                            const std::optional<Response>& response, std::size_t countAt) {
+    source->read = 0;  // a new walk
+    const std::string problem = ProblemOf(response, kInfoAnswer);
+    if (!problem.empty()) {
+        AddFault({what, "", problem, true});
+        return;
+    }
+    // A question that was asked again and then answered left nothing out.
+    std::erase_if(account_.faults, [what](const ReadFault& fault) { return fault.what == what; });
+    ipmisel::ByteReader in(*response);
+    in.Skip(countAt);
+    source->announced = in.U16();
+}
+
+void ReadingWatch::NoteRecord(SourceAccount* source, const char* what, const RequestFrame& request,
+                              const std::optional<Response>& response) {
+    ipmisel::ByteReader in(request.data());
+    in.U16();
+    const std::uint16_t record = in.U16();
+    const std::uint8_t offset = in.U8();
+    // An empty log or repository has no first record.
+    if (response && response->front() == kNotPresent && source->announced == 0u) return;
+    const bool isEventLog = source == &account_.log;
+    const std::string problem = ProblemOf(response, isEventLog ? kWholeSelEntry : kRecordAnswer);
+    if (problem.empty()) {
+        if (offset == 0) ++source->read;
+        return;
+    }
+    AddFault({what, ipmisel::Format("%04x", record), problem, true});
+}
+
+void ReadingWatch::NoteFru(const RequestFrame& request, const std::optional<Response>& response) {
+    ipmisel::ByteReader in(request.data());
+    const std::uint8_t device = in.U8();
+    const std::uint16_t offset = in.U16();
+    if (response && response->front() == kNotPresent) return;  // absent
+    // A device may be smaller than what is asked for.
+    if (response && response->front() == kOutOfRange && offset > 0) return;
+    const std::string problem = ProblemOf(response, kFruAnswer);
+    if (!problem.empty()) {
+        AddFault({"Read FRU Data", ipmisel::Format("%04x", device), problem, false});
+    }
+}
+
+void ReadingWatch::AddFault(ReadFault fault) {
+    if (account_.faults.size() >= kMostFaults) return;
+    if (std::find(account_.faults.begin(), account_.faults.end(), fault) == account_.faults.end()) {
+        account_.faults.push_back(std::move(fault));
+    }
+}
+
+std::string ReadingWatch::ProblemOf(const std::optional<Response>& response,
+                                    std::size_t least) const {
+    if (!response) {
+        if (const StopReason reason = Stopped(); reason != StopReason::kNone) {
+            return StopText(reason);
+        }
+        return guard_->EndedCircle() ? "ran in a circle" : "no response";
+    }
+    if (response->front() != 0) {
+        return ipmisel::Format("completion code %02x", response->front());
+    }
+    return response->size() < least ? "short answer" : "";
+}
+
+}  // namespace tqrhost

@@ -1,0 +1,22 @@
+#pragma once
+
+#include <chrono>
+#include <optional>
+
+namespace tqrhost {
+
+/// Why a collection is to end early, with what was read so far.
+enum class StopReason { kNone, kDeadline, kInterrupted };
+
+/// No command is begun after this time; empty for no deadline.
+void StopAt(std::optional<std::chrono::steady_clock::time_point> deadline);
+/// No command is begun from now on. May be called from a signal handler.
+void StopNow();
+/// Forgets deadline and interruption.
+void ClearStop();
+
+StopReason Stopped();
+/// The deadline, or a far time: for waits that must not outlast it.
+std::chrono::steady_clock::time_point StopTime();
+
+}  // namespace tqrhost
