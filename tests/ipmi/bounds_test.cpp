@@ -9,6 +9,7 @@
 
 #include "host/spdriver/transport.h"
 #include "ipmi/request_aux_log.h"
+#include "ipmi/request_fru_locator.h"
 #include "ipmi/request_sdr.h"
 #include "ipmi/request_sel.h"
 
@@ -18,6 +19,7 @@ namespace {
 /// there were.
 std::vector<unsigned char> gReply;
 int gLength;
+int gToldLength;  // the reply's room, as the last request told it
 unsigned gSends;
 
 }  // namespace
@@ -30,6 +32,7 @@ SPLibrary::~SPLibrary() = default;
 bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSize, bool) {
     std::fill_n(buffer, bufferSize, static_cast<unsigned char>(0x51));
     buffer[4] = 0;
+    gToldLength = *length;
     std::copy(gReply.begin(), gReply.end(), buffer + 8);
     buffer[26] = static_cast<unsigned char>(++gSends);
     *length = gLength;
@@ -44,8 +47,9 @@ using namespace ipmisel;
 
 TEST(Bounds, ClaimedLengthsAreBelievedAsFarAsTheBufferReaches) {
     NQORTQR20::SPLibrary library(nullptr);
-    gReply = {0, 0xFF, 0xFF, 0, 0, 0, 0x01};  // no next record; a full sensor record
     for (int i = -1; i <= 320; ++i) {
+        gReply = {0, 0xFF, 0xFF, 0, 0, 0, 0x01};  // no next record; a full sensor record
+        gSends = 0;
         const int length = i == 320 ? std::numeric_limits<int>::max() : i;
         gLength = length;
         const std::size_t reach =
@@ -67,7 +71,37 @@ TEST(Bounds, ClaimedLengthsAreBelievedAsFarAsTheBufferReaches) {
         IPMIRequestAuxLog aux(&library);
         EXPECT_EQ(aux.IPMIGetAuxLogStatus(&count), kOk);
         EXPECT_EQ(count, reach > 9 ? 0x5151U : reach == 9 ? 0x51U : 0U) << length;
+
+        IPMIFRULocator locator;
+        IPMIRequestFRULocator fru(&library);
+        EXPECT_EQ(fru.IPMIGetFRUData(nullptr, &locator, true), kOk);
+        const std::size_t copied = std::min<std::size_t>(std::max<std::size_t>(reach, 2) - 2, 16);
+        EXPECT_EQ(locator.GetFRUData()[255], copied == 16 ? 0x51 : 0) << length;
+        EXPECT_EQ(locator.GetFRUData()[256], 0);
+        gReply = {0};
+        EXPECT_EQ(fru.IPMIGetSDRString(nullptr, &locator), kOk);
+        EXPECT_EQ(locator.GetIDString().size(),
+                  reach < 5 ? 0 : std::min<std::size_t>(reach - 4, 0x51))
+            << length;
     }
+}
+
+TEST(Bounds, RoomThatIsToldTheTransport) {
+    NQORTQR20::SPLibrary library(nullptr);
+    gReply = {0};
+    gLength = 312;
+    IPMIRequestFRULocator fru(&library);
+    IPMIFRULocator locator;
+    for (int use = 0; use < 2; ++use) {
+        fru.IPMIReserveSDR(nullptr);
+        EXPECT_EQ(gToldLength, 312);
+        fru.IPMIGetSDRString(nullptr, &locator);
+        EXPECT_EQ(gToldLength, 312);
+        fru.IPMIGetFRUData(nullptr, &locator, true);
+        EXPECT_EQ(gToldLength, 312);
+    }
+    IPMIRequestSDR(&library).IPMIReserveSDR(nullptr);
+    EXPECT_EQ(gToldLength, 256);
 }
 
 TEST(Bounds, WalksThatNeverEndAreEnded) {
@@ -89,6 +123,13 @@ TEST(Bounds, WalksThatNeverEndAreEnded) {
     gSends = 0;
     EXPECT_EQ(IPMIRequestSDR(&library).IPMIGetSDREntry(nullptr, &entries, info), kOk);
     EXPECT_EQ(gSends, 2 + 0x10000U);
+
+    std::vector<IPMIFRULocator> locators;
+    gReply[6] = 0x11;
+    gSends = 0;
+    EXPECT_EQ(IPMIRequestFRULocator(&library).IPMIGetSDREntry(nullptr, &locators), kOk);
+    EXPECT_EQ(gSends, 1 + 2 * 0x10000U);
+    EXPECT_EQ(locators.size(), 0x10000U);
 }
 
 }  // namespace
