@@ -1,0 +1,96 @@
+#include "inventory/spd.h"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <string>
+#include <vector>
+
+#include "tests/support/bmc_fixture.h"
+#include "tests/support/spd_image.h"
+
+namespace {
+
+using namespace ipmisel;
+using namespace ipmiseltest;
+
+struct Fields {
+    std::string vendor, serialNumber, partNumber;
+    bool operator==(const Fields&) const = default;
+};
+void PrintTo(const Fields& fields, std::ostream* out) {
+    *out << fields.vendor << ", " << fields.serialNumber << ", " << fields.partNumber;
+}
+
+Fields FieldsOf(const std::vector<std::uint8_t>& image) {
+    const auto kind = RecogniseSpd(image);
+    if (!kind) return {"not recognised", "", ""};
+    const auto module = DecodeSpd(*kind, image);
+    if (!module) return {"not decoded", "", ""};
+    return {module->vendor, module->serialNumber, module->partNumber};
+}
+
+TEST(Spd, TellsMakerAndNumbers) {
+    EXPECT_EQ(FieldsOf(Ddr2Image()), (Fields{"Ramaxel Technology", "01020304", "RML1520"}));
+    EXPECT_EQ(FieldsOf(Ddr3Image()), (Fields{"Micron Technology", "A1B2C3D4", "18JSF1G72PZ-1G6"}));
+    EXPECT_EQ(FieldsOf(Ddr4Image()).vendor, "not decoded") << "its identity lies beyond 256 bytes";
+}
+
+TEST(Spd, CrcOfDdr3CoversWhatByte0Says) {
+    auto image = Ddr3Image();
+    EXPECT_EQ(image[0] & 0x80, 0x80);
+    image[120] ^= 0x01;  // programmed with the module, after the checksum
+    EXPECT_EQ(RecogniseSpd(image), SpdKind::kDdr3);
+    image[0] &= 0x7F;
+    EXPECT_EQ(RecogniseSpd(image), std::nullopt);
+    image[120] ^= 0x01;
+    PutCrc(&image, 0x7623);
+    EXPECT_EQ(RecogniseSpd(image), SpdKind::kDdr3);
+    image[120] ^= 0x01;
+    EXPECT_EQ(RecogniseSpd(image), std::nullopt);
+}
+
+TEST(Spd, OtherDataIsNotRecognised) {
+    for (const auto& good : {Ddr2Image(), Ddr3Image(), Ddr4Image()}) {
+        // One broken byte of the sizes, the type, what the checksum covers, the checksum.
+        for (const std::size_t at : {0, 2, 5, good[2] == 0x08 ? 63 : 127}) {
+            auto image = good;
+            image[at] ^= 0x08;
+            EXPECT_EQ(RecogniseSpd(image), std::nullopt) << int{good[2]} << " at " << at;
+        }
+        EXPECT_EQ(RecogniseSpd(std::span(good).first(255)), std::nullopt);
+    }
+    EXPECT_EQ(RecogniseSpd(std::vector<std::uint8_t>(256, 0x00)), std::nullopt);
+    EXPECT_EQ(RecogniseSpd(std::vector<std::uint8_t>(256, 0xFF)), std::nullopt);
+    EXPECT_EQ(RecogniseSpd({}), std::nullopt);
+}
+
+// The identity stands outside what a checksum of DDR2 covers, so anything may be there.
+TEST(Spd, WhatCannotBeShownIsNotAvailable) {
+    const struct {
+        std::size_t at;
+        std::vector<std::uint8_t> bytes;
+        Fields fields;
+    } cases[] = {
+        {64, std::vector<std::uint8_t>(8, 0x7F), {kNotAvailable, "01020304", "RML1520"}},
+        {64, {0x00}, {kNotAvailable, "01020304", "RML1520"}},
+        {64, {0x7F, 0x7F, 0x00}, {kNotAvailable, "01020304", "RML1520"}},
+        {74, {0x80}, {"Ramaxel Technology", "01020304", kNotAvailable}},
+        {73, {0x00}, {"Ramaxel Technology", "01020304", kNotAvailable}},
+        {73, std::vector<std::uint8_t>(18, ' '), {"Ramaxel Technology", "01020304", kNotAvailable}},
+        {75, {0x00}, {"Ramaxel Technology", "01020304", "RM"}},
+        {73,
+         std::vector<std::uint8_t>(18, 'X'),
+         {"Ramaxel Technology", "01020304", std::string(18, 'X')}},
+        {95, {0xFF, 0x00}, {"Ramaxel Technology", "FF000304", "RML1520"}},
+    };
+    for (const auto& c : cases) {
+        auto image = Ddr2Image();
+        std::copy(c.bytes.begin(), c.bytes.end(), image.begin() + static_cast<long>(c.at));
+        const LogRecorder log;
+        EXPECT_EQ(FieldsOf(image), c.fields) << "at " << c.at;
+        EXPECT_EQ(log.All().size(), c.fields.vendor == kNotAvailable ? 1U : 0U);
+    }
+}
+
+}  // namespace
