@@ -16,6 +16,11 @@ if(IPMISEL_SANITIZE)
                          -fno-sanitize-recover=all -fno-omit-frame-pointer)
   target_link_options(ipmisel_flags INTERFACE -fsanitize=address,undefined)
 endif()
+if(IPMISEL_FUZZ)
+  target_compile_options(ipmisel_flags INTERFACE -fsanitize=fuzzer-no-link,address,undefined
+                         -fno-sanitize-recover=all -fno-omit-frame-pointer)
+  target_link_options(ipmisel_flags INTERFACE -fsanitize=address,undefined)
+endif()
 
 # ipmisel_plugin_part(NAME sources... ): a static part of the plug-in. Nothing of it is exported.
 function(ipmisel_plugin_part name)

@@ -38,7 +38,10 @@ bool NodeCompleteness::Whole() const {
     return !faulty && whole(log) && whole(sensors);
 }
 
-ReadingWatch::ReadingWatch(std::unique_ptr<LoopGuard> guard) : guard_(std::move(guard)) {}
+ReadingWatch::ReadingWatch(std::unique_ptr<LoopGuard> guard)
+    : guard_(std::move(guard)),
+      log_{"Get SEL Info", "Get SEL Entry", kWholeSelEntry, &account_.log, {}},
+      sensors_{"Get SDR Repository Info", "Get SDR", kRecordAnswer, &account_.sensors, {}} {}
 
 std::optional<Response> ReadingWatch::Exchange(const RequestFrame& request) {
     std::optional<Response> response;
@@ -50,13 +53,13 @@ std::optional<Response> ReadingWatch::Exchange(const RequestFrame& request) {
 void ReadingWatch::Note(const RequestFrame& request, const std::optional<Response>& response) {
     switch (request.command()) {
         case kGetSelInfo:
-            NoteInfo(&account_.log, "Get SEL Info", response, kCountAt);
+            NoteInfo(log_, response);
             break;
         case kGetSelEntry:
-            NoteRecord(&account_.log, "Get SEL Entry", request, response);
+            NoteRecord(&log_, request, response);
             break;
         case kGetSdrRepositoryInfo:
-            NoteInfo(&account_.sensors, "Get SDR Repository Info", response, kCountAt);
+            NoteInfo(sensors_, response);
             break;
         case kReserveSdrRepository:
             if (const std::string problem = ProblemOf(response, 3); !problem.empty()) {
@@ -64,7 +67,7 @@ void ReadingWatch::Note(const RequestFrame& request, const std::optional<Respons
             }
             break;
         case kGetSdr:
-            NoteRecord(&account_.sensors, "Get SDR", request, response);
+            NoteRecord(&sensors_, request, response);
             break;
         case kReadFruData:
             NoteFru(request, response);
@@ -74,36 +77,37 @@ void ReadingWatch::Note(const RequestFrame& request, const std::optional<Respons
     }
 }
 
-void ReadingWatch::NoteInfo(SourceAccount* source, const char* what,
-                            const std::optional<Response>& response, std::size_t countAt) {
-    source->read = 0;  // a new walk
+void ReadingWatch::NoteInfo(const Source& source, const std::optional<Response>& response) {
+    const std::string what = source.infoCommand;
     const std::string problem = ProblemOf(response, kInfoAnswer);
     if (!problem.empty()) {
         AddFault({what, "", problem, true});
         return;
     }
     // A question that was asked again and then answered left nothing out.
-    std::erase_if(account_.faults, [what](const ReadFault& fault) { return fault.what == what; });
+    std::erase_if(account_.faults, [&what](const ReadFault& fault) { return fault.what == what; });
     ipmisel::ByteReader in(*response);
-    in.Skip(countAt);
-    source->announced = in.U16();
+    in.Skip(kCountAt);
+    source.account->announced = in.U16();
 }
 
-void ReadingWatch::NoteRecord(SourceAccount* source, const char* what, const RequestFrame& request,
+void ReadingWatch::NoteRecord(Source* source, const RequestFrame& request,
                               const std::optional<Response>& response) {
     ipmisel::ByteReader in(request.data());
     in.U16();
     const std::uint16_t record = in.U16();
     const std::uint8_t offset = in.U8();
     // An empty log or repository has no first record.
-    if (response && response->front() == kNotPresent && source->announced == 0u) return;
-    const bool isEventLog = source == &account_.log;
-    const std::string problem = ProblemOf(response, isEventLog ? kWholeSelEntry : kRecordAnswer);
-    if (problem.empty()) {
-        if (offset == 0) ++source->read;
+    if (response && response->front() == kNotPresent && source->account->announced == 0u) return;
+    const std::string problem = ProblemOf(response, source->wholeAnswer);
+    if (!problem.empty()) {
+        AddFault({source->readCommand, ipmisel::Format("%04x", record), problem, true});
         return;
     }
-    AddFault({what, ipmisel::Format("%04x", record), problem, true});
+    if (offset != 0) return;
+    if (source->counted.empty()) source->counted.resize(0x10000);
+    if (!source->counted[record]) ++source->account->read;
+    source->counted[record] = true;
 }
 
 void ReadingWatch::NoteFru(const RequestFrame& request, const std::optional<Response>& response) {

@@ -22,9 +22,17 @@ public:
 
 private:
     void Note(const RequestFrame& request, const std::optional<Response>& response);
-    void NoteInfo(SourceAccount* source, const char* what, const std::optional<Response>& response,
-                  std::size_t countAt);
-    void NoteRecord(SourceAccount* source, const char* what, const RequestFrame& request,
+    /// An account, and which records it has counted: a record that is read again counts once.
+    struct Source {
+        const char* infoCommand;
+        const char* readCommand;
+        std::size_t wholeAnswer;  ///< bytes of an answer that is not short
+        SourceAccount* account;
+        std::vector<bool> counted;
+    };
+
+    void NoteInfo(const Source& source, const std::optional<Response>& response);
+    void NoteRecord(Source* source, const RequestFrame& request,
                     const std::optional<Response>& response);
     void NoteFru(const RequestFrame& request, const std::optional<Response>& response);
     void AddFault(ReadFault fault);
@@ -33,6 +41,8 @@ private:
 
     std::unique_ptr<LoopGuard> guard_;
     NodeCompleteness account_;
+    Source log_;
+    Source sensors_;
 };
 
 }  // namespace tqrhost

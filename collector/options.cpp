@@ -1,0 +1,139 @@
+#include "collector/options.h"
+
+#include <CLI/CLI.hpp>
+#include <algorithm>
+#include <cstdio>
+#include <iterator>
+#include <string_view>
+
+#include "collector/classes.h"
+#include "collector/report.h"
+
+namespace ipmisel {
+namespace {
+
+constexpr const char* kLevels[] = {"error", "warning", "notice", "info", "trace"};
+
+/// What a text must be one of; CLI11 puts the message behind the option's name.
+CLI::Validator OneOf(std::vector<std::string> names) {
+    const std::string list = CLI::detail::join(names, ", ");
+    return CLI::Validator(
+        [names = std::move(names), list](const std::string& text) {
+            if (std::find(names.begin(), names.end(), text) != names.end()) return std::string();
+            return "\"" + text + "\" is not known; use one of " + list;
+        },
+        list);
+}
+
+std::string WorkaroundHelp() {
+    std::string text = "Known deviations of a BMC to put up with (--workaround):\n";
+    for (const tqrhost::WorkaroundInfo& info : tqrhost::KnownWorkarounds()) {
+        text += "  " + std::string(info.name) +
+                std::string(22 - std::min<std::size_t>(20, info.name.size()), ' ') +
+                std::string(info.description) + "\n";
+    }
+    return text;
+}
+
+template <typename Table>
+std::vector<std::string> Names(const Table& table) {
+    std::vector<std::string> names;
+    for (const auto& row : table) names.emplace_back(row.name);
+    return names;
+}
+
+}  // namespace
+
+std::optional<Options> ParseOptions(int argc, char** argv, int* exitStatus) {
+    Options options;
+    std::string level = "warning";
+    double timeout = options.source.timeoutSeconds;
+
+    CLI::App app("Reads what a server's management controller (BMC) knows.", "ipmisel");
+    app.set_version_flag("--version", "ipmisel " IPMISEL_VERSION);
+    app.require_subcommand(1);
+    CLI::App* collect = app.add_subcommand("collect", "Collect and write a report");
+    CLI::App* classes = app.add_subcommand("classes", "List the classes that can be collected");
+
+    collect
+        ->add_option("--from", options.sources,
+                     "inband (this machine's BMC, the default), lan:HOST[:PORT], sim:FILE, "
+                     "replay:FILE; several lan: sources are several nodes")
+        ->type_name("SOURCE")
+        ->allow_extra_args(false);
+    collect->add_option("--class", options.classes, "Class to collect; see \"ipmisel classes\"")
+        ->type_name("CLASS")
+        ->allow_extra_args(false)
+        ->check(OneOf(Names(KnownClasses())));
+    collect->add_option("--format", options.format, "Form of the report")
+        ->type_name("FORMAT")
+        ->capture_default_str()
+        ->check(OneOf(Names(KnownFormats())));
+    collect->add_option("--output", options.output, "Write the report here, whole or not at all")
+        ->type_name("FILE");
+    collect->add_option("--record", options.record, "Write a capture of every exchange here")
+        ->type_name("FILE");
+    collect->add_option("--log-level", level, "What goes to standard error")
+        ->type_name("LEVEL")
+        ->capture_default_str()
+        ->check(OneOf({std::begin(kLevels), std::end(kLevels)}));
+    collect->add_option("--log-file", options.logFile, "Every log line as a JSON object a line")
+        ->type_name("FILE");
+    collect->add_option("--plugin", options.plugin, "Another plug-in file")->type_name("FILE");
+    collect->add_option("--user", options.source.user, "User name at the BMC")->type_name("NAME");
+    collect
+        ->add_option("--password-file", options.passwordFile,
+                     "File with the password in its first line; else the environment variable "
+                     "IPMISEL_PASSWORD, else a prompt")
+        ->type_name("FILE");
+    collect
+        ->add_option("--cipher-suite", options.source.cipherSuite,
+                     "Cipher suite by number; 17, else 3 when left out")
+        ->type_name("N")
+        ->check(CLI::Range(0, 255));
+    collect->add_option("--privilege", options.source.privilege, "Privilege of the session")
+        ->type_name("LEVEL")
+        ->capture_default_str()
+        ->check(OneOf({"user", "operator", "admin"}));
+    collect->add_option("--workaround", options.source.workarounds, "Deviation to put up with")
+        ->type_name("NAME")
+        ->allow_extra_args(false)
+        ->check(OneOf(Names(tqrhost::KnownWorkarounds())));
+    collect
+        ->add_option("--window", options.source.window,
+                     "Most requests outstanding; adaptive when left out")
+        ->type_name("N")
+        ->check(CLI::Range(1, 15));
+    collect->add_option("--timeout", timeout, "Seconds that one request may go unanswered")
+        ->type_name("SECONDS")
+        ->capture_default_str()
+        ->check(CLI::Range(0.001, 86400.0));
+    collect
+        ->add_option("--deadline", options.deadlineSeconds,
+                     "Seconds that the whole collection may take")
+        ->type_name("SECONDS")
+        ->check(CLI::Range(0.001, 31536000.0));
+    collect->footer(WorkaroundHelp());
+
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::Success& wanted) {  // help or version
+        *exitStatus = app.exit(wanted);
+        return std::nullopt;
+    } catch (const CLI::ParseError& error) {
+        std::string what = error.what();
+        std::replace(what.begin(), what.end(), '\n', ' ');
+        std::fprintf(stderr, "ipmisel: %s; see \"ipmisel %s--help\"\n", what.c_str(),
+                     collect->parsed() ? "collect " : "");
+        *exitStatus = kExitUsage;
+        return std::nullopt;
+    }
+    if (classes->parsed()) options.command = Options::Command::kClasses;
+    if (options.sources.empty()) options.sources = {"inband"};
+    options.source.timeoutSeconds = timeout;
+    options.logLevel = static_cast<int>(std::find(std::begin(kLevels), std::end(kLevels), level) -
+                                        std::begin(kLevels));
+    return options;
+}
+
+}  // namespace ipmisel

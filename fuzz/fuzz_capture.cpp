@@ -1,0 +1,28 @@
+// The reader of captures: opened as the source that it is, then asked.
+
+#include <sys/mman.h>
+#include <unistd.h>
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <string>
+
+#include "host/spdriver/transport.h"
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+    const int file = memfd_create("capture", MFD_CLOEXEC);
+    if (file < 0) return 0;
+    if (write(file, data, size) == static_cast<ssize_t>(size)) {
+        try {
+            auto source =
+                tqrhost::OpenSources({"replay:/proc/self/fd/" + std::to_string(file)}, {});
+            const std::array<std::uint8_t, 15> frame{0x01, 0x20, 0x0A, 0x00, 0x40};
+            const auto request = tqrhost::RequestFrame::FromBuffer(frame);
+            for (const auto& node : source.nodes) node->Exchange(*request);
+        } catch (const tqrhost::SourceError&) {
+        }
+    }
+    close(file);
+    return 0;
+}

@@ -1,0 +1,200 @@
+"""A Linux guest under QEMU with a real IPMI driver, and BMCs for it.
+
+The guest is a Debian kernel with an initramfs of busybox and the built program. What it prints
+between two marks on its serial console is what the program printed.
+"""
+import contextlib
+import os
+import pathlib
+import shutil
+import socket
+import struct
+import subprocess
+import tempfile
+import time
+
+BOOT_SECONDS = 240  # software emulation on a busy machine; six seconds on an idle one
+MODULES = ("ipmi_msghandler", "ipmi_devintf", "ipmi_si")
+
+
+class Missing(Exception):
+    """A facility of the test bed is not there; the text says which."""
+
+
+def kernel(cache: pathlib.Path) -> tuple[pathlib.Path, list[pathlib.Path]]:
+    """Kernel image and IPMI modules of the kernel package, unpacked below `cache` once."""
+    root = cache / "kernel"
+    if not root.exists():
+        depends = subprocess.run(["apt-cache", "depends", "linux-image-amd64"],
+                                 capture_output=True, text=True, check=False).stdout
+        names = [line.split()[-1] for line in depends.splitlines() if "Depends: linux-image" in line]
+        if not names:
+            raise Missing("no package linux-image-amd64 is known")
+        cache.mkdir(parents=True, exist_ok=True)
+        with tempfile.TemporaryDirectory(dir=cache) as folder:
+            loaded = subprocess.run(["apt-get", "download", names[0]], cwd=folder, check=False,
+                                    capture_output=True, text=True)
+            packages = list(pathlib.Path(folder).glob("*.deb"))
+            if loaded.returncode != 0 or not packages:
+                raise Missing(f"package {names[0]} cannot be had")
+            subprocess.run(["dpkg-deb", "-x", packages[0], folder + "/root"], check=True)
+            os.rename(folder + "/root", root)
+    images = sorted(root.glob("boot/vmlinuz-*"))
+    modules = [found for name in MODULES for found in sorted(root.glob(f"lib/modules/*/**/{name}.ko"))]
+    if not images or len(modules) != len(MODULES):
+        raise Missing("the kernel package holds no image, or no IPMI modules")
+    return images[0], modules
+
+
+def _cpio(entries: list[tuple[str, int, bytes]]) -> bytes:
+    """A "newc" archive of (name, mode, contents)."""
+    archive = bytearray()
+    for number, (name, mode, contents) in enumerate(entries + [("TRAILER!!!", 0, b"")], 1):
+        fields = (number, mode, 0, 0, 1, 0, len(contents), 0, 0, 0, 0, len(name) + 1, 0)
+        archive += b"070701" + b"".join(b"%08X" % field for field in fields)
+        archive += name.encode() + b"\0"
+        archive += b"\0" * (-len(archive) % 4)
+        archive += contents
+        archive += b"\0" * (-len(archive) % 4)
+    return bytes(archive)
+
+
+def _libraries(binary: pathlib.Path) -> set[str]:
+    lines = subprocess.run(["ldd", binary], capture_output=True, text=True, check=True).stdout
+    found = set()
+    for line in lines.splitlines():
+        parts = line.split()
+        path = parts[2] if "=>" in parts and len(parts) > 2 else parts[0]
+        if path.startswith("/"):
+            found.add(path)
+    return found
+
+
+def initramfs(build: pathlib.Path, modules: list[pathlib.Path], script: str) -> bytes:
+    """The guest's root: busybox, the modules, the program with its libraries, /init."""
+    busybox = shutil.which("busybox") or "/bin/busybox"
+    if not os.path.exists(busybox) or "statically" not in subprocess.run(
+            ["file", "-L", busybox], capture_output=True, text=True, check=False).stdout:
+        raise Missing("no static busybox (package busybox-static)")
+    files = {"bin/busybox": pathlib.Path(busybox)}
+    files |= {f"modules/{module.name}": module for module in modules}
+    installed = [build / "bin/ipmisel", *sorted((build / "lib").glob("*.so")),
+                 build / "lib/ipmisel/libipmisel.pi", build / "lib/ipmisel/ipmisel.INI"]
+    libraries = set()
+    for path in installed:
+        files["opt/" + str(path.relative_to(build))] = path
+        if path.suffix != ".INI":
+            libraries |= _libraries(path)
+    for library in libraries:
+        if not library.startswith(str(build)):
+            files[library.lstrip("/")] = pathlib.Path(library)
+    folders = {"proc", "sys", "dev", "tmp"}
+    for name in files:
+        folders |= {str(parent) for parent in pathlib.PurePath(name).parents if str(parent) != "."}
+    entries = [(folder, 0o040755, b"") for folder in sorted(folders)]
+    entries += [(name, 0o100755, path.read_bytes()) for name, path in sorted(files.items())]
+    entries.append(("init", 0o100755, script.encode()))
+    return _cpio(entries)
+
+
+INIT = """#!/bin/busybox sh
+export PATH=/bin
+/bin/busybox --install -s /bin
+mount -t proc proc /proc; mount -t sysfs sys /sys; mount -t devtmpfs dev /dev
+{modules}
+/opt/bin/ipmisel {arguments} >/tmp/out 2>/tmp/err </dev/null
+echo "status $?" >/tmp/status
+for part in status err out; do
+    echo "@@@ begin $part"; base64 /tmp/$part; echo "@@@ end $part"
+done
+poweroff -f
+"""
+
+
+class Run:
+    """What the program did in the guest."""
+
+    def __init__(self, console: str):
+        import base64
+        self.console = console
+        parts = {}
+        for part in ("status", "err", "out"):
+            begin, end = f"@@@ begin {part}", f"@@@ end {part}"
+            if begin not in console or end not in console:
+                raise AssertionError("the guest did not come to its end:\n" + console[-3000:])
+            text = console.split(begin, 1)[1].split(end, 1)[0]
+            parts[part] = base64.b64decode("".join(text.split())).decode(errors="replace")
+        self.status = int(parts["status"].split()[1])
+        self.err = parts["err"]
+        self.out = parts["out"]
+
+
+def run_guest(build, cache, arguments: str, devices: list[str], load_driver: bool = True) -> Run:
+    """Boots the guest with QEMU devices and runs the program with `arguments` in it."""
+    qemu = shutil.which("qemu-system-x86_64")
+    if not qemu:
+        raise Missing("no qemu-system-x86_64 (package qemu-system-x86)")
+    image, modules = kernel(cache)
+    load = "\n".join(f"insmod /modules/{module.name}" for module in modules)
+    script = INIT.format(modules=load + "\nsleep 1" if load_driver else "", arguments=arguments)
+    with tempfile.TemporaryDirectory() as folder:
+        root = pathlib.Path(folder) / "initramfs"
+        root.write_bytes(initramfs(build, modules, script))
+        command = [qemu, "-machine", "q35", "-accel", "tcg", "-m", "512", "-nographic", "-no-reboot",
+                   "-kernel", str(image), "-initrd", str(root), "-append",
+                   "console=ttyS0 quiet panic=1", *devices]
+        done = subprocess.run(command, stdin=subprocess.DEVNULL, capture_output=True, check=False,
+                              timeout=BOOT_SECONDS)
+    return Run(done.stdout.decode(errors="replace"))
+
+
+def free_port(kind=socket.SOCK_STREAM) -> int:
+    with socket.socket(socket.AF_INET, kind) as probe:
+        probe.bind(("127.0.0.1", 0))
+        return probe.getsockname()[1]
+
+
+@contextlib.contextmanager
+def ipmi_sim(sel: list[bytes], sdrs: list[bytes]):
+    """A BMC of OpenIPMI, reached over the LAN and by a virtual machine: (udp port, tcp port)."""
+    program = shutil.which("ipmi_sim")
+    if not program:
+        raise Missing("no ipmi_sim (package openipmi)")
+    udp, tcp = free_port(socket.SOCK_DGRAM), free_port()
+    levels = "\n".join(f"    allowed_auths_{level} none md2 md5 straight"
+                       for level in ("callback", "user", "operator", "admin"))
+    lan = f"""name "guest"
+set_working_mc 0x20
+  startlan 1
+    addr 127.0.0.1 {udp}
+    priv_limit admin
+{levels}
+    guid a123456789abcdefa123456789abcdef
+  endlan
+  serial 15 127.0.0.1 {tcp} codec VM
+  user 2 true "root" "secret" admin 10 none md2 md5 straight
+"""
+    def hexes(data):
+        return " ".join(f"0x{byte:02x}" for byte in data)
+
+    emu = ["mc_setbmc 0x20", "mc_add 0x20 0 no-device-sdrs 0x23 9 8 0x9f 0x1291 0xf02 persist_sdr",
+           f"sel_enable 0x20 {max(len(sel), 1) + 10} 0x0a"]
+    emu += [f"sel_add 0x20 0x{entry[2]:02x} {hexes(entry[3:])}" for entry in sel]
+    emu += [f"main_sdr_add 0x20 {hexes(record)}" for record in sdrs]
+    emu.append("mc_enable 0x20")
+    with tempfile.TemporaryDirectory() as folder:
+        base = pathlib.Path(folder)
+        (base / "lan.conf").write_text(lan)
+        (base / "bmc.emu").write_text("\n".join(emu) + "\n")
+        (base / "state").mkdir()
+        process = subprocess.Popen([program, "-c", "lan.conf", "-f", "bmc.emu", "-s", "state", "-n"],
+                                   cwd=folder, stdin=subprocess.DEVNULL,
+                                   stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
+        try:
+            time.sleep(2)
+            if process.poll() is not None:
+                raise Missing("ipmi_sim does not start")
+            yield udp, tcp
+        finally:
+            process.kill()
+            process.wait()

@@ -1,0 +1,102 @@
+"""Collects in a Linux guest with a real IPMI driver and compares with the same log read otherwise.
+
+usage: guest_test.py BUILD_FOLDER CACHE_FOLDER     (exit status 77: a facility is missing)
+"""
+import json
+import os
+import pathlib
+import subprocess
+import sys
+import tempfile
+import unittest
+
+import guest
+
+BUILD = pathlib.Path(sys.argv[1]).resolve()
+CACHE = pathlib.Path(sys.argv[2]).resolve()
+PROGRAM = BUILD / "bin/ipmisel"
+
+KCS_INTERNAL = ["-device", "ipmi-bmc-sim,id=bmc0", "-device", "isa-ipmi-kcs,bmc=bmc0"]
+LOG = "collect --from inband --format json --class QORSG_IPMILogRecord"
+
+# A full sensor record: number 0x30, degrees C, M = 1; and a compact one, number 0x31.
+SDRS = [
+    bytes.fromhex("0100 51 01 36 2000 30 0301 7f68 0101 0000 0000 0000 80 01 00 00 0100 0000 0000"
+                  "07 0000000000000000000000000000000000 0000" "cb43505520312054656d7020"),
+    bytes.fromhex("0200 51 02 25 2000 31 0401 6740 0d6f 0000 0000 0000 00 00 00 00 00 00 00 00 00"
+                  "00 ca447269766520426179") + b" 1",
+]
+# record ID, type 02, time, generator, revision, sensor type, number, event type, data 1 to 3
+SEL = [bytes.fromhex(f"{i:02x}00 02 00000000 2000 04 {event}") for i, event in enumerate(
+    ["01 30 01 59 50 45", "01 30 81 59 40 45", "0d 31 6f f0 ff ff", "0f 00 6f c2 01 ff"], 1)]
+
+
+def external(tcp: int) -> list[str]:
+    return ["-chardev", f"socket,id=ipmi0,host=127.0.0.1,port={tcp},reconnect=10",
+            "-device", "ipmi-bmc-extern,chardev=ipmi0,id=bmc0",
+            "-device", "isa-ipmi-kcs,bmc=bmc0"]
+
+
+def collect(*arguments: str) -> dict:
+    """The report of the program on this machine, in the guest's time zone."""
+    environment = dict(os.environ, TZ="UTC", IPMISEL_PASSWORD="secret")
+    done = subprocess.run([PROGRAM, "collect", "--format", "json", "--class", "QORSG_IPMILogRecord",
+                           *arguments], capture_output=True, text=True, check=False,
+                          env=environment)
+    if done.returncode != 0:
+        raise AssertionError(f"status {done.returncode}: {done.stderr}")
+    return json.loads(done.stdout)
+
+
+class InTheGuest(unittest.TestCase):
+    def run_guest(self, *arguments, **options) -> guest.Run:
+        return guest.run_guest(BUILD, CACHE, *arguments, **options)
+
+    def test_a_full_log_reads_as_over_the_network_and_simulated(self):
+        with guest.ipmi_sim(SEL, SDRS) as (udp, tcp):
+            # One user of the BMC at a time.
+            run = self.run_guest(LOG, external(tcp) + ["-smbios", "type=1,product=SIM-1"])
+            lan = collect("--from", f"lan:127.0.0.1:{udp}", "--user", "root")
+        self.assertEqual(run.status, 0, run.err)
+        inband = json.loads(run.out)
+        self.assertEqual(len(inband["instances"]), len(SEL))
+        self.assertEqual(inband["instances"], lan["instances"])
+        server = {"local_time": "20240305120000.000000+000", "machine_type": "SIM-1",
+                  "smbios": ["26 12 00 30 01 20 20 00 a3 0c 00 00 00 00 00 00 01 05 00 00"],
+                  "bmcs": [{"sel": {"entries": [bytes(i["properties"]["RawData"]).hex()
+                                                for i in inband["instances"]]},
+                            "sdr": {"records": [record.hex() for record in SDRS]}}]}
+        with tempfile.NamedTemporaryFile("w", suffix=".json") as file:
+            json.dump(server, file)
+            file.flush()
+            simulated = collect("--from", f"sim:{file.name}")
+        self.assertEqual(inband["instances"], simulated["instances"])
+
+    def test_an_empty_log_is_whole(self):
+        run = self.run_guest(LOG, KCS_INTERNAL)
+        self.assertEqual(run.status, 0, run.err)
+        self.assertEqual(json.loads(run.out)["instances"], [])
+
+    def test_without_the_driver_the_notice_is_given(self):
+        run = self.run_guest(LOG, KCS_INTERNAL, load_driver=False)
+        self.assertIn("the IPMI driver is not installed", run.err)
+        self.assertIn("the IPMI driver is not installed", json.loads(run.out)["notices"][0])
+        self.assertNotEqual(run.status, 0)
+
+    def test_without_a_bmc_the_source_cannot_be_opened(self):
+        run = self.run_guest(LOG, [])
+        self.assertEqual(run.status, 3, run.err)
+        self.assertEqual(len(run.err.splitlines()), 1)
+
+
+if __name__ == "__main__":
+    try:
+        guest.kernel(CACHE)
+        with tempfile.TemporaryDirectory() as probe:
+            guest.initramfs(BUILD, [], "")
+        if not guest.shutil.which("qemu-system-x86_64"):
+            raise guest.Missing("no qemu-system-x86_64 (package qemu-system-x86)")
+    except guest.Missing as missing:
+        print(f"SKIPPED: {missing}")
+        sys.exit(77)
+    unittest.main(argv=sys.argv[:1], verbosity=2)
