@@ -76,7 +76,7 @@ unsigned IPMISELEntry::ScanSELDataFile(TCPluginCallbacks* /*context*/, const s_S
     bytes_ = SwapId(wire);
     if (LogEnabled(kTrace)) {
         std::string line = "Results of ScanSELDataFile:";
-        for (const std::uint8_t byte : bytes_) line += " " + std::to_string(byte);
+        for (const std::uint8_t byte : bytes_) line.append(" ").append(std::to_string(byte));
         WriteLog(kTrace, line);
     }
     return kOk;

@@ -1,9 +1,8 @@
-#include <ctime>
-#include <limits>
 #include <string>
 
 #include "base/log.h"
 #include "base/text.h"
+#include "records/calendar_time.h"
 #include "records/sel_entry.h"
 #include "records/sel_texts.h"
 #include "tqr/datetime.h"
@@ -20,27 +19,12 @@ constexpr const char* kNoTime = "19700101000000.000000+000";
 /// Time stamps up to here count from the initialisation of the BMC (IPMI 2.0, 37.1).
 constexpr std::int64_t kLastBeforeInitialisation = 0x1FFFFFFF;
 
-TCIMDateTime CalendarTime(std::int64_t seconds, short utcOffset) {
-    std::tm fields{};
-    const auto time = static_cast<std::time_t>(seconds);
-    if (time != seconds || gmtime_r(&time, &fields) == nullptr) {
-        WriteLog(kInfo, "Could not convert CurrentTimeStamp.");
-        throw NQORTQR20::TTQRException({NQORTQR20::kStatusBadTime});
-    }
-    TCIMDateTime calendar;
-    calendar.Set(
-        static_cast<unsigned short>(fields.tm_year + 1900),
-        static_cast<unsigned short>(fields.tm_mon + 1), static_cast<unsigned int>(fields.tm_mday),
-        static_cast<unsigned short>(fields.tm_hour), static_cast<unsigned short>(fields.tm_min),
-        static_cast<unsigned short>(fields.tm_sec), 0, utcOffset);
-    return calendar;
-}
-
 }  // namespace
 
 std::string TimestampText(std::int64_t seconds, short utcOffset) {
     try {
-        std::string text = CalendarTime(seconds, utcOffset).ToString();
+        std::string text =
+            CalendarTime(seconds, utcOffset, "Could not convert CurrentTimeStamp.").ToString();
         if (LogEnabled(kTrace)) {
             // Compatibility: nothing is added to a time before initialisation either
             // (Timestamp.IsTheCalendarTimeWithTheLocalOffset).

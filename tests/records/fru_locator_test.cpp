@@ -26,7 +26,7 @@ TEST(FruLocator, MarkerSelectsTheFixedLayout) {
     Put(&locator, 10, std::string("\x01%\x00", 3));
     Put(&locator, 17, "Board serial");
     Put(&locator, 48, "Maker*cut at the star");
-    Put(&locator, 81, std::string(40, 'N'));
+    Put(&locator, 81, std::string(31, 'N'));
     Put(&locator, 112, "S1");
     Put(&locator, 144, "Product");
     EXPECT_THAT(StringsOf(locator), ElementsAre("No chassis part number", "Product", "Board serial",
