@@ -51,11 +51,24 @@ std::string DirectionOf(const std::string& eventType) {
     return comma == std::string::npos ? eventType : eventType.substr(0, comma);
 }
 
-/// The message without what the direction's column says already.
-std::string MessageOf(std::string message, const std::string& direction) {
-    const std::string repeated = "): " + direction + ": ";
-    const auto at = direction.empty() ? std::string::npos : message.find(repeated);
-    if (at != std::string::npos) message.replace(at, repeated.size(), "): ");
+void Remove(std::string_view part, std::string* text) {
+    const auto at = text->find(part);
+    if (!part.empty() && at != std::string::npos) text->erase(at, part.size());
+}
+
+/// The source without a LUN and a channel of 0, which nearly all have.
+std::string SourceOf(std::string source) {
+    Remove(" LUN 0.", &source);
+    Remove(" Channel 0.", &source);
+    return source;
+}
+
+/// The message without what the columns beside it say.
+std::string MessageOf(std::string message, const std::string& sensorType,
+                      const std::string& direction) {
+    if (!direction.empty()) Remove(" " + direction + ":", &message);
+    if (!sensorType.empty()) Remove(sensorType + " - ", &message);
+    Remove("(): ", &message);
     return message;
 }
 
@@ -125,12 +138,13 @@ private:
 
     static Row LogRow(const tqrhost::Instance& instance) {
         const std::string direction = DirectionOf(TextOf(instance, "EventType"));
+        const std::string sensorType = TextOf(instance, "SensorType");
         return {TextOf(instance, "RecordID"),
                 TimeText(TextOf(instance, "MessageTimestamp")),
-                TextOf(instance, "Source"),
-                TextOf(instance, "SensorType"),
+                SourceOf(TextOf(instance, "Source")),
+                sensorType,
                 direction,
-                MessageOf(TextOf(instance, "Message"), direction)};
+                MessageOf(TextOf(instance, "Message"), sensorType, direction)};
     }
 
     void PrintRow(const Row& row) {

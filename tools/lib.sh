@@ -1,0 +1,34 @@
+# What the scripts of this folder share. Sourced, not run.
+
+# install_packages NAME...: installs those that are missing; fails when one cannot be had.
+install_packages() {
+    local missing=() name
+    for name in "$@"; do
+        dpkg-query -W -f='${Status}' "$name" 2>/dev/null | grep -q '^install ok installed' ||
+            missing+=("$name")
+    done
+    [ ${#missing[@]} -eq 0 ] && return 0
+    if ! command -v apt-get >/dev/null; then
+        echo "install these first, apt-get is not here: ${missing[*]}" >&2
+        return 1
+    fi
+    local as_root=()
+    if [ "$(id -u)" -ne 0 ]; then
+        command -v sudo >/dev/null || {
+            echo "run this as root, or install: ${missing[*]}" >&2
+            return 1
+        }
+        as_root=(sudo)
+    fi
+    echo "Installing: ${missing[*]}"
+    # The list of packages is made new once, and only when something is to be installed.
+    if [ -z "${packages_updated:-}" ]; then
+        "${as_root[@]}" env DEBIAN_FRONTEND=noninteractive apt-get -qq update || return 1
+        packages_updated=yes
+    fi
+    "${as_root[@]}" env DEBIAN_FRONTEND=noninteractive \
+        apt-get -qq install --no-install-recommends -y "${missing[@]}" >/dev/null
+}
+
+build_packages=(g++ cmake ninja-build pkg-config libfreeipmi-dev libcli11-dev nlohmann-json3-dev)
+test_packages=(ccache googletest openipmi ipmitool freeipmi-tools file python3)
