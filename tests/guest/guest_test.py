@@ -19,12 +19,17 @@ PROGRAM = BUILD / "bin/ipmisel"
 KCS_INTERNAL = ["-device", "ipmi-bmc-sim,id=bmc0", "-device", "isa-ipmi-kcs,bmc=bmc0"]
 LOG = "collect --from inband --format json --class QORSG_IPMILogRecord"
 
-# A full sensor record: number 0x30, degrees C, M = 1; and a compact one, number 0x31.
+def record(number: int, kind: int, body: str, name: str) -> bytes:
+    """A sensor data record: header, body to the byte before the ID string, ID string."""
+    rest = bytes.fromhex(body) + bytes([0xC0 | len(name)]) + name.encode()
+    return bytes([number, 0, 0x51, kind, len(rest)]) + rest
+
+
+# A full record: sensor 0x30, degrees C, M = 1; and a compact one, sensor 0x31.
 SDRS = [
-    bytes.fromhex("0100 51 01 36 2000 30 0301 7f68 0101 0000 0000 0000 80 01 00 00 0100 0000 0000"
-                  "07 0000000000000000000000000000000000 0000" "cb43505520312054656d7020"),
-    bytes.fromhex("0200 51 02 25 2000 31 0401 6740 0d6f 0000 0000 0000 00 00 00 00 00 00 00 00 00"
-                  "00 ca447269766520426179") + b" 1",
+    record(1, 1, "2000 30 0301 7f68 0101 000000000000 80010000 0100 0000 0000" + "00" * 17,
+           "CPU1 Temp"),
+    record(2, 2, "2000 31 0401 6740 0d6f 000000000000 c00000" + "00" * 8, "Drive 1"),
 ]
 # record ID, type 02, time, generator, revision, sensor type, number, event type, data 1 to 3
 SEL = [bytes.fromhex(f"{i:02x}00 02 00000000 2000 04 {event}") for i, event in enumerate(
@@ -54,9 +59,9 @@ class InTheGuest(unittest.TestCase):
 
     def test_a_full_log_reads_as_over_the_network_and_simulated(self):
         with guest.ipmi_sim(SEL, SDRS) as (udp, tcp):
-            # One user of the BMC at a time.
-            run = self.run_guest(LOG, external(tcp) + ["-smbios", "type=1,product=SIM-1"])
+            # Before the guest: ipmi_sim does not outlive a virtual machine that leaves.
             lan = collect("--from", f"lan:127.0.0.1:{udp}", "--user", "root")
+            run = self.run_guest(LOG, external(tcp) + ["-smbios", "type=1,product=SIM-1"])
         self.assertEqual(run.status, 0, run.err)
         inband = json.loads(run.out)
         self.assertEqual(len(inband["instances"]), len(SEL))
