@@ -14,9 +14,8 @@
 /// `traceFile` are accepted and not used; `recordIdOffset` is added to every record's own ID.
 /// 0 when all records were processed, whatever befell single ones; 1 when no value array could be
 /// had.
-unsigned ExportSEL(int node, NQORTQR20::TCPluginCallbacks* context,
-                   NQORTQR20::fdriIOHandle* output, IPMISELEntry* decoder, IPMIMapping* mapping,
-                   std::FILE* traceFile, SDRCache* cache, IPMISELEntry* entries,
-                   unsigned int count, int recordIdOffset,
+unsigned ExportSEL(int node, NQORTQR20::TCPluginCallbacks* context, NQORTQR20::fdriIOHandle* output,
+                   IPMISELEntry* decoder, IPMIMapping* mapping, std::FILE* traceFile,
+                   SDRCache* cache, IPMISELEntry* entries, unsigned int count, int recordIdOffset,
                    std::vector<IPMIExtendedSELDataEntry> extendedEntries,
                    NQORTQR20::SPLibrary* library);

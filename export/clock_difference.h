@@ -1,0 +1,22 @@
+#pragma once
+
+#include "tqr/datetime.h"
+#include "tqr/plugin.h"
+#include "tqr/splibrary.h"
+
+namespace ipmisel {
+
+/// Stands for no time in every time stamp that is written.
+inline constexpr const char* kNoTime = "19700101000000.000000+000";
+
+/// How far the BMC's clock stands from the operating system's: measured once per export, handed to
+/// the time stamps of every record.
+struct ClockDifference {
+    NQORTQR20::TCIMDateTime difference{kNoTime};
+    bool bmcNotBehind = false;
+    bool synchronise = true;  ///< false when the difference could not be measured
+};
+
+ClockDifference MeasureClock(NQORTQR20::TCPluginCallbacks* context, NQORTQR20::SPLibrary* library);
+
+}  // namespace ipmisel

@@ -1,0 +1,10 @@
+#include "plugin/state.h"
+
+namespace ipmisel {
+
+ModuleState& Module() {
+    static ModuleState state;
+    return state;
+}
+
+}  // namespace ipmisel

@@ -1,0 +1,156 @@
+#include "export/aux_debug_export.h"
+
+#include <numeric>
+#include <string>
+#include <vector>
+
+#include "base/bytes.h"
+#include "host/core/host.h"
+#include "tests/export/refusing_host.h"
+#include "tests/support/bmc_fixture.h"
+#include "tests/support/wire.h"
+
+namespace ipmiseltest {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::Not;
+
+constexpr const char* kAuxClass = "QORSG_ZMCAuxDebugRecord";
+
+class AuxDebugLog : public BmcTest {
+protected:
+    InstanceRecorder written;
+    std::vector<s_AuxLog_entry> entries;
+    std::vector<IPMISELEntry> selEntries;
+
+    ~AuxDebugLog() override { gNoArrays = false; }
+
+    /// `seconds` is the time of the record.
+    void AddSel(std::uint16_t id, std::uint8_t seconds = 0) {
+        SelRecord record = SystemEvent(id, 0x01, 0x30);
+        record[3] = seconds;
+        s_SEL_row row{};
+        ("00 FF FF " + ipmisel::DumpBytes(record, ipmisel::Digits::kUpperHex))
+            .copy(row.data, sizeof row.data - 1);
+        ASSERT_EQ(selEntries.emplace_back().ScanSELDataFile(nullptr, &row, 0), 0U);
+    }
+    /// An entry of the type whose data counts up from there.
+    void Add(std::uint16_t selId, std::uint8_t type = 0x03, std::uint16_t recordSize = 4) {
+        s_AuxLog_entry entry{};
+        std::iota(std::begin(entry.bytes), std::end(entry.bytes), std::uint8_t{0});
+        entry.bytes[0] = 0x4D;
+        entry.bytes[1] = 0x4F;
+        entry.bytes[2] = 0x00;
+        entry.bytes[3] = static_cast<std::uint8_t>(recordSize);
+        entry.bytes[4] = static_cast<std::uint8_t>(recordSize >> 8);
+        entry.bytes[5] = static_cast<std::uint8_t>(selId);
+        entry.bytes[6] = static_cast<std::uint8_t>(selId >> 8);
+        entry.bytes[10] = type;
+        entries.push_back(entry);
+    }
+    unsigned Export() {
+        log.Clear();
+        const tqrhost::OutputHandle output(written);
+        return ExportAuxDebugLog(1, nullptr, output.get(), entries.data(),
+                                 static_cast<unsigned>(entries.size()), selEntries.data(),
+                                 static_cast<unsigned>(selEntries.size()), &mapping_, Library());
+    }
+    std::vector<std::string> Written(std::string_view property) const {
+        std::vector<std::string> values;
+        for (const auto& instance : written.instances) {
+            values.push_back(TextOf(instance, property).value_or("(none)"));
+        }
+        return values;
+    }
+    static std::vector<std::uint8_t> RawData(const tqrhost::Instance& instance) {
+        return std::get<std::vector<std::uint8_t>>(instance.properties.back().second);
+    }
+
+private:
+    IPMIMapping mapping_;
+};
+
+TEST_F(AuxDebugLog, WritesDebugCodesOfKnownRecords) {
+    AddSel(0x0102, 1);
+    AddSel(0x0304, 2);
+    AddSel(0x0304, 3);
+    Add(0x0304);
+    Add(0x0304, 0x01);
+    Add(0x0999);
+    Add(0x0102);
+    entries.push_back({});
+    Add(0x0102, 0x03, 0);
+    Add(0x0102);
+    entries.back().bytes[2] = 0x01;  // signature
+    EXPECT_EQ(Export(), 0U);
+
+    EXPECT_THAT(Written("RecordID"), ElementsAre("0", "3", "5"));
+    ASSERT_EQ(written.instances.size(), 3U);
+    const tqrhost::Instance& first = written.instances[0];
+    EXPECT_EQ(first.className, kAuxClass);
+    std::vector<std::string> names;
+    for (const auto& property : first.properties) names.push_back(property.first);
+    EXPECT_THAT(names, ElementsAre("MessageTimestamp", "CreationClassName", "LogCreationClassName",
+                                   "LogName", "RecordID", "RawData"));
+    EXPECT_EQ(TextOf(first, "CreationClassName"), kAuxClass);
+    EXPECT_EQ(TextOf(first, "LogCreationClassName"), kAuxClass);
+    EXPECT_EQ(TextOf(first, "LogName"), kAuxClass);
+    EXPECT_THAT(RawData(first), ElementsAre(0x03, 11, 12, 13));
+    EXPECT_THAT(RawData(written.instances[2]), IsEmpty());
+    // The first of two records with one ID.
+    EXPECT_EQ(Written("MessageTimestamp")[0].substr(0, 14), "20240305092522");
+    EXPECT_EQ(Written("MessageTimestamp")[1].substr(0, 14), "20240305092521");
+
+    EXPECT_THAT(log.Lines(1), ElementsAre("Found corresponding SEL Record Entry.",
+                                          "No corresponding SEL Record found.",
+                                          "Found corresponding SEL Record Entry.",
+                                          "Found corresponding SEL Record Entry."));
+    EXPECT_EQ(log.Lines(3)[0], "selid is 258\n");
+    EXPECT_THAT(log.Lines(4), Contains("RecordSize= 4\n"));
+    EXPECT_EQ(log.Lines(4).front(), "ExportAuxDebugLog() function entered.");
+    EXPECT_EQ(log.Lines(4).back(), "ExportAuxDebugLog() function exited.");
+}
+
+TEST_F(AuxDebugLog, RawDataEndsWithTheEntry) {
+    AddSel(1);
+    for (const std::uint16_t size : {245, 246, 247, 0xFFFF}) Add(1, 0x03, size);
+    EXPECT_EQ(Export(), 0U);
+    std::vector<std::size_t> sizes;
+    for (const auto& instance : written.instances) sizes.push_back(RawData(instance).size());
+    EXPECT_THAT(sizes, ElementsAre(245U, 246U, 246U, 246U));
+    EXPECT_EQ(RawData(written.instances[3]).back(), 255);
+}
+
+TEST_F(AuxDebugLog, RefusedPropertyAbandonsItsEntryAlone) {
+    AddSel(1);
+    Add(1);
+    for (const char* property : {"MessageTimestamp", "CreationClassName", "LogCreationClassName",
+                                 "LogName", "RecordID", "RawData"}) {
+        written.refusedProperty = property;
+        EXPECT_EQ(Export(), 0U);
+        EXPECT_THAT(written.instances, IsEmpty());
+        const std::string line = property == std::string("RawData")
+                                     ? "Failed to add array property."
+                                     : std::string("Error adding ") + property + ".";
+        EXPECT_THAT(log.Lines(1), ElementsAre("Found corresponding SEL Record Entry.", line));
+        EXPECT_THAT(log.Lines(4), Contains("ExportAuxDebugLog() function exited."));
+    }
+}
+
+TEST_F(AuxDebugLog, WithoutArraysEndsTheExport) {
+    AddSel(1);
+    Add(1);
+    Add(1);
+    gNoArrays = true;
+    EXPECT_EQ(Export(), 1U);
+    EXPECT_THAT(written.instances, IsEmpty());
+    EXPECT_THAT(log.Lines(1), ElementsAre("Found corresponding SEL Record Entry.",
+                                          "Could not create Array for Raw Hex Data."));
+    EXPECT_THAT(log.Lines(4), Not(Contains("ExportAuxDebugLog() function exited.")));
+}
+
+}  // namespace
+}  // namespace ipmiseltest

@@ -1,0 +1,267 @@
+#include "export/sel_export.h"
+
+#include <dlfcn.h>
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "base/bytes.h"
+#include "base/log.h"
+#include "host/core/host.h"
+#include "tests/support/bmc_fixture.h"
+#include "tests/support/wire.h"
+
+namespace {
+bool gNoArrays = false;  // the host has no memory for value arrays
+}  // namespace
+
+/// In place of the host's own, to which it leads on.
+NQORTQR20::TTQRStatusCode NQORTQR20::fdrNewCIMValueArray(TCIMValueArray** array) {
+    if (gNoArrays) return {kStatusFailed};
+    using Operation = TTQRStatusCode (*)(TCIMValueArray**);
+    static const auto next = reinterpret_cast<Operation>(
+        dlsym(RTLD_NEXT, "_ZN9NQORTQR2019fdrNewCIMValueArrayEPPNS_14TCIMValueArrayE"));
+    return next(array);
+}
+
+namespace ipmiseltest {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::Not;
+
+constexpr const char* kNoTime = "19700101000000.000000+000";
+
+/// Refuses the first write of one property.
+class RefusingOnce : public InstanceRecorder {
+public:
+    std::string refusedOnce;
+    bool AddProperty(std::string_view name, const tqrhost::PropertyValue& value) override {
+        if (name == refusedOnce) {
+            refusedOnce.clear();
+            return false;
+        }
+        return InstanceRecorder::AddProperty(name, value);
+    }
+};
+
+class SelExport : public BmcTest {
+protected:
+    RefusingOnce written;
+    std::vector<IPMISELEntry> entries;
+    std::vector<IPMIExtendedSELDataEntry> extended;
+
+    ~SelExport() override { gNoArrays = false; }
+
+    static SelRecord Record(std::uint16_t id, std::uint8_t type) {
+        return type == 0x02 ? SystemEvent(id, 0x01, 0x30) : OtherRecord(id, type);
+    }
+    void Add(const SelRecord& record) {
+        const std::string text =
+            "00 FF FF " + ipmisel::DumpBytes(record, ipmisel::Digits::kUpperHex);
+        s_SEL_row row{};
+        text.copy(row.data, sizeof row.data - 1);
+        ASSERT_EQ(entries.emplace_back().ScanSELDataFile(context_.get(), &row, 0), 0U);
+    }
+    void AddSensor(std::uint8_t number, std::uint8_t entity, std::uint8_t instance,
+                   const std::string& name) {
+        auto& sensor = *sensors_.emplace_back(std::make_unique<IPMISDREntry>());
+        sensor.sdrVersion = 0x51;
+        sensor.recordType = 0x01;
+        sensor.sensorNumber = number;
+        sensor.entityId = entity;
+        sensor.entityInstance = instance;
+        sensor.m = 1;
+        name.copy(sensor.IDString.get(), 16);
+        sensor.IDString[name.size()] = '\0';
+        cache_.push_back(&sensor);
+    }
+    unsigned Export(int node = 0, int recordIdOffset = 0) {
+        const tqrhost::OutputHandle output(written);
+        log.Clear();
+        return ExportSEL(node, context_.get(), output.get(), nullptr, &mapping_, nullptr, &cache_,
+                         entries.data(), static_cast<unsigned>(entries.size()), recordIdOffset,
+                         extended, Library());
+    }
+    static std::string Names(const tqrhost::Instance& instance) {
+        std::string names;
+        for (const auto& property : instance.properties) names += property.first + " ";
+        return names;
+    }
+    std::string Text(std::size_t instance, std::string_view property) {
+        return TextOf(written.instances.at(instance), property).value_or("(none)");
+    }
+
+private:
+    tqrhost::PluginContext context_{IPMISEL_TEXTS};
+    IPMIMapping mapping_;
+    std::vector<std::unique_ptr<IPMISDREntry>> sensors_;
+    SDRCache cache_;
+};
+
+TEST_F(SelExport, WritesThePropertiesOfEachRecordTypeInOrder) {
+    const std::string bothTimes = "MessageTimestamp CreationTimeStamp ";
+    const struct {
+        std::uint8_t type;
+        std::string names;
+        const char* sensorType;
+        bool hasTime = true;
+    } cases[] = {
+        {0xC0, bothTimes + "SensorType Message ", "OEM POST with Time Stamp"},
+        {0xC1, bothTimes + "SensorType Message ", "OEM SMI Handler with Time Stamp"},
+        {0xE0, bothTimes + "SensorType Message ", "OEM POST No Time Stamp", false},
+        {0xE1, bothTimes + "SensorType Message ", "OEM SMI No Time Stamp", false},
+        {0xDC, "MessageTimestamp SensorType Message ", "Boot Time"},
+        {0xDD, "MessageTimestamp SensorType Message ", "Shutdown Event"},
+        {0x7F, bothTimes + "Message ", "(none)", false},
+        {0x02,
+         bothTimes + "Source SensorType EventType Entity EntityInstance SensorInformation Message ",
+         "Temperature"},
+    };
+    for (const auto& c : cases) Add(Record(0x0105, c.type));
+    EXPECT_EQ(Export(1), 0U);
+    ASSERT_EQ(written.instances.size(), std::size(cases));
+    for (std::size_t i = 0; i < std::size(cases); ++i) {
+        SCOPED_TRACE(cases[i].sensorType);
+        const tqrhost::Instance& instance = written.instances[i];
+        EXPECT_EQ(instance.className, "QORSG_IPMILogRecord");
+        EXPECT_EQ(Names(instance), "CreationClassName LogCreationClassName LogName RecordID " +
+                                       cases[i].names + "AuxLog SourceNode RawData ");
+        EXPECT_EQ(Text(i, "SensorType"), cases[i].sensorType);
+        EXPECT_EQ(Text(i, "CreationClassName"), "QORSG_IPMILog");
+        EXPECT_EQ(Text(i, "LogName"), "IPMILogEntry");
+        EXPECT_EQ(Text(i, "RecordID"), "261");
+        EXPECT_EQ(Text(i, "SourceNode"), "2");
+        EXPECT_EQ(Text(i, "AuxLog"), "No Extended Data");
+        EXPECT_EQ(Text(i, "MessageTimestamp") != kNoTime, cases[i].hasTime);
+        const SelRecord record = Record(0x0105, cases[i].type);
+        EXPECT_EQ(std::get<std::vector<std::uint8_t>>(instance.properties.back().second),
+                  std::vector<std::uint8_t>(record.begin(), record.end()));
+    }
+    EXPECT_THAT(log.Lines(ipmisel::kWarning), IsEmpty());
+}
+
+TEST_F(SelExport, EntityNamesAboveTheNumberedOnesReachOnlyTheMessage) {
+    AddSensor(0x31, 0x2C, 3, "Ambient");
+    AddSensor(0x32, 0x35, 3, "Ambient");
+    AddSensor(0x33, 0x0A, 1, "VRM 1");
+    Add(SystemEvent(1, 0x01, 0x31));
+    Add(SystemEvent(2, 0x01, 0x32, 0x81));
+    Add(SystemEvent(3, 0x08, 0x33));
+    Add(SystemEvent(4, 0x04, 0x34));
+    Export();
+    ASSERT_EQ(written.instances.size(), 4U);
+    const struct {
+        const char* entity;
+        const char* instance;
+        const char* sensorType;
+        const char* sensor;
+        std::string message;
+    } cases[] = {
+        {"", "3", "Temperature", "Ambient", "IO module 3 (Temperature - Ambient): Assertion: "},
+        {"", "3", "Temperature", "Ambient", " 3 (Temperature - Ambient): Deassertion: "},
+        {"Power Supply", "1", "Power Supply", "VRM 1",
+         "Power Supply 1 (Voltage Regulator Module - VRM 1): Assertion: "},
+        {"", "", "Fan", "", "  (Fan - ): Assertion: "},  // no such sensor
+    };
+    for (std::size_t i = 0; i < std::size(cases); ++i) {
+        EXPECT_EQ(Text(i, "Entity"), cases[i].entity);
+        EXPECT_EQ(Text(i, "EntityInstance"), cases[i].instance);
+        EXPECT_EQ(Text(i, "SensorType"), cases[i].sensorType);
+        EXPECT_EQ(Text(i, "SensorInformation"), cases[i].sensor);
+        EXPECT_EQ(Text(i, "Message").substr(0, cases[i].message.size()), cases[i].message);
+    }
+}
+
+TEST_F(SelExport, UnknownTypeIsLoggedWithItsIdSwapped) {
+    Add(Record(0x0102, 0x7F));
+    Export();
+    EXPECT_EQ(Text(0, "Message"),
+              "Unknown log type. Raw Data:\n02 01 7f 11 12 13 14 15 16 17 18 19 1a 1b 1c 1d");
+    EXPECT_THAT(log.Lines(ipmisel::kTrace),
+                Contains("This SEL entry (ID 513) has an unknown type (0x7f).\n"));
+}
+
+TEST_F(SelExport, OffsetCountsForTheExtendedEntryToo) {
+    extended.resize(1);
+    extended[0].SetSELRecordId(0x05, 0x01);
+    extended[0].SetType(0x02);
+    extended[0].SetSeverity(0x40);
+    extended[0].SetSubclass(1);
+    extended[0].SetClass(1);
+    extended[0].SetExtendedData("0A ");
+    Add(SystemEvent(5, 0x01, 0x30));
+    Export(0, 256);
+    EXPECT_EQ(Text(0, "RecordID"), "261");
+    EXPECT_EQ(Text(0, "AuxLog"),
+              "Type: ERROR_CODE Sev: QOR_ERROR_INFO Class: Peripheral Sub-Class: Keyboard "
+              "Instance: Not set GUID: Not set Extended Data: 0A ");
+}
+
+TEST_F(SelExport, RefusedPropertyAbandonsThatRecordOnly) {
+    struct Case {
+        std::uint8_t type;
+        std::string property;
+        std::string line;
+    };
+    std::vector<Case> cases{
+        {0x02, "SourceNode", "Error adding QORSG_IPMILogRecord -- SourceNode."},
+        {0x02, "RawData", "Failed to add array property."},
+        {0xDC, "RecordID", "Error adding OS bootTime RecordID."},
+        {0xDD, "SensorType", "Error adding OS bootTime SensorType."},
+        {0xE0, "SensorType", "Error adding SensorType."},
+    };
+    for (const std::string property :
+         {"CreationClassName", "LogCreationClassName", "LogName", "RecordID", "MessageTimestamp",
+          "CreationTimeStamp", "Source", "SensorType", "EventType", "Entity", "EntityInstance",
+          "SensorInformation", "Message", "AuxLog"}) {
+        cases.push_back({0x02, property, "Error adding " + property + "."});
+    }
+    for (const Case& c : cases) {
+        entries.clear();
+        written.instances.clear();
+        Add(Record(1, c.type));
+        Add(Record(2, 0x02));
+        written.refusedOnce = c.property;
+        EXPECT_EQ(Export(), 0U);
+        EXPECT_THAT(log.Lines(ipmisel::kWarning), ElementsAre(c.line));
+        ASSERT_EQ(written.instances.size(), 1U) << c.property;
+        EXPECT_EQ(Text(0, "RecordID"), "2");
+    }
+}
+
+TEST_F(SelExport, UnknownTypeCanDoWithoutItsMessage) {
+    Add(Record(1, 0x7F));
+    written.refusedOnce = "Message";
+    EXPECT_EQ(Export(), 0U);
+    ASSERT_EQ(written.instances.size(), 1U);
+    EXPECT_THAT(log.Lines(ipmisel::kWarning), IsEmpty());
+    EXPECT_THAT(log.Lines(ipmisel::kTrace), Contains("No Raw Data Message."));
+}
+
+TEST_F(SelExport, WithoutAValueArrayTheExportEnds) {
+    Add(Record(1, 0x02));
+    Add(Record(2, 0x02));
+    gNoArrays = true;
+    EXPECT_EQ(Export(), 1U);
+    EXPECT_THAT(written.instances, IsEmpty());
+    EXPECT_THAT(log.Lines(ipmisel::kWarning),
+                ElementsAre("Could not create Array for Raw Hex Data."));
+    EXPECT_THAT(log.Lines(ipmisel::kTrace), Not(Contains("ExportSEL() function complete.")));
+}
+
+TEST_F(SelExport, UnknownClockDifferenceIsTolerated) {
+    Silence(0x48, 0);
+    EXPECT_EQ(Export(), 0U);  // of no records
+    EXPECT_THAT(written.instances, IsEmpty());
+    EXPECT_THAT(log.Lines(ipmisel::kNotice),
+                ElementsAre("Not synchronizing BMC time with OS time."));
+    EXPECT_EQ(log.All().front().second, "ExportSEL() function entered.");
+    EXPECT_EQ(log.All().back().second, "ExportSEL() function complete.");
+}
+
+}  // namespace
+}  // namespace ipmiseltest

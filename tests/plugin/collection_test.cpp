@@ -1,0 +1,339 @@
+#include "plugin/collection.h"
+
+#include <cstdlib>
+#include <new>
+
+#include "ipmi/request_aux_log.h"
+#include "ipmi/request_sdr.h"
+#include "ipmi/request_sel.h"
+#include "records/sdr_entry.h"
+#include "tests/support/machine_fixture.h"
+
+namespace {
+std::size_t gRefusedSize = 0;  // allocations of this size fail
+}  // namespace
+
+void* operator new(std::size_t size) {
+    if (size == gRefusedSize) throw std::bad_alloc();
+    if (void* const memory = std::malloc(size == 0 ? 1 : size)) return memory;
+    throw std::bad_alloc();
+}
+void operator delete(void* memory) noexcept { std::free(memory); }
+void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
+
+namespace ipmiseltest {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::Not;
+
+constexpr const char* kLog = "QORSG_IPMILogRecord";
+constexpr const char* kAux = "QORSG_ZMCAuxDebugRecord";
+constexpr const char* kFru = "QORSG_IPMIFRU";
+
+constexpr std::uint8_t kGetSelInfo = 0x40;
+constexpr std::uint8_t kGetSelEntry = 0x43;
+constexpr std::uint8_t kGetSdrInfo = 0x20;
+constexpr std::uint8_t kGetSdr = 0x23;
+
+class Pass : public MachineTest {
+protected:
+    Pass() {
+        nodes[0].selEntries = {SystemEvent(1, 0x01, 0x30), SystemEvent(2, 0x01, 0x31),
+                               SystemEvent(3, 0x01, 0x30)};
+        nodes[0].sdrRecords = {FullSensor(1, 0x30, 0x07, 1, "Ambient"),
+                               FullSensor(2, 0x31, 0x03, 2, "CPU 2")};
+    }
+    ~Pass() override { gRefusedSize = 0; }
+
+    /// Of the lines of this pass those that are in `wanted`, in the order in which they came.
+    std::vector<std::string> Order(const std::vector<std::string>& wanted) const {
+        std::vector<std::string> found;
+        for (const auto& [severity, line] : log.All()) {
+            if (std::find(wanted.begin(), wanted.end(), line) != wanted.end()) {
+                found.push_back(line);
+            }
+        }
+        return found;
+    }
+};
+
+TEST_F(Pass, TellsOfItsStepsInOrder) {
+    facts.machineType = "SIM-1";
+    facts.integratedBmc = true;
+    facts.smbios.push_back(OemStrings({"CPLD 2"}));
+    const std::vector<std::string> expected{
+        "Getting IPMI SEL data.",
+        "getMachineType() entered.",
+        "getMachineType() completed.",
+        "Machine Type is:",
+        "SIM-1",
+        "Preparing to find type 38 for BMC.",
+        "Found a Type 38 SMBIOS BMC record",
+        "Successfully found type 38 for BMC. or support ipmi lan",
+        "IPMISel:Discover BMC nodes number: 1",
+        "This machine has CPLD.",
+        "This machine doesn't have FPGA.",
+        "This machine has AMI backplane.",
+        "Found matching BMC machine type",
+        "BMC machine type index=0",
+        "Dev_Types Iter=CPU Card, CPU, System Board, Memory Card 1, Power Supply 1, Power Supply 2",
+        "Getting log records.",
+        "IPMIRequestSEL::IPMIGetSELInfo() completed.",
+        "IPMIRequestSEL::IPMIGetSELEntry() completed.",
+        "IPMIRequestSDR::IPMIGetSDREntry() completed.",
+        "Printing out the SDR buffer...",
+        "CreateSDRCache() function completed.",
+        "FillSELArray() function completed.",
+        "num_SELentries = 3",
+        "num_AuxLogEntries = 0",
+        "Leaving ParseExtendedSELData.",
+        "ExportSEL() function complete.",
+        "Completed all collecting and exporting of SEL/SDR.",
+        "DeleteSDRCacheSDRCache() function completed.",
+        "Finished getting IPMI SEL data.",
+    };
+    EXPECT_EQ(Collect({kLog}), 0);
+    EXPECT_EQ(Order(expected), expected);
+    EXPECT_THAT(Written("SensorInformation"), ElementsAre("Ambient", "CPU 2", "Ambient"));
+
+    // What is settled once is not told of again.
+    const std::vector<std::string> once{"Machine Type is:", "Preparing to find type 38 for BMC.",
+                                        "Found a Type 38 SMBIOS BMC record"};
+    EXPECT_EQ(Collect({kLog}), 0);
+    EXPECT_THAT(Order(once), IsEmpty());
+    EXPECT_EQ(written.instances.size(), 6U);
+}
+
+TEST_F(Pass, WithoutABmcCollectsNothingAndLooksAgainNextTime) {
+    facts.smbios.clear();
+    nodes.clear();
+    for (int pass = 0; pass < 2; ++pass) {
+        EXPECT_EQ(Collect({kLog, kFru}), 0);
+        EXPECT_EQ(log.Lines(3).back(), "Did NOT find a Type 38 SMBIOS BMC record");
+    }
+    EXPECT_THAT(written.instances, IsEmpty());
+    facts.smbios = {IpmiDeviceStructure()};
+    nodes.resize(1);
+    EXPECT_EQ(Collect({}), 0);
+    EXPECT_TRUE(Logged(3, "Finished getting IPMI SEL data."));
+}
+
+TEST_F(Pass, OverTheNetworkNeedsNoSmbios) {
+    facts.smbios.clear();
+    facts.ipmiLan = true;
+    EXPECT_EQ(Collect({kLog}), 0);
+    EXPECT_THAT(log.Lines(3), Not(Contains("Did NOT find a Type 38 SMBIOS BMC record")));
+    EXPECT_EQ(written.instances.size(), 3U);
+}
+
+TEST_F(Pass, PassesOverNamesThatItDoesNotKnow) {
+    EXPECT_EQ(Collect({"QORSG_IPMILogRecords", "", nullptr, "qorsg_ipmilogrecord"}), 0);
+    EXPECT_THAT(requests, IsEmpty());
+    const tqrhost::OutputHandle output(written);
+    EXPECT_EQ(IPMISELGetData(context.get(), output.get(), nullptr, 3).code, 0);
+}
+
+TEST_F(Pass, MachineWithoutDevicesSaysSo) {
+    const struct {
+        const char* machineType;
+        const char* line;
+    } cases[] = {
+        {"",
+         "Could not find vital product data Device list for Baseboard Management Controller "
+         "machine."},
+        {"Merrowgate",
+         "Could not find vital product data Device list for Baseboard Management "
+         "Controller machine on Merrowgate"},
+    };
+    for (const auto& c : cases) {
+        ipmisel::ResetModuleState();
+        IPMISELPluginInit(context.get());
+        facts.machineType = c.machineType;
+        Collect({});
+        EXPECT_TRUE(Logged(3, c.line));
+        EXPECT_TRUE(Logged(4, "Dev_Types Iter="));
+    }
+}
+
+TEST_F(Pass, SelInfoIsAskedForTwice) {
+    nodes[0].faults = {NoResponse(kGetSelInfo, 1)};
+    EXPECT_EQ(Collect({kLog}), 0);
+    EXPECT_EQ(written.instances.size(), 3U);
+
+    nodes[0].faults.push_back(CompletionCode(kGetSelInfo, 2, 0xC0));
+    EXPECT_EQ(Collect({kLog}), 3);
+    EXPECT_EQ(Sent(kGetSelInfo), 4);
+    EXPECT_TRUE(Logged(1, "Failed to communicate with BMC. This machine could be non-BMC."));
+    EXPECT_FALSE(Logged(3, "Finished getting IPMI SEL data."));
+    EXPECT_EQ(written.instances.size(), 3U);
+}
+
+TEST_F(Pass, WithoutSensorsEventsHaveNoNames) {
+    nodes[0].faults = {NoResponse(kGetSdrInfo, 1)};
+    EXPECT_EQ(Collect({kLog}), 0);
+    EXPECT_TRUE(Logged(0, "Could not collect all sensor data records\n"));
+    EXPECT_TRUE(Logged(1, "No SDR data obtained.\n"));
+    EXPECT_THAT(Written("SensorInformation"), ElementsAre("", "", ""));
+}
+
+TEST_F(Pass, SensorsReadBeforeAFailureAreUsed) {
+    nodes[0].faults = {CompletionCode(kGetSdr, 4, 0xC5)};  // header of the second record
+    EXPECT_EQ(Collect({kLog}), 0);
+    EXPECT_TRUE(Logged(0, "Could not collect all sensor data records\n"));
+    EXPECT_THAT(Written("SensorInformation"), ElementsAre("Ambient", "", "Ambient"));
+}
+
+TEST_F(Pass, WalkThatEndsEarlyExportsWhatWasRead) {
+    const struct {
+        ipmisim::Fault fault;
+        std::size_t exported;
+    } cases[] = {
+        {NoResponse(kGetSelEntry, 1), 0},
+        {NoResponse(kGetSelEntry, 3), 2},
+        {CompletionCode(kGetSelEntry, 2, 0xCB), 1},
+    };
+    for (const auto& c : cases) {
+        written.instances.clear();
+        nodes[0].faults = {c.fault};
+        EXPECT_EQ(Collect({kLog}), 0);
+        EXPECT_EQ(written.instances.size(), c.exported);
+        EXPECT_TRUE(Logged(1, "Failed to fill all the entries into SEL array.\n"));
+        EXPECT_TRUE(Logged(4, "num_SELentries = 3"));
+    }
+}
+
+TEST_F(Pass, EmptyLogWritesNothing) {
+    nodes[0].selEntries.clear();
+    EXPECT_EQ(Collect({kLog}), 0);
+    EXPECT_THAT(written.instances, IsEmpty());
+    EXPECT_TRUE(Logged(4, "Completed all collecting and exporting of SEL/SDR."));
+
+    // Counted none, and then had one all the same.
+    ipmisim::Fault late = NoResponse(kGetSelEntry, 1);
+    late.kind = ipmisim::Fault::Kind::kData;
+    late.data = {0xFF, 0xFF, 1, 0, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15};
+    nodes[0].faults = {late};
+    EXPECT_EQ(Collect({kLog}), 0);
+    EXPECT_THAT(written.instances, IsEmpty());
+}
+
+TEST_F(Pass, RunsEverySectionForEveryNode) {
+    nodes.push_back(nodes[0]);
+    nodes[1].selEntries.resize(1);
+    EXPECT_EQ(Collect({kLog}), 0);
+    EXPECT_THAT(Written("SourceNode"), ElementsAre("1", "1", "1", "2"));
+    EXPECT_TRUE(Logged(3, "IPMISel:Discover BMC nodes number: 2"));
+}
+
+TEST_F(Pass, SecondLogClassReadsTheLogAnewAndKeepsTheSensors) {
+    EXPECT_EQ(Collect({kAux, kLog}), 0);
+    EXPECT_EQ(Sent(kGetSelEntry), 6);
+    EXPECT_EQ(Sent(kGetSdr), 6);
+    EXPECT_THAT(Written("SensorInformation"), ElementsAre("Ambient", "CPU 2", "Ambient"));
+}
+
+TEST_F(Pass, SecondLogClassGoesOnWhereTheSensorsBrokeOff) {
+    nodes[0].faults = {CompletionCode(kGetSdr, 4, 0xC3)};  // header of the second record
+    EXPECT_EQ(Collect({kAux, kLog}), 0);
+    EXPECT_THAT(Written("SensorInformation"), ElementsAre("Ambient", "CPU 2", "Ambient"));
+}
+
+TEST_F(Pass, AuxiliaryLogStatusMayFail) {
+    EXPECT_EQ(Collect({kAux}), 0);
+    EXPECT_TRUE(Logged(3, "Getting Aux Log Records."));
+    EXPECT_TRUE(Logged(1, "IPMIGetAuxLogStatus() returned Error."));
+    EXPECT_THAT(written.instances, IsEmpty());
+
+    nodes[0].auxLogCount = 7;
+    EXPECT_EQ(Collect({kAux}), 0);
+    EXPECT_TRUE(Logged(4, "num_AuxLogEntries = 7"));
+    EXPECT_FALSE(Logged(1, "IPMIGetAuxLogStatus() returned Error."));
+}
+
+TEST_F(Pass, FruInventoryIsCollectedOnceInTenMinutes) {
+    static std::time_t now;
+    now = 1'700'000'000;
+    ipmisel::Module().clock = [](std::time_t*) { return now; };
+    nodes.push_back(nodes[0]);
+    const std::vector<std::string> told{"Resetting ipmifruonce.", "Setting ipmifruonce.",
+                                        "Getting VPD records."};
+    EXPECT_EQ(Collect({kFru}), 0);
+    EXPECT_THAT(Order(told), ElementsAre(told[0], told[2], told[1], told[2]));
+    for (const int seconds : {0, 599, 1}) {
+        now += seconds;
+        Collect({kFru});
+        EXPECT_THAT(Order(told), IsEmpty());
+    }
+    now += 1;
+    Collect({kFru});
+    EXPECT_THAT(Order(told), ElementsAre(told[0], told[2], told[1], told[2]));
+}
+
+TEST_F(Pass, KeptFruInstancesAreWrittenOncePerPassThatWantsThem) {
+    nodes.push_back(nodes[0]);
+    ipmisel::Module().fCurrentTime = static_cast<std::uint32_t>(std::time(nullptr));
+    ipmisel::Module().ipmifruonce = true;
+    ipmisel::Module().fIpmiFruVector = {{{"Name", "Board"}}};
+    EXPECT_EQ(Collect({kLog}), 0);
+    EXPECT_THAT(Written("Name"), Not(Contains("Board")));
+    written.instances.clear();
+    for (std::size_t pass = 1; pass <= 2; ++pass) {
+        EXPECT_EQ(Collect({kFru, kFru}), 0);
+        EXPECT_EQ(written.instances.size(), pass);
+        EXPECT_EQ(Written("Name").back(), "Board");
+        EXPECT_EQ(ipmisel::Module().fIpmiVpdentryFru, nullptr);
+    }
+}
+
+TEST_F(Pass, FruAndFirmwareAreReadInBandOnly) {
+    const struct {
+        const char* className;
+        const char* line;
+    } cases[] = {
+        {kFru, "Getting VPD records."},
+        {"QORSG_IPMIFirmwareElement", "Getting BMC firmware data."},
+        {"QORSG_CPLDFirmwareElement", "Getting CPLD firmware data."},
+        {"QORSG_FPGAFirmwareElement", "Getting FPGA firmware data."},
+        {"QORSG_AMIFirmwareElement", "Getting AMI backplane firmware data."},
+    };
+    for (const auto& c : cases) {
+        ipmisel::Module().ipmifruonce = false;
+        facts.ipmiLan = true;
+        EXPECT_EQ(Collect({c.className}), 0);
+        EXPECT_FALSE(Logged(3, c.line));
+        facts.ipmiLan = false;
+        EXPECT_EQ(Collect({c.className}), 0);
+        EXPECT_TRUE(Logged(3, c.line));
+    }
+}
+
+TEST_F(Pass, ObjectThatCannotBeCreatedEndsThePass) {
+    const struct {
+        std::size_t size;
+        const char* name;
+    } cases[] = {
+        {sizeof(IPMIRequestSDR), "ipmi_sdrp"},
+        {sizeof(IPMIRequestSEL), "ipmi_sdrp"},
+        {sizeof(IPMIRequestAuxLog), "ipmi_auxlogp"},
+        {sizeof(IPMISDREntry), "ipmi_sdr_headp"},
+    };
+    Collect({});
+    for (const auto& c : cases) {
+        OpenMachine();
+        log.Clear();
+        const tqrhost::OutputHandle output(written);
+        gRefusedSize = c.size;
+        const int status = IPMISELGetData(context.get(), output.get(), nullptr, 0).code;
+        gRefusedSize = 0;
+        EXPECT_EQ(status, 4);
+        EXPECT_THAT(log.Lines(0),
+                    ElementsAre(std::string("Could not allocate memory for ") + c.name + "."));
+        EXPECT_EQ(ipmisel::Module().fIpmiVpdentryFru, nullptr);
+    }
+}
+
+}  // namespace
+}  // namespace ipmiseltest

@@ -1,0 +1,1 @@
+extern "C" int TheDriver() { return 0; }

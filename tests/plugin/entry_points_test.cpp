@@ -1,0 +1,63 @@
+#include "plugin/entry_points.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "plugin/state.h"
+#include "tests/support/bmc_fixture.h"
+
+namespace ipmiseltest {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::Pair;
+
+class EntryPoints : public ::testing::Test {
+protected:
+    LogRecorder log;
+    tqrhost::PluginContext context{IPMISEL_TEXTS};
+
+    EntryPoints() { ipmisel::ResetModuleState(); }
+    ~EntryPoints() override { ipmisel::ResetModuleState(); }
+};
+
+TEST_F(EntryPoints, StatusIsAlwaysNotStarted) {
+    EXPECT_EQ(IPMISELGetStatus().code, 3);
+    EXPECT_EQ(IPMISELPluginInit(context.get()).code, 0);
+    EXPECT_EQ(IPMISELGetStatus().code, 3);
+    EXPECT_EQ(IPMISELPluginDeInit(context.get()).code, 0);
+    EXPECT_EQ(IPMISELGetStatus().code, 3);
+}
+
+TEST_F(EntryPoints, InitialisingAgainReplacesTheContext) {
+    const tqrhost::PluginContext second(IPMISEL_TEXTS);
+    IPMISELPluginInit(context.get());
+    EXPECT_EQ(ipmisel::Module().gPluginHandle, context.get());
+    EXPECT_EQ(IPMISELPluginInit(second.get()).code, 0);
+    EXPECT_EQ(ipmisel::Module().gPluginHandle, second.get());
+}
+
+TEST_F(EntryPoints, InfoIsTheSameForEveryContext) {
+    for (auto* const given : {context.get(), static_cast<decltype(context.get())>(nullptr)}) {
+        const NQORTQR20::fdrPluginInfo info = IPMISELGetInfo(given);
+        EXPECT_STREQ(info.name, "IPMISEL");
+        EXPECT_STREQ(info.version, "1.0");
+        EXPECT_STREQ(info.interfaceVersion, "1.0");
+        EXPECT_EQ(info.reserved1, 0U);
+        EXPECT_EQ(info.reserved2, 0U);
+    }
+}
+
+TEST_F(EntryPoints, RefusedRegistrationIsOneErrorLine) {
+    IPMISELPluginInit(context.get());
+    IPMISELInit();  // the host loads no plug-in now
+    EXPECT_THAT(log.All(), ElementsAre(Pair(0, "Couldn't register plugin!")));
+    EXPECT_EQ(ipmisel::Module().gPluginHandle, context.get());
+}
+
+TEST_F(EntryPoints, DeviceZeroNeedsTheCollectorOfThePass) {
+    EXPECT_EQ(IPMISELGetDataZero(context.get(), nullptr, nullptr).code, 3);
+}
+
+}  // namespace
+}  // namespace ipmiseltest

@@ -1,0 +1,95 @@
+#pragma once
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "host/core/host.h"
+#include "host/spdriver/transport.h"
+#include "plugin/entry_points.h"
+#include "plugin/state.h"
+#include "simulator/simulated_bmc.h"
+#include "tests/support/bmc_fixture.h"
+#include "tests/support/wire.h"
+
+namespace ipmiseltest {
+
+/// A case over a whole simulated machine and a plug-in that has just been loaded: describe the
+/// machine in `facts` and `nodes`, then Collect().
+class MachineTest : public ::testing::Test {
+protected:
+    tqrhost::MachineFacts facts;
+    std::vector<ipmisim::BmcDescription> nodes{1};
+    LogRecorder log;
+    InstanceRecorder written;
+    /// Request frames of all nodes in the order in which they came.
+    std::vector<std::vector<std::uint8_t>> requests;
+    tqrhost::PluginContext context{IPMISEL_TEXTS};
+
+    MachineTest() {
+        facts.smbios = {IpmiDeviceStructure()};
+        ipmisel::ResetModuleState();
+        IPMISELPluginInit(context.get());
+        tqrhost::TakeNotices();
+    }
+    ~MachineTest() override {
+        tqrhost::CloseMachine();
+        ipmisel::ResetModuleState();
+    }
+
+    void OpenMachine() {
+        tqrhost::Source source;
+        source.facts = facts;
+        for (const ipmisim::BmcDescription& node : nodes) {
+            source.nodes.push_back(std::make_unique<SimulatedTransport>(node, &requests));
+        }
+        tqrhost::OpenMachine(std::move(source));
+    }
+    /// One pass over the machine as it is described now; its status code. The log holds the lines
+    /// of this pass alone, `written` and `requests` grow.
+    int Collect(std::vector<const char*> classNames) {
+        OpenMachine();
+        log.Clear();
+        const tqrhost::OutputHandle output(written);
+        return IPMISELGetData(context.get(), output.get(), classNames.data(),
+                              static_cast<int>(classNames.size()))
+            .code;
+    }
+    std::vector<std::string> Written(std::string_view property) const {
+        std::vector<std::string> values;
+        for (const tqrhost::Instance& instance : written.instances) {
+            values.push_back(TextOf(instance, property).value_or("(none)"));
+        }
+        return values;
+    }
+    bool Logged(int severity, const std::string& line) const {
+        const auto lines = log.Lines(severity);
+        return std::find(lines.begin(), lines.end(), line) != lines.end();
+    }
+    /// How often a Storage command was sent.
+    long Sent(std::uint8_t command) const {
+        return std::count_if(requests.begin(), requests.end(),
+                             [&](const auto& frame) { return frame[4] == command; });
+    }
+    static ipmisim::Fault NoResponse(std::uint8_t command, unsigned call) {
+        ipmisim::Fault fault;
+        fault.netFn = 0x0A;
+        fault.command = command;
+        fault.call = call;
+        return fault;
+    }
+    static ipmisim::Fault CompletionCode(std::uint8_t command, unsigned call, std::uint8_t code) {
+        ipmisim::Fault fault = NoResponse(command, call);
+        fault.kind = ipmisim::Fault::Kind::kCompletionCode;
+        fault.completionCode = code;
+        return fault;
+    }
+};
+
+}  // namespace ipmiseltest
