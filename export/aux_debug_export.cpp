@@ -41,7 +41,7 @@ bool IsDebugEntry(const s_AuxLog_entry& entry) {
 /// The first SEL record with the ID; null when there is none.
 const IPMISELEntry* FindSelEntry(const AuxDebugExport& exported, int wanted) {
     for (const IPMISELEntry& entry : exported.selEntries) {
-        const CopiedText id = Copied([&](char* out, unsigned length) {
+        const CopiedText id = RunCopy([&](char* out, unsigned length) {
             return entry.CopyRecordID(exported.context, out, length, exported.mapping);
         });
         if (id.result != kOk) {
@@ -61,7 +61,7 @@ const IPMISELEntry* FindSelEntry(const AuxDebugExport& exported, int wanted) {
 
 CopiedText TimestampOf(const AuxDebugExport& exported, const IPMISELEntry& entry) {
     const ClockDifference& clock = exported.clock;
-    return Copied([&](char* out, unsigned length) {
+    return RunCopy([&](char* out, unsigned length) {
         return entry.CopyTimestamp(exported.context, out, length, exported.mapping,
                                    clock.difference, clock.bmcNotBehind, clock.synchronise);
     });

@@ -18,7 +18,7 @@ struct CopiedText {
 
 /// Runs a copy operation, called with a buffer and its length, over a buffer of its own.
 template <typename Copy>
-CopiedText Copied(Copy copy) {
+CopiedText RunCopy(Copy copy) {
     constexpr std::size_t kTextLength = 512;
     std::array<char, kTextLength> buffer{};
     const unsigned result = copy(buffer.data(), static_cast<unsigned>(buffer.size()));

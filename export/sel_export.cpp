@@ -8,6 +8,7 @@
 #include "base/log.h"
 #include "base/text.h"
 #include "export/clock_difference.h"
+#include "export/copied_text.h"
 #include "export/event_message.h"
 #include "export/value_array.h"
 #include "mapping/entity_names.h"
@@ -21,7 +22,6 @@ namespace ipmisel {
 namespace {
 
 constexpr std::uint8_t kSystemEvent = 0x02;
-constexpr std::size_t kTextLength = 512;
 constexpr std::size_t kEntityLength = 128;
 constexpr std::size_t kRecordLength = 16;
 constexpr std::size_t kSensorNameLength = 17;
@@ -47,24 +47,11 @@ struct Record {
 
 // ---- Texts of a record --------------------------------------------------------------------------
 
-struct CopiedText {
-    unsigned result;
-    std::string text;
-};
-
-/// Runs a copy operation over a buffer of its own.
-template <typename Copy>
-CopiedText Copied(Copy copy) {
-    std::array<char, kTextLength> buffer{};
-    const unsigned result = copy(buffer.data(), static_cast<unsigned>(buffer.size()));
-    return {result, std::string(BoundedView(buffer.data(), buffer.size()))};
-}
-
 using CopyOperation = unsigned (IPMISELEntry::*)(TCPluginCallbacks*, char*, unsigned,
                                                  IPMIMapping*) const;
 
 CopiedText Copied(const Record& record, CopyOperation copy) {
-    return Copied([&](char* out, unsigned length) {
+    return RunCopy([&](char* out, unsigned length) {
         return (record.entry.*copy)(record.exported.context, out, length, record.exported.mapping);
     });
 }
@@ -75,7 +62,7 @@ using CopyTimeOperation = unsigned (IPMISELEntry::*)(TCPluginCallbacks*, char*, 
 
 CopiedText Copied(const Record& record, CopyTimeOperation copy) {
     const ClockDifference& clock = record.exported.clock;
-    return Copied([&](char* out, unsigned length) {
+    return RunCopy([&](char* out, unsigned length) {
         return (record.entry.*copy)(record.exported.context, out, length, record.exported.mapping,
                                     clock.difference, clock.bmcNotBehind, clock.synchronise);
     });
@@ -87,14 +74,7 @@ std::string Tolerated(const CopiedText& copied, const char* failure) {
     return copied.text;
 }
 
-// ---- Properties. False abandons the record, and why has been logged
-// ---------------------------------
-
-bool Added(NQORTQR20::TTQRStatusCode status, const char* what) {
-    if (status.code != kStatusFailed) return true;
-    WriteLog(kWarning, std::string("Error adding ") + what + ".");
-    return false;
-}
+// ---- Properties. False abandons the record; why has been logged ---------------------------------
 
 /// `what` is how the error line calls the property.
 bool AddProperty(const Record& record, const char* name, const std::string& value,
@@ -227,7 +207,7 @@ bool AddSystemEvent(Record* record) {
     if (!AddProperty(*record, "EventType", eventType)) return false;
 
     const s_SDR_Mod_Units units = FindUnits(sensor);
-    message.event = Tolerated(Copied([&](char* out, unsigned length) {
+    message.event = Tolerated(RunCopy([&](char* out, unsigned length) {
                                   return entry.CopyEventData(record->exported.context, out, length,
                                                              &units, record->exported.mapping);
                               }),
@@ -248,7 +228,7 @@ CopiedText BootTime(const Record& record) {
 }
 
 CopiedText ShutDown(const Record& record) {
-    return Copied([&](char* out, unsigned) {
+    return RunCopy([&](char* out, unsigned) {
         return record.entry.GetShutDownEvent(record.exported.context, out, record.index);
     });
 }

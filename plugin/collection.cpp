@@ -96,7 +96,11 @@ public:
     /// The instances as they are kept, also in a pass that collected none anew.
     void Write(fdriIOHandle* output) const {
         IPMIVPDEntry& collector = *Module().fIpmiVpdentryFru;
-        collector.SetFruInstances(Module().fIpmiFruVector);
+        std::vector<PropertyMap> instances;
+        for (const auto& ofNode : Module().fIpmiFruVector) {
+            instances.insert(instances.end(), ofNode.begin(), ofNode.end());
+        }
+        collector.SetFruInstances(std::move(instances));
         collector.GenerateCIMInstance(output, kFruClass.data());
     }
 };

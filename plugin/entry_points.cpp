@@ -4,6 +4,7 @@
 #include <span>
 
 #include "base/log.h"
+#include "export/fru_export.h"
 #include "plugin/collection.h"
 #include "plugin/sections.h"
 #include "plugin/state.h"
@@ -66,10 +67,16 @@ TTQRStatusCode IPMISELGetStatus() {
     return {Module().gStarted != 0 ? kStatusOk : kStatusFailed};
 }
 
-TTQRStatusCode IPMISELGetDataZero(TCPluginCallbacks* /*context*/, fdriIOHandle* /*output*/,
-                                  IPMIRequestFRULocator* /*request*/) {
+TTQRStatusCode IPMISELGetDataZero(TCPluginCallbacks* context, fdriIOHandle* /*output*/,
+                                  IPMIRequestFRULocator* request) {
     ipmisel::WriteLog(ipmisel::kTrace, "IPMISel: Entering IPMISELGetDataZero");
-    if (Module().fIpmiVpdentryFru == nullptr) return {kStatusFailed};
+    try {
+        IPMIVPDEntry* const collector = Module().fIpmiVpdentryFru.get();
+        if (collector == nullptr || request == nullptr) return {kStatusFailed};
+        ipmisel::ExportFruDeviceZero(context, request, collector);
+    } catch (...) {
+        return {kStatusFailed};
+    }
     ipmisel::WriteLog(ipmisel::kTrace, "IPMISel: Exiting IPMISELGetDataZero");
     return {kStatusOk};
 }

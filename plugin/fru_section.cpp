@@ -1,6 +1,9 @@
 #include <cstdint>
+#include <vector>
 
 #include "base/log.h"
+#include "export/fru_export.h"
+#include "plugin/entry_points.h"
 #include "plugin/sections.h"
 #include "plugin/state.h"
 
@@ -26,11 +29,32 @@ bool IsDue(const Node& node) {
     return true;
 }
 
+/// The instances of one node, gathered in the collector of the pass.
+std::vector<PropertyMap> CollectInstances(const Node& node) {
+    IPMIVPDEntry& collector = *Module().fIpmiVpdentryFru;
+    collector.SetFruInstances({});
+    IPMIRequestFRULocator request(node.library);
+    std::vector<IPMIFRULocator> locators;
+    request.IPMIGetSDREntry(node.context, &locators);  // what was found before a failure counts
+    IPMISELGetDataZero(node.context, node.output, &request);
+
+    const FruNode fruNode{node.context, node.number, node.count};
+    const bool any = ExportLocatedFrus(fruNode, &request, &locators, &collector);
+    WriteLog(kTrace, "Obtained the following FRU Locators.");
+    request.printFRUVector(node.context, &locators);
+    if (!any) ExportListedFrus(fruNode, &request, node.vpdDevices, &collector);
+    return collector.GetFruInstances();
+}
+
 }  // namespace
 
 void CollectFru(Node& node) {
     if (ReachedOverLan() || !IsDue(node)) return;
     WriteLog(kInfo, "Getting VPD records.");
+    WriteLog(kInfo, "Obtaining FRU Locator info.");
+    auto& kept = Module().fIpmiFruVector;
+    kept.resize(static_cast<std::size_t>(node.count));
+    kept[static_cast<std::size_t>(node.number)] = CollectInstances(node);
 }
 
 }  // namespace ipmisel

@@ -6,6 +6,7 @@
 
 #include "base/log.h"
 #include "base/text.h"
+#include "export/aux_debug_export.h"
 #include "export/sel_export.h"
 #include "plugin/sections.h"
 #include "records/rows.h"
@@ -134,7 +135,7 @@ void CollectLogRecords(Node& node) {
 
 void CollectAuxDebugRecords(Node& node) {
     WriteLog(kInfo, "Getting log records.");
-    ReadRecords(node);
+    const unsigned selCount = ReadRecords(node);
     WriteLog(kInfo, "Getting Aux Log Records.");
     IPMIRequestAuxLog& request = *node.objects.auxLog;
     unsigned count = 0;
@@ -145,7 +146,11 @@ void CollectAuxDebugRecords(Node& node) {
     std::vector<s_AuxLog_entry> entries = AuxLogEntries(count);
     if (request.IPMIReadExtendedData(entries.data(), count) != kOk) {
         WriteLog(kWarning, "IPMIReadExtendedData() returned Error.");
+        return;
     }
+    NodeObjects& objects = node.objects;
+    ExportAuxDebugLog(node.number, node.context, node.output, entries.data(), count,
+                      objects.selEntries.data(), selCount, objects.mapping.get(), node.library);
 }
 
 }  // namespace ipmisel

@@ -29,8 +29,8 @@ struct ModuleState {
     bool ipmifruonce = false;                        ///< it has been collected
     std::uint32_t fCurrentTime = 0;                  ///< seconds; when ipmifruonce was last cleared
     std::unique_ptr<IPMIVPDEntry> fIpmiVpdentryFru;  ///< collector of one pass
-    std::vector<PropertyMap> fIpmiFruVector;         ///< the instances as they are kept
-    bool collectonce = false;                        ///< nothing depends on it
+    std::vector<std::vector<PropertyMap>> fIpmiFruVector;  ///< the instances kept, by node
+    bool collectonce = false;                              ///< nothing depends on it
 
     std::time_t (*clock)(std::time_t*) = std::time;
 };

@@ -3,6 +3,6 @@
 namespace ipmiseltest {
 
 /// The host has no memory for value arrays.
-inline bool gNoArrays = false;
+extern bool gNoArrays;
 
 }  // namespace ipmiseltest

@@ -1,7 +1,5 @@
 #include "export/sel_export.h"
 
-#include <dlfcn.h>
-
 #include <memory>
 #include <string>
 #include <vector>
@@ -9,21 +7,9 @@
 #include "base/bytes.h"
 #include "base/log.h"
 #include "host/core/host.h"
+#include "tests/export/refusing_host.h"
 #include "tests/support/bmc_fixture.h"
 #include "tests/support/wire.h"
-
-namespace {
-bool gNoArrays = false;  // the host has no memory for value arrays
-}  // namespace
-
-/// In place of the host's own, to which it leads on.
-NQORTQR20::TTQRStatusCode NQORTQR20::fdrNewCIMValueArray(TCIMValueArray** array) {
-    if (gNoArrays) return {kStatusFailed};
-    using Operation = TTQRStatusCode (*)(TCIMValueArray**);
-    static const auto next = reinterpret_cast<Operation>(
-        dlsym(RTLD_NEXT, "_ZN9NQORTQR2019fdrNewCIMValueArrayEPPNS_14TCIMValueArrayE"));
-    return next(array);
-}
 
 namespace ipmiseltest {
 namespace {

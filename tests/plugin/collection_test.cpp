@@ -253,41 +253,6 @@ TEST_F(Pass, AuxiliaryLogStatusMayFail) {
     EXPECT_FALSE(Logged(1, "IPMIGetAuxLogStatus() returned Error."));
 }
 
-TEST_F(Pass, FruInventoryIsCollectedOnceInTenMinutes) {
-    static std::time_t now;
-    now = 1'700'000'000;
-    ipmisel::Module().clock = [](std::time_t*) { return now; };
-    nodes.push_back(nodes[0]);
-    const std::vector<std::string> told{"Resetting ipmifruonce.", "Setting ipmifruonce.",
-                                        "Getting VPD records."};
-    EXPECT_EQ(Collect({kFru}), 0);
-    EXPECT_THAT(Order(told), ElementsAre(told[0], told[2], told[1], told[2]));
-    for (const int seconds : {0, 599, 1}) {
-        now += seconds;
-        Collect({kFru});
-        EXPECT_THAT(Order(told), IsEmpty());
-    }
-    now += 1;
-    Collect({kFru});
-    EXPECT_THAT(Order(told), ElementsAre(told[0], told[2], told[1], told[2]));
-}
-
-TEST_F(Pass, KeptFruInstancesAreWrittenOncePerPassThatWantsThem) {
-    nodes.push_back(nodes[0]);
-    ipmisel::Module().fCurrentTime = static_cast<std::uint32_t>(std::time(nullptr));
-    ipmisel::Module().ipmifruonce = true;
-    ipmisel::Module().fIpmiFruVector = {{{"Name", "Board"}}};
-    EXPECT_EQ(Collect({kLog}), 0);
-    EXPECT_THAT(Written("Name"), Not(Contains("Board")));
-    written.instances.clear();
-    for (std::size_t pass = 1; pass <= 2; ++pass) {
-        EXPECT_EQ(Collect({kFru, kFru}), 0);
-        EXPECT_EQ(written.instances.size(), pass);
-        EXPECT_EQ(Written("Name").back(), "Board");
-        EXPECT_EQ(ipmisel::Module().fIpmiVpdentryFru, nullptr);
-    }
-}
-
 TEST_F(Pass, FruAndFirmwareAreReadInBandOnly) {
     const struct {
         const char* className;

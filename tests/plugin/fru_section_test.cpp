@@ -71,6 +71,12 @@ TEST_F(FruSection, NamesTellTheNodeWhereThereAreSeveral) {
     EXPECT_THAT(ElementNames(),
                 ElementsAre("(none)", "Node 0 : PSU 1", "(none)", "Node 1 : PSU 1"));
     EXPECT_THAT(Written("Name"), ElementsAre("Board", "Supply", "Second board", "Supply"));
+    std::vector<std::string> told;
+    for (const std::string& line : log.Lines(3)) {
+        if (line.ends_with("ipmifruonce.") || line == "Getting VPD records.") told.push_back(line);
+    }
+    EXPECT_THAT(told, ElementsAre("Resetting ipmifruonce.", "Getting VPD records.",
+                                  "Setting ipmifruonce.", "Getting VPD records."));
 }
 
 // A class that is named twice runs twice on every node but the last.
@@ -78,6 +84,7 @@ TEST_F(FruSection, ClassNamedTwiceIsWrittenOnce) {
     nodes.push_back(nodes[0]);
     EXPECT_EQ(Collect({kFru, kFru}), 0);
     EXPECT_EQ(written.instances.size(), 4U);
+    EXPECT_EQ(ipmisel::Module().fIpmiVpdentryFru, nullptr);
 }
 
 // The time may run out between one node and the next.
