@@ -1,0 +1,10 @@
+# What `cmake --install` puts where. The program finds its libraries and the plug-in from its own
+# place, so that the whole may go under any prefix and be moved afterwards.
+set_target_properties(tqrcore spdriver smbios PROPERTIES INSTALL_RPATH "\$ORIGIN")
+
+install(TARGETS ipmisel RUNTIME DESTINATION bin)
+install(TARGETS tqrcore spdriver smbios LIBRARY DESTINATION lib)
+install(TARGETS ipmisel_plugin LIBRARY DESTINATION lib/ipmisel)
+install(FILES mapping/ipmisel.INI DESTINATION lib/ipmisel)
+install(FILES README.md CHANGELOG.md LICENSE NOTICE DESTINATION share/doc/ipmisel)
+install(DIRECTORY examples DESTINATION share/doc/ipmisel FILES_MATCHING PATTERN "*.json")
