@@ -149,8 +149,8 @@ TEST_F(SelExport, EntityNamesAboveTheNumberedOnesReachOnlyTheMessage) {
     } cases[] = {
         {"", "3", "Temperature", "Ambient", "IO module 3 (Temperature - Ambient): Assertion: "},
         {"", "3", "Temperature", "Ambient", " 3 (Temperature - Ambient): Deassertion: "},
-        {"Power Supply", "1", "Power Supply", "VRM 1",
-         "Power Supply 1 (Voltage Regulator Module - VRM 1): Assertion: "},
+        {"Power supply", "1", "Power Supply", "VRM 1",
+         "Power supply 1 (Voltage Regulator Module - VRM 1): Assertion: "},
         {"", "", "Fan", "", "  (Fan - ): Assertion: "},  // no such sensor
     };
     for (std::size_t i = 0; i < std::size(cases); ++i) {
