@@ -127,12 +127,16 @@ Source OpenReplay(const std::vector<std::string>& places, const SourceOptions& /
             ipmisel::ReadStrictJson(line, place, readLine, ++number);
         }
     } catch (const ipmisel::JsonFileError& error) {
-        throw SourceError(error.what());
+        throw SourceError(std::string(error.what()) +
+                          "; correct the file or name another with --from");
     }
     if (in.bad() || (number == 0 && errno != 0)) {
-        throw SourceError(place + ": cannot be read: " + std::strerror(errno));
+        throw SourceError(place + ": cannot be read: " + std::strerror(errno) +
+                          "; name another with --from");
     }
-    if (number == 0) throw SourceError(place + ": is empty, not a capture");
+    if (number == 0) {
+        throw SourceError(place + ": is empty, not a capture; name another with --from");
+    }
     std::move(nodes.begin(), nodes.end(), std::back_inserter(source.nodes));
     return source;
 }

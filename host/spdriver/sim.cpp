@@ -30,7 +30,8 @@ Source OpenSimulated(const std::vector<std::string>& places, const SourceOptions
     try {
         server = ipmisim::ReadServerFile(place);
     } catch (const ipmisim::ServerFileError& error) {
-        throw SourceError(error.what());
+        throw SourceError(std::string(error.what()) +
+                          "; correct the file or name another with --from");
     }
     Source source;
     source.facts = {

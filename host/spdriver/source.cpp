@@ -18,14 +18,17 @@ struct Kind {
     std::string_view usage;  ///< as the user writes it
     bool joins;              ///< several of them make one machine
     /// One place, or several of a kind that joins: their nodes follow each other.
+    /// Null for a kind that is not built in.
     Source (*open)(const std::vector<std::string>& places, const SourceOptions& options);
 };
 
-// What is not built in has no line here.
 constexpr Kind kKinds[] = {
 #ifdef IPMISEL_FREEIPMI
     {"inband", "inband", false, OpenInband},
     {"lan:", "lan:HOST[:PORT]", true, OpenLan},
+#else
+    {"inband", "inband", false, nullptr},
+    {"lan:", "lan:HOST[:PORT]", true, nullptr},
 #endif
     {"sim:", "sim:FILE", false, OpenSimulated},
     {"replay:", "replay:FILE", false, OpenReplay},
@@ -38,17 +41,21 @@ bool IsOfKind(std::string_view source, const Kind& kind) {
 const Kind& FindKind(const std::string& source) {
     const auto kind = std::find_if(std::begin(kKinds), std::end(kKinds),
                                    [&](const Kind& k) { return IsOfKind(source, k); });
-    if (kind != std::end(kKinds)) return *kind;
+    if (kind != std::end(kKinds) && kind->open != nullptr) return *kind;
     std::string known;
-    for (const Kind& k : kKinds) known += (known.empty() ? "" : ", ") + std::string(k.usage);
-    throw SourceError("this build has no source \"" + source + "\"; use one of " + known);
+    for (const Kind& k : kKinds) {
+        if (k.open != nullptr) known += (known.empty() ? "" : ", ") + std::string(k.usage);
+    }
+    const std::string line = "this build has no source \"" + source + "\"; use one of " + known;
+    if (kind != std::end(kKinds)) throw SourceError(line);
+    throw SourceUsageError(line);
 }
 
 std::string PlaceOf(const std::string& source, const Kind& kind) {
     std::string place = source.substr(kind.name.size());
     if (place.empty() && kind.name.back() == ':') {
-        throw SourceError("the source \"" + source + "\" names no place; write it as " +
-                          std::string(kind.usage));
+        throw SourceUsageError("the source \"" + source + "\" names no place; write it as " +
+                               std::string(kind.usage));
     }
     return place;
 }
@@ -71,8 +78,8 @@ Source OpenSources(const std::vector<std::string>& sources, const SourceOptions&
     const SourceOptions askOnce = AskOnce(options);
     for (const std::string& source : sources) {
         if (FindKind(source).joins || sources.size() == 1) continue;
-        throw SourceError("the source \"" + source +
-                          "\" stands alone; only several of the kind lan: make one machine");
+        throw SourceUsageError("the source \"" + source +
+                               "\" stands alone; only several of the kind lan: make one machine");
     }
     const Kind& kind = FindKind(sources.front());
     std::vector<std::string> places;

@@ -47,6 +47,10 @@ public:
 struct SourceError : std::runtime_error {
     using std::runtime_error::runtime_error;
 };
+/// The sources are named wrongly: a kind that is not known, or kinds that do not go together.
+struct SourceUsageError : SourceError {
+    using SourceError::SourceError;
+};
 
 /// What the user said about access; each kind of source takes what concerns it.
 struct SourceOptions {
@@ -67,7 +71,7 @@ struct Source {
 
 /// Opens "inband", "lan:HOST", "sim:FILE", "replay:FILE". Several sources must all be of a kind
 /// that can be joined (lan:); their nodes follow each other. Throws SourceError, also for a kind
-/// that is not known or not built in.
+/// that is not built in.
 Source OpenSources(const std::vector<std::string>& sources, const SourceOptions& options);
 
 struct WorkaroundInfo {
