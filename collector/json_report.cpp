@@ -1,11 +1,18 @@
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <array>
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
+#include <filesystem>
 #include <memory>
 #include <nlohmann/json.hpp>
-#include <stdexcept>
-#include <type_traits>
+#include <system_error>
 
+#include "collector/failure.h"
+#include "collector/json_text.h"
 #include "collector/report.h"
 
 namespace ipmisel {
@@ -13,30 +20,9 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-/// Bytes that are not UTF-8 come out as U+FFFD.
+/// On one line. All but ASCII is escaped, so that nothing in it reaches a terminal.
 std::string Text(const Json& json) {
-    return json.dump(-1, ' ', false, Json::error_handler_t::replace);
-}
-
-Json ValueOf(const tqrhost::PropertyValue& value) {
-    return std::visit(
-        [](const auto& v) -> Json {
-            using T = std::decay_t<decltype(v)>;
-            if constexpr (std::is_same_v<T, tqrhost::ObjectPath>) {
-                Json keys = Json::object();
-                for (const auto& [key, text] : v.keys) keys[key] = text;
-                return {{"class", v.className}, {"keys", std::move(keys)}};
-            } else {
-                return v;
-            }
-        },
-        value);
-}
-
-std::string InstanceText(const tqrhost::Instance& instance) {
-    Json properties = Json::object();
-    for (const auto& [name, value] : instance.properties) properties[name] = ValueOf(value);
-    return Text({{"class", instance.className}, {"properties", std::move(properties)}});
+    return json.dump(-1, ' ', true, Json::error_handler_t::replace);
 }
 
 Json AccountOf(const tqrhost::SourceAccount& account) {
@@ -67,76 +53,94 @@ Json CompletenessOf(const ReportEnd& end) {
     return nodes;
 }
 
-/// The status stands before the instances and is known after them: they wait in a file without a
-/// name.
-class JsonReport : public ReportWriter {
+/// A file without a name, for what has to wait.
+class Spool {
 public:
-    JsonReport(std::FILE* out, ReportHead head)
-        : out_(out), head_(std::move(head)), spool_(std::tmpfile(), &std::fclose) {
-        if (!spool_) {
-            throw std::runtime_error(std::string("cannot make a temporary file: ") +
-                                     std::strerror(errno));
+    Spool() {
+        std::error_code error;
+        const auto folder = std::filesystem::temp_directory_path(error);
+        std::string name = (folder / "ipmisel-XXXXXX").string();
+        const int file = error ? -1 : mkostemp(name.data(), O_CLOEXEC);
+        if (file >= 0) {
+            unlink(name.c_str());
+            file_.reset(fdopen(file, "w+"));
         }
+        if (!file_) Fail(error ? error.value() : errno);
     }
-    void Finish(const ReportEnd& end) override {
-        const auto print = [this](const std::string& text) { std::fputs(text.c_str(), out_); };
-        print("{\n  \"source\": " + Text(head_.source));
-        const Json plugin = {{"name", head_.plugin.name},
-                             {"version", head_.plugin.version},
-                             {"interface", head_.plugin.interfaceVersion}};
-        print(",\n  \"plugin\": " + Text(plugin));
-        const Json status = {{"code", end.status.code}, {"text", end.status.TranslateStatusCode()}};
-        print(",\n  \"status\": " + Text(status) + ",\n  \"instances\": [");
-        CopySpool();
-        print(any_ ? "\n  ]" : "]");
-        print(",\n  \"notices\": " + Text(end.notices));
-        print(",\n  \"completeness\": " + Text(CompletenessOf(end)) + "\n}\n");
+    void Write(const std::string& text) {
+        if (std::fwrite(text.data(), 1, text.size(), file_.get()) != text.size()) Fail(errno);
     }
-
-protected:
-    bool Take(const tqrhost::Instance& instance) override {
-        const std::string text = (any_ ? ",\n    " : "\n    ") + InstanceText(instance);
-        any_ = true;
-        return std::fwrite(text.data(), 1, text.size(), spool_.get()) == text.size();
+    void CopyTo(OutputFile& out) {
+        if (std::fflush(file_.get()) != 0) Fail(errno);
+        std::rewind(file_.get());
+        std::array<char, 1 << 14> room;
+        for (std::size_t n; (n = std::fread(room.data(), 1, room.size(), file_.get())) > 0;) {
+            out.Write({room.data(), n});
+        }
+        if (std::ferror(file_.get()) != 0) Fail(errno);
     }
 
 private:
-    void CopySpool() {
-        std::rewind(spool_.get());
-        std::vector<char> room(1 << 16);
-        for (std::size_t n; (n = std::fread(room.data(), 1, room.size(), spool_.get())) > 0;) {
-            std::fwrite(room.data(), 1, n, out_);
-        }
+    struct Close {
+        void operator()(std::FILE* file) const { std::fclose(file); }
+    };
+    [[noreturn]] static void Fail(int error) {
+        throw Failure(kExitUsage, std::string("cannot keep the report in a temporary file: ") +
+                                      std::strerror(error) +
+                                      "; make room there, or name another folder in TMPDIR");
     }
 
-    std::FILE* out_;
+    std::unique_ptr<std::FILE, Close> file_;
+};
+
+/// The status stands before the instances and is known after them: they wait in a spool.
+class JsonReport : public ReportWriter {
+public:
+    JsonReport(OutputFile& out, const ReportHead& head) : out_(out), head_(head) {}
+    void Add(const tqrhost::Instance& instance) override {
+        spool_.Write((any_ ? ",\n    " : "\n    ") + JsonInstance(instance));
+        any_ = true;
+    }
+    void Finish(const ReportEnd& end) override {
+        out_.Write("{\n  \"source\": " + JsonText(head_.source));
+        out_.Write(",\n  \"plugin\": {\"name\": " + JsonText(head_.plugin.name) +
+                   ", \"version\": " + JsonText(head_.plugin.version) +
+                   ", \"interface\": " + JsonText(head_.plugin.interfaceVersion) + "}");
+        out_.Write(",\n  \"status\": {\"code\": " + std::to_string(end.status.code) +
+                   ", \"text\": " + JsonText(end.status.TranslateStatusCode()) + "}");
+        out_.Write(",\n  \"instances\": [");
+        spool_.CopyTo(out_);
+        out_.Write(any_ ? "\n  ]" : "]");
+        out_.Write(",\n  \"notices\": " + Text(end.notices));
+        out_.Write(",\n  \"completeness\": " + Text(CompletenessOf(end)) + "\n}\n");
+    }
+
+private:
+    OutputFile& out_;
     ReportHead head_;
-    std::unique_ptr<std::FILE, int (*)(std::FILE*)> spool_;
+    Spool spool_;
     bool any_ = false;
 };
 
 class NdjsonReport : public ReportWriter {
 public:
-    explicit NdjsonReport(std::FILE* out) : out_(out) {}
+    explicit NdjsonReport(OutputFile& out) : out_(out) {}
+    void Add(const tqrhost::Instance& instance) override {
+        out_.Write(JsonInstance(instance) + "\n");
+    }
     void Finish(const ReportEnd&) override {}
 
-protected:
-    bool Take(const tqrhost::Instance& instance) override {
-        const std::string line = InstanceText(instance) + "\n";
-        return std::fwrite(line.data(), 1, line.size(), out_) == line.size();
-    }
-
 private:
-    std::FILE* out_;
+    OutputFile& out_;
 };
 
 }  // namespace
 
-std::unique_ptr<ReportWriter> MakeJsonReport(std::FILE* out, const ReportHead& head) {
+std::unique_ptr<ReportWriter> MakeJsonReport(OutputFile& out, const ReportHead& head) {
     return std::make_unique<JsonReport>(out, head);
 }
 
-std::unique_ptr<ReportWriter> MakeNdjsonReport(std::FILE* out, const ReportHead&) {
+std::unique_ptr<ReportWriter> MakeNdjsonReport(OutputFile& out, const ReportHead&) {
     return std::make_unique<NdjsonReport>(out);
 }
 

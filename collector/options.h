@@ -5,15 +5,9 @@
 #include <vector>
 
 #include "host/spdriver/transport.h"
+#include "tqr/log.h"
 
 namespace ipmisel {
-
-/// Exit statuses of the program.
-constexpr int kExitCollected = 0;
-constexpr int kExitPassFailed = 1;  ///< the plug-in ended the pass with another status than 0
-constexpr int kExitUsage = 2;       ///< wrong usage, or an output that cannot be written
-constexpr int kExitNoSource = 3;    ///< the source could not be opened, or there is no BMC
-constexpr int kExitPart = 4;        ///< collected in part
 
 /// What the user asked for.
 struct Options {
@@ -24,7 +18,7 @@ struct Options {
     std::string format = "table";
     std::optional<std::string> output;  ///< empty: standard output
     std::optional<std::string> record;
-    int logLevel = 1;
+    NQORTQR20::ILogger::ETQRLogSeverity logLevel = NQORTQR20::ILogger::kWarning;
     std::optional<std::string> logFile;
     std::optional<std::string> plugin;
     std::optional<std::string> passwordFile;
@@ -32,8 +26,8 @@ struct Options {
     std::optional<double> deadlineSeconds;
 };
 
-/// Parses the command line. When it is wrong, or only help was wanted, says so and gives the exit
-/// status in *exitStatus.
+/// Parses the command line. Empty when only help or the version was wanted and is printed; the exit
+/// status is then in *exitStatus. Throws Failure when the command line is wrong.
 std::optional<Options> ParseOptions(int argc, char** argv, int* exitStatus);
 
 }  // namespace ipmisel

@@ -5,76 +5,116 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <climits>
+#include <csignal>
+#include <cstdio>
 #include <cstring>
+#include <filesystem>
 
-#include "base/text.h"
+#include "collector/failure.h"
+#include "collector/stop_signals.h"
 
 namespace ipmisel {
 namespace {
 
-// What a signal handler can see: plain characters, set before and cleared after the file exists.
-char gUnfinished[PATH_MAX] = {};
+constexpr std::size_t kBuffer = 1 << 16;
+constexpr int kMostNames = 100;
+
+/// A device, a pipe or the like, also through a symbolic link; there is nothing to replace.
+bool IsWrittenInPlace(const std::string& name) {
+    struct stat status {};
+    if (name.starts_with("/dev/")) return true;  // /dev/stdout may lead to a regular file
+    return stat(name.c_str(), &status) == 0 && !S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode);
+}
 
 }  // namespace
 
-void OutputFile::Fail(const char* what) const {
-    throw OutputError("cannot " + std::string(what) + " " +
-                      (temporary_.empty() && name_.empty() ? "standard output" : name_) + ": " +
-                      std::strerror(errno) + "; choose another --output");
+OutputFile::OutputFile(const std::optional<std::string>& name)
+    : name_(name == "-" ? "" : name.value_or("")) {
+    buffer_.reserve(kBuffer);
+    if (name_.empty()) {
+        file_ = STDOUT_FILENO;
+    } else if (IsWrittenInPlace(name_)) {
+        file_ = open(name_.c_str(), O_WRONLY | O_CLOEXEC);
+        if (file_ < 0) Fail(errno);
+    } else {
+        OpenBeside();
+    }
 }
 
-OutputFile::OutputFile(const std::optional<std::string>& name) {
-    if (!name || *name == "-") {
-        stream_ = stdout;
-        return;
+void OutputFile::OpenBeside() {
+    struct stat status {};
+    if (stat(name_.c_str(), &status) == 0 && S_ISDIR(status.st_mode)) Fail(EISDIR);
+    // A file that may not be written is not to be replaced either.
+    if (access(name_.c_str(), W_OK) != 0 && errno != ENOENT) Fail(errno);
+    const std::filesystem::path place(name_);
+    const SignalsHeld held;
+    for (int i = 0; file_ < 0 && i < kMostNames; ++i) {
+        const std::string other = "." + place.filename().string() + "." + std::to_string(getpid()) +
+                                  (i == 0 ? "" : "-" + std::to_string(i));
+        temporary_ = (place.parent_path() / other).string();
+        // O_EXCL does not follow a symbolic link.
+        file_ = open(temporary_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666);
+        if (file_ < 0 && errno != EEXIST) break;
     }
-    name_ = *name;
-    struct stat found {};
-    if (stat(name_.c_str(), &found) == 0 && S_ISDIR(found.st_mode)) {
-        errno = EISDIR;
-        Fail("write");
-    }
-    // O_EXCL follows no link that somebody has put there, and takes nobody else's file.
-    temporary_ = name_ + Format(".%ld.part", static_cast<long>(getpid()));
-    if (temporary_.size() >= sizeof gUnfinished) {
-        errno = ENAMETOOLONG;
-        Fail("write");
-    }
-    const int fd = open(temporary_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666);
-    if (fd < 0) {
-        const int error = errno;
+    if (file_ < 0) {
         temporary_.clear();
-        errno = error;
-        Fail("write");
+        Fail(errno);
     }
-    std::memcpy(gUnfinished, temporary_.c_str(), temporary_.size() + 1);
-    stream_ = fdopen(fd, "w");
-    if (stream_ == nullptr) Fail("write");
+    RemoveWhenKilled(temporary_);
 }
 
 OutputFile::~OutputFile() {
-    if (temporary_.empty()) return;
-    if (stream_ != nullptr) std::fclose(stream_);
-    RemoveUnfinished();
+    const SignalsHeld held;
+    if (file_ >= 0 && file_ != STDOUT_FILENO) close(file_);
+    if (!temporary_.empty()) unlink(temporary_.c_str());
+    RemoveWhenKilled("");
+}
+
+void OutputFile::Write(std::string_view text) {
+    if (buffer_.size() + text.size() > kBuffer) Flush();
+    if (text.size() > kBuffer) buffer_.reserve(text.size());
+    buffer_ += text;
+}
+
+void OutputFile::Flush() {
+    std::string_view rest = buffer_;
+    while (!rest.empty()) {
+        const ssize_t written = write(file_, rest.data(), rest.size());
+        if (written >= 0) {
+            rest.remove_prefix(static_cast<std::size_t>(written));
+        } else if (errno != EINTR) {
+            buffer_.clear();
+            Fail(errno);
+        }
+    }
+    buffer_.clear();
 }
 
 void OutputFile::Commit() {
-    if (std::fflush(stream_) != 0 || std::ferror(stream_) != 0) Fail("write");
+    Flush();
     if (temporary_.empty()) return;
-    if (fsync(fileno(stream_)) != 0 && errno != EINVAL) Fail("write");
-    const int closed = std::fclose(stream_);
-    stream_ = nullptr;
-    if (closed != 0) Fail("write");
-    if (rename(temporary_.c_str(), name_.c_str()) != 0) Fail("write");
-    gUnfinished[0] = '\0';
+    // Only what is on the disk may take the place of what was there.
+    if (fsync(file_) != 0 && errno != EINVAL) Fail(errno);
+    const SignalsHeld held;
+    // A symbolic link in that place is replaced, not followed.
+    if (rename(temporary_.c_str(), name_.c_str()) != 0) Fail(errno);
     temporary_.clear();
+    RemoveWhenKilled("");
 }
 
-void OutputFile::RemoveUnfinished() {
-    if (gUnfinished[0] == '\0') return;
-    unlink(gUnfinished);
-    gUnfinished[0] = '\0';
+void OutputFile::Fail(int error) const {
+    if (error == EPIPE && temporary_.empty()) {
+        // The reader has seen enough (`| head`): end as other programs do, without a word.
+        std::signal(SIGPIPE, SIG_DFL);
+        std::raise(SIGPIPE);
+    }
+    if (name_.empty()) {
+        throw Failure(kExitUsage, std::string("cannot write to standard output: ") +
+                                      std::strerror(error) +
+                                      "; send it elsewhere or use --output FILE");
+    }
+    throw Failure(kExitUsage, "cannot write " + name_ + ": " + std::strerror(error) +
+                                  "; name another file with --output");
 }
 
 }  // namespace ipmisel

@@ -1,41 +1,36 @@
 #pragma once
 
-#include <cstdio>
 #include <optional>
-#include <stdexcept>
 #include <string>
+#include <string_view>
 
 namespace ipmisel {
 
-/// what() is one line that says what to do.
-struct OutputError : std::runtime_error {
-    using std::runtime_error::runtime_error;
-};
-
-/// Standard output, or a file that appears whole or not at all: it is written under a name of its
-/// own beside the wanted one, and renamed at the end. Throws OutputError.
+/// Where the report goes: standard output, or a file that appears whole or not at all. Every
+/// operation throws Failure.
 class OutputFile {
 public:
-    /// Empty, or "-": standard output.
+    /// None or "-" is standard output. A regular file is written beside its place under another
+    /// name; what is no regular file (a device, a pipe) is written as it stands.
     explicit OutputFile(const std::optional<std::string>& name);
     /// Without Commit nothing stays behind.
     ~OutputFile();
     OutputFile(const OutputFile&) = delete;
     OutputFile& operator=(const OutputFile&) = delete;
 
-    std::FILE* stream() const { return stream_; }
-    /// Everything is written out; a file gets its name.
+    void Write(std::string_view text);
+    /// Everything is on its way to the disk and stands in its place. Nothing may follow.
     void Commit();
 
-    /// Removes the unfinished file of this process, if there is one. For signal handlers.
-    static void RemoveUnfinished();
-
 private:
-    [[noreturn]] void Fail(const char* what) const;
+    void OpenBeside();
+    void Flush();
+    [[noreturn]] void Fail(int error) const;
 
-    std::string name_;
-    std::string temporary_;  ///< empty for standard output
-    std::FILE* stream_ = nullptr;
+    std::string name_;       ///< as the user wrote it; empty for standard output
+    std::string temporary_;  ///< until it stands in its place
+    std::string buffer_;
+    int file_ = -1;
 };
 
 }  // namespace ipmisel

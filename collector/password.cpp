@@ -1,83 +1,141 @@
 #include "collector/password.h"
 
 #include <fcntl.h>
+#include <poll.h>
 #include <termios.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <csignal>
 #include <cstdlib>
 #include <cstring>
-#include <fstream>
+#include <iterator>
 
-#include "host/spdriver/transport.h"
+#include "collector/failure.h"
 
 namespace ipmisel {
 namespace {
 
-std::string FromFile(const std::string& file) {
-    std::ifstream in(file);
+constexpr std::size_t kLongestLine = 256;  // IPMI 2.0 knows passwords of 20 bytes
+constexpr int kSignals[] = {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGTSTP};
+
+class Descriptor {
+public:
+    explicit Descriptor(int fd) : fd_(fd) {}
+    ~Descriptor() {
+        if (fd_ >= 0) close(fd_);
+    }
+    Descriptor(const Descriptor&) = delete;
+    Descriptor& operator=(const Descriptor&) = delete;
+    int get() const { return fd_; }
+
+private:
+    int fd_;
+};
+
+[[noreturn]] void Refuse(const std::string& line) { throw Failure(kExitUsage, line); }
+
+std::string FromFile(const std::string& name) {
+    const auto refuse = [&name](const char* why) {
+        Refuse("cannot read a password from " + name + ": " + why +
+               "; name a file with the password in its first line");
+    };
+    const Descriptor file(open(name.c_str(), O_RDONLY | O_CLOEXEC));
+    if (file.get() < 0) refuse(std::strerror(errno));
     std::string line;
-    if (!in || !std::getline(in, line)) {
-        throw tqrhost::SourceError("cannot read a password from " + file +
-                                   "; check --password-file");
+    for (char c = 0;;) {
+        const ssize_t count = read(file.get(), &c, 1);
+        if (count < 0) refuse(std::strerror(errno));
+        if (count == 0 || c == '\n') {
+            if (count == 0 && line.empty()) refuse("it is empty");
+            break;
+        }
+        if (line.size() == kLongestLine) refuse("its first line is too long");
+        line += c;
     }
     if (!line.empty() && line.back() == '\r') line.pop_back();
     return line;
 }
 
-/// The terminal without echo, and with it again however the prompt ends.
+volatile std::sig_atomic_t gSignal = 0;
+void NoteSignal(int signal) { gSignal = signal; }
+
+/// The terminal without echo, and with it again however the prompt ends. Signals that would end or
+/// stop the program come only while Wait waits, and are passed on when the echo is back.
 class QuietTerminal {
 public:
-    explicit QuietTerminal(int fd) : fd_(fd) {
-        // A signal that would end the program waits until the echo is back.
+    explicit QuietTerminal(int terminal) : terminal_(terminal) {
         sigset_t block;
         sigemptyset(&block);
-        for (const int signal : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGTSTP}) {
-            sigaddset(&block, signal);
+        for (const int signal : kSignals) sigaddset(&block, signal);
+        sigprocmask(SIG_BLOCK, &block, &mask_);
+        gSignal = 0;
+        struct sigaction note {};
+        note.sa_handler = NoteSignal;
+        for (std::size_t i = 0; i < std::size(kSignals); ++i) {
+            sigaction(kSignals[i], &note, &actions_[i]);
         }
-        sigprocmask(SIG_BLOCK, &block, &signals_);
-        known_ = tcgetattr(fd_, &before_) == 0;
+        known_ = tcgetattr(terminal_, &before_) == 0;
         termios quiet = before_;
-        quiet.c_lflag &= ~static_cast<tcflag_t>(ECHO | ISIG);
-        if (known_) tcsetattr(fd_, TCSAFLUSH, &quiet);
+        quiet.c_lflag &= ~static_cast<tcflag_t>(ECHO);
+        if (known_) tcsetattr(terminal_, TCSAFLUSH, &quiet);
     }
     ~QuietTerminal() {
-        if (known_) tcsetattr(fd_, TCSAFLUSH, &before_);
-        sigprocmask(SIG_SETMASK, &signals_, nullptr);
+        if (known_) tcsetattr(terminal_, TCSAFLUSH, &before_);
+        for (std::size_t i = 0; i < std::size(kSignals); ++i) {
+            sigaction(kSignals[i], &actions_[i], nullptr);
+        }
+        const int signal = gSignal;
+        if (signal != 0) raise(signal);  // waits for the next line
+        sigprocmask(SIG_SETMASK, &mask_, nullptr);
     }
     QuietTerminal(const QuietTerminal&) = delete;
     QuietTerminal& operator=(const QuietTerminal&) = delete;
 
+    /// False when a signal came instead of input.
+    bool Wait() const {
+        pollfd input{terminal_, POLLIN, 0};
+        return ppoll(&input, 1, nullptr, &mask_) >= 0;
+    }
+
 private:
-    int fd_;
+    int terminal_;
     bool known_ = false;
     termios before_{};
-    sigset_t signals_{};
+    sigset_t mask_{};
+    struct sigaction actions_[std::size(kSignals)]{};
 };
 
-std::string FromTerminal() {
-    const int fd = open("/dev/tty", O_RDWR | O_CLOEXEC | O_NOCTTY);
-    if (fd < 0) {
-        throw tqrhost::SourceError(
-            "no password: give --password-file FILE or set IPMISEL_PASSWORD");
-    }
-    std::string password;
-    bool interrupted = false;
-    {
-        const QuietTerminal quiet(fd);
-        static constexpr char kPrompt[] = "Password: ";
-        if (write(fd, kPrompt, sizeof kPrompt - 1) < 0) errno = 0;
-        for (char c = 0; read(fd, &c, 1) == 1 && c != '\n';) {
-            interrupted = c == 3;  // Ctrl-C, which makes no signal now
-            if (interrupted) break;
-            password += c;
+/// Empty when a signal or the end of the input came before a line was whole.
+std::optional<std::string> Prompt(int terminal) {
+    static constexpr char kPrompt[] = "Password: ";
+    const QuietTerminal quiet(terminal);
+    if (write(terminal, kPrompt, sizeof kPrompt - 1) < 0) return std::nullopt;
+    std::optional<std::string> password;
+    std::string line;
+    for (char c = 0; quiet.Wait() && read(terminal, &c, 1) == 1;) {
+        if (c == '\n') {
+            password = line;
+            break;
         }
-        if (write(fd, "\n", 1) < 0) errno = 0;
+        if (line.size() < kLongestLine) line += c;
     }
-    close(fd);
-    if (interrupted) throw tqrhost::SourceError("interrupted at the password");
+    // The line end that was typed has not been shown.
+    if (write(terminal, "\n", 1) < 0) return std::nullopt;
     return password;
+}
+
+std::string FromTerminal() {
+    const Descriptor terminal(open("/dev/tty", O_RDWR | O_CLOEXEC | O_NOCTTY));
+    if (terminal.get() < 0) {
+        Refuse(
+            "a password is needed and there is no terminal to ask at; give --password-file "
+            "FILE or set IPMISEL_PASSWORD");
+    }
+    const std::optional<std::string> password = Prompt(terminal.get());
+    if (!password) Refuse("no password was typed; type one and Enter, or give --password-file");
+    return *password;
 }
 
 }  // namespace

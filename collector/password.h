@@ -6,7 +6,7 @@
 namespace ipmisel {
 
 /// The password: the first line of the file, else the environment variable IPMISEL_PASSWORD, else
-/// what is typed at the terminal. Throws tqrhost::SourceError when there is none to be had.
+/// what is typed at the terminal. Throws Failure when there is none to be had.
 std::string ReadPassword(const std::optional<std::string>& file);
 
 }  // namespace ipmisel

@@ -1,14 +1,15 @@
 #pragma once
 
-#include <cstdio>
 #include <memory>
 #include <span>
 #include <string>
 #include <string_view>
 #include <vector>
 
+#include "collector/output_file.h"
 #include "host/core/host.h"
 #include "host/core/sink.h"
+#include "host/spdriver/stop.h"
 #include "host/spdriver/transport.h"
 #include "tqr/status.h"
 
@@ -17,35 +18,46 @@ namespace ipmisel {
 struct ReportHead {
     std::string source;
     tqrhost::PluginInfo plugin;
+    std::string machineType;
+    std::size_t nodes = 0;
 };
 
 struct ReportEnd {
     NQORTQR20::TTQRStatusCode status{};
+    bool hasBmc = true;
+    tqrhost::StopReason stopped = tqrhost::StopReason::kNone;
     std::vector<std::string> notices;
     std::vector<tqrhost::NodeCompleteness> completeness;
     std::vector<unsigned> exported;  ///< log records written, by node
 };
 
-/// One report on its way to a stream: a sink for the instances as they come, and the rest at the
-/// end. Memory does not grow with the number of instances.
-class ReportWriter : public tqrhost::WholeInstanceSink {
+/// One report on its way out: the instances as they come, the rest at the end. Memory does not grow
+/// with the number of instances. Every operation throws Failure when the output cannot be written.
+class ReportWriter {
 public:
+    virtual ~ReportWriter() = default;
+    virtual void Add(const tqrhost::Instance& instance) = 0;
     virtual void Finish(const ReportEnd& end) = 0;
 };
 
 struct FormatInfo {
     std::string_view name;
-    std::unique_ptr<ReportWriter> (*make)(std::FILE* out, const ReportHead& head);
+    std::unique_ptr<ReportWriter> (*make)(OutputFile& out, const ReportHead& head);
 };
 
 /// The formats, one line each.
 std::span<const FormatInfo> KnownFormats();
 
-std::unique_ptr<ReportWriter> MakeTableReport(std::FILE* out, const ReportHead& head);
-std::unique_ptr<ReportWriter> MakeJsonReport(std::FILE* out, const ReportHead& head);
-std::unique_ptr<ReportWriter> MakeNdjsonReport(std::FILE* out, const ReportHead& head);
+std::unique_ptr<ReportWriter> MakeTableReport(OutputFile& out, const ReportHead& head);
+std::unique_ptr<ReportWriter> MakeJsonReport(OutputFile& out, const ReportHead& head);
+std::unique_ptr<ReportWriter> MakeNdjsonReport(OutputFile& out, const ReportHead& head);
 
-/// What is missing of a collection, in one line; empty when nothing is.
-std::string MissingText(const ReportEnd& end);
+/// How a collection went: the exit status, and unless it is 0 what was wrong and what to do.
+struct Outcome {
+    int exitStatus;
+    std::string problem;  ///< a few words, for the end of a report
+    std::string advice;
+};
+Outcome OutcomeOf(const ReportEnd& end);
 
 }  // namespace ipmisel

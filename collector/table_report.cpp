@@ -1,17 +1,16 @@
 #include <algorithm>
 #include <array>
-#include <cstdio>
 #include <map>
 
 #include "base/text.h"
 #include "collector/report.h"
 #include "collector/terminal_text.h"
-#include "tqr/splibrary.h"
 
 namespace ipmisel {
 namespace {
 
 constexpr std::string_view kLogRecord = "QORSG_IPMILogRecord";
+constexpr std::string_view kNoAuxiliary = "No Extended Data";
 constexpr std::size_t kWidth = 100;
 constexpr std::size_t kNameWidth = 24;
 
@@ -22,11 +21,11 @@ struct Column {
 // 100 columns with one blank between two.
 constexpr std::array<Column, 6> kColumns{{{"Record", 6},
                                           {"Time", 19},
-                                          {"Source", 14},
-                                          {"Sensor type", 13},
+                                          {"Source", 12},
+                                          {"Sensor type", 14},
                                           {"Direction", 11},
-                                          {"Message", 32}}};
-static_assert(6 + 19 + 14 + 13 + 11 + 32 + 5 == kWidth);
+                                          {"Message", 33}}};
+static_assert(6 + 19 + 12 + 14 + 11 + 33 + 5 == kWidth);
 
 using Row = std::array<std::string, kColumns.size()>;
 
@@ -51,24 +50,26 @@ std::string DirectionOf(const std::string& eventType) {
     return comma == std::string::npos ? eventType : eventType.substr(0, comma);
 }
 
-void Remove(std::string_view part, std::string* text) {
+void Replace(std::string_view part, std::string_view by, std::string* text) {
     const auto at = text->find(part);
-    if (!part.empty() && at != std::string::npos) text->erase(at, part.size());
+    if (at != std::string::npos) text->replace(at, part.size(), by);
 }
 
 /// The source without a LUN and a channel of 0, which nearly all have.
 std::string SourceOf(std::string source) {
-    Remove(" LUN 0.", &source);
-    Remove(" Channel 0.", &source);
-    return source;
+    Replace(" LUN 0.", "", &source);
+    Replace(" Channel 0.", "", &source);
+    source.erase(source.find_last_not_of(". ") + 1);
+    return source.empty() ? "-" : source;
 }
 
-/// The message without what the columns beside it say.
+/// The message without what the columns beside it say: "Processor 1 (Temperature - CPU Temp):
+/// Assertion: ..." as "Processor 1 (CPU Temp): ...".
 std::string MessageOf(std::string message, const std::string& sensorType,
                       const std::string& direction) {
-    if (!direction.empty()) Remove(" " + direction + ":", &message);
-    if (!sensorType.empty()) Remove(sensorType + " - ", &message);
-    Remove("(): ", &message);
+    if (!direction.empty()) Replace("): " + direction + ": ", "): ", &message);
+    if (!sensorType.empty()) Replace("(" + sensorType + " - ", "(", &message);
+    if (message.starts_with(" (): ")) message.erase(0, 5);
     return message;
 }
 
@@ -76,8 +77,9 @@ std::string ValueText(const tqrhost::PropertyValue& value) {
     if (const auto* text = std::get_if<std::string>(&value)) return *text;
     if (const auto* bytes = std::get_if<std::vector<std::uint8_t>>(&value)) {
         std::string text;
-        for (const std::uint8_t byte : *bytes)
+        for (const std::uint8_t byte : *bytes) {
             text += Format(text.empty() ? "%02x" : " %02x", byte);
+        }
         return text;
     }
     const auto& path = std::get<tqrhost::ObjectPath>(value);
@@ -88,25 +90,20 @@ std::string ValueText(const tqrhost::PropertyValue& value) {
 
 class TableReport : public ReportWriter {
 public:
-    explicit TableReport(std::FILE* out) : out_(out) {}
-    void Finish(const ReportEnd& end) override {
-        std::string last;
-        for (const auto& [name, count] : counts_) {
-            last += (last.empty() ? "" : ", ") + std::to_string(count) + " " + name;
-        }
-        if (counts_.empty()) last = "nothing";
-        const std::string missing = MissingText(end);
-        PrintLine((counts_.empty() ? "" : "\n") + std::string("Collected: ") + last + ". " +
-                  (missing.empty() ? "Complete." : "Missing: " + TerminalText(missing) + "."));
+    TableReport(OutputFile& out, const ReportHead& head) : out_(out), nodes_(head.nodes) {
+        PrintLine((head.machineType.empty() ? "Machine of unknown type"
+                                            : "Machine " + TerminalText(head.machineType)) +
+                  ", " + std::to_string(nodes_) + (nodes_ == 1 ? " BMC" : " BMCs") + ", from " +
+                  TerminalText(head.source));
     }
-
-protected:
-    bool Take(const tqrhost::Instance& instance) override {
+    void Add(const tqrhost::Instance& instance) override {
         ++counts_[instance.className];
         const bool isLog = instance.className == kLogRecord;
         const std::string node = isLog ? TextOf(instance, "SourceNode") : "";
         if (instance.className != lastClass_ || node != lastNode_) {
             Heading(instance.className, node);
+        } else if (!isLog) {
+            PrintLine("");
         }
         lastClass_ = instance.className;
         lastNode_ = node;
@@ -115,20 +112,30 @@ protected:
         } else {
             PrintProperties(instance);
         }
-        return std::ferror(out_) == 0;
+    }
+    void Finish(const ReportEnd& end) override {
+        std::string last;
+        for (const auto& [name, count] : counts_) {
+            last += (last.empty() ? "" : ", ") + std::to_string(count) + " " + name;
+        }
+        if (last.empty()) last = "nothing";
+        const Outcome outcome = OutcomeOf(end);
+        PrintLine("");
+        PrintLine(TerminalText("Collected: " + last +
+                               (outcome.problem.empty() ? ". Complete" : "; " + outcome.problem) +
+                               "."));
     }
 
 private:
     void PrintLine(const std::string& text) {
         const auto end = text.find_last_not_of(' ');
-        std::fwrite(text.data(), 1, end == std::string::npos ? 0 : end + 1, out_);
-        std::fputc('\n', out_);
+        out_.Write(text.substr(0, end == std::string::npos ? 0 : end + 1) + "\n");
     }
 
     void Heading(const std::string& className, const std::string& node) {
-        const bool several = NQORTQR20::SPLibrary::GetNumberBMCNode() > 1 && !node.empty();
-        PrintLine((lastClass_.empty() ? "" : "\n") + TerminalText(className) +
-                  (several ? ", node " + TerminalText(node) : ""));
+        PrintLine("");
+        PrintLine(TerminalText(className) +
+                  (nodes_ > 1 && !node.empty() ? ", node " + TerminalText(node) : ""));
         if (className != kLogRecord) return;
         Row titles;
         for (std::size_t i = 0; i < titles.size(); ++i) titles[i] = kColumns[i].title;
@@ -139,12 +146,13 @@ private:
     static Row LogRow(const tqrhost::Instance& instance) {
         const std::string direction = DirectionOf(TextOf(instance, "EventType"));
         const std::string sensorType = TextOf(instance, "SensorType");
-        return {TextOf(instance, "RecordID"),
-                TimeText(TextOf(instance, "MessageTimestamp")),
-                SourceOf(TextOf(instance, "Source")),
-                sensorType,
-                direction,
-                MessageOf(TextOf(instance, "Message"), sensorType, direction)};
+        std::string message = MessageOf(TextOf(instance, "Message"), sensorType, direction);
+        const std::string auxiliary = TextOf(instance, "AuxLog");
+        if (auxiliary != kNoAuxiliary) message += " " + auxiliary;
+        return {
+            TextOf(instance, "RecordID"),         TimeText(TextOf(instance, "MessageTimestamp")),
+            SourceOf(TextOf(instance, "Source")), sensorType,
+            direction.empty() ? "-" : direction,  message};
     }
 
     void PrintRow(const Row& row) {
@@ -166,17 +174,17 @@ private:
 
     void PrintProperties(const tqrhost::Instance& instance) {
         for (const auto& [name, value] : instance.properties) {
-            std::string lead = "  " + Fit(TerminalText(name), kNameWidth) + " ";
-            for (const std::string& line :
-                 Wrap(TerminalText(ValueText(value)), kWidth - lead.size())) {
+            std::string lead = "  " + Fit(TerminalText(name) + ":", kNameWidth) + " ";
+            const std::size_t indent = Columns(lead);
+            for (const std::string& line : Wrap(TerminalText(ValueText(value)), kWidth - indent)) {
                 PrintLine(lead + line);
-                lead.assign(lead.size(), ' ');
+                lead.assign(indent, ' ');
             }
         }
-        PrintLine("");
     }
 
-    std::FILE* out_;
+    OutputFile& out_;
+    std::size_t nodes_;
     std::map<std::string, unsigned> counts_;
     std::string lastClass_;
     std::string lastNode_;
@@ -184,8 +192,8 @@ private:
 
 }  // namespace
 
-std::unique_ptr<ReportWriter> MakeTableReport(std::FILE* out, const ReportHead&) {
-    return std::make_unique<TableReport>(out);
+std::unique_ptr<ReportWriter> MakeTableReport(OutputFile& out, const ReportHead& head) {
+    return std::make_unique<TableReport>(out, head);
 }
 
 }  // namespace ipmisel

@@ -2,59 +2,71 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <cstdio>
+#include <iterator>
 
 namespace ipmisel {
 namespace {
 
 constexpr std::string_view kReplacement = "\xEF\xBF\xBD";
 
-/// Length of the UTF-8 sequence at the start of the text, 0 when there is none (RFC 3629).
-std::size_t SequenceLength(std::string_view text) {
-    const auto byte = [text](std::size_t i) { return static_cast<std::uint8_t>(text[i]); };
-    const std::uint8_t first = byte(0);
-    if (first < 0x80) return 1;
-    const std::size_t length = first >= 0xF0 ? 4 : first >= 0xE0 ? 3 : 2;
-    if (first < 0xC2 || first > 0xF4 || text.size() < length) return 0;
-    for (std::size_t i = 1; i < length; ++i) {
-        if ((byte(i) & 0xC0) != 0x80) return 0;
-    }
-    const bool overlong = (first == 0xE0 && byte(1) < 0xA0) || (first == 0xF0 && byte(1) < 0x90);
-    const bool surrogate = first == 0xED && byte(1) > 0x9F;
-    const bool tooHigh = first == 0xF4 && byte(1) > 0x8F;
-    return overlong || surrogate || tooHigh ? 0 : length;
-}
-
-/// Characters that move, hide or turn what stands around them.
-bool IsControl(std::string_view sequence) {
-    const auto first = static_cast<std::uint8_t>(sequence[0]);
-    if (sequence.size() == 1) return first < 0x20 || first == 0x7F;
-    const auto second = static_cast<std::uint8_t>(sequence[1]);
-    if (sequence.size() == 2) return first == 0xC2 && second < 0xA0;  // C1
-    if (sequence.size() != 3 || first != 0xE2) return false;
-    const auto third = static_cast<std::uint8_t>(sequence[2]);
-    // U+200B to U+200F, U+2028 to U+202E, U+2066 to U+2069
-    return (second == 0x80 &&
-            ((third >= 0x8B && third <= 0x8F) || (third >= 0xA8 && third <= 0xAE))) ||
-           (second == 0x81 && third >= 0xA6 && third <= 0xA9);
-}
-
 /// Position of the byte after `columns` columns.
 std::size_t ByteAt(std::string_view text, std::size_t columns) {
     std::size_t at = 0;
     for (; columns > 0 && at < text.size(); --columns) {
-        at += std::max<std::size_t>(1, SequenceLength(text.substr(at)));
+        at += FirstCharacter(text.substr(at)).length;
     }
     return std::min(at, text.size());
 }
 
 }  // namespace
 
+Character FirstCharacter(std::string_view text) {
+    const auto byte = [text](std::size_t i) { return static_cast<std::uint8_t>(text[i]); };
+    const std::uint8_t first = byte(0);
+    if (first < 0x80) return {first, 1, true};
+    const Character invalid{first, 1, false};
+    // RFC 3629: lead bytes C2 to F4; longer forms than needed, surrogates and values past U+10FFFF
+    // are not well-formed.
+    if (first < 0xC2 || first > 0xF4) return invalid;
+    const std::size_t length = first < 0xE0 ? 2 : first < 0xF0 ? 3 : 4;
+    if (text.size() < length) return invalid;
+    char32_t value = first & (0x7F >> length);
+    for (std::size_t i = 1; i < length; ++i) {
+        if ((byte(i) & 0xC0) != 0x80) return invalid;
+        value = value << 6 | (byte(i) & 0x3F);
+    }
+    const char32_t least = length == 2 ? 0x80 : length == 3 ? 0x800 : 0x10000;
+    const bool surrogate = value >= 0xD800 && value <= 0xDFFF;
+    if (value < least || value > 0x10FFFF || surrogate) return invalid;
+    return {value, length, true};
+}
+
+bool IsControl(char32_t c) {
+    struct Range {
+        char32_t first;
+        char32_t last;
+    };
+    constexpr Range kRanges[] = {
+        {0x00, 0x1F},       {0x7F, 0x9F}, {0x061C, 0x061C},  // Arabic letter mark
+        {0x200B, 0x200F},                                    // without width; marks of direction
+        {0x2028, 0x202E},    // line and paragraph separator; embeddings
+        {0x2060, 0x206F},    // isolates and invisible operators
+        {0xFEFF, 0xFEFF},    // byte order mark
+        {0xFFF9, 0xFFFB},    // interlinear annotation
+        {0xE0000, 0xE007F},  // tags
+    };
+    return std::any_of(std::begin(kRanges), std::end(kRanges),
+                       [c](const Range& r) { return c >= r.first && c <= r.last; });
+}
+
 std::string TerminalText(std::string_view text) {
     std::string out;
+    out.reserve(text.size());
     bool blank = false;
     while (!text.empty()) {
-        const std::size_t length = SequenceLength(text);
-        const std::string_view sequence = text.substr(0, std::max<std::size_t>(1, length));
+        const Character character = FirstCharacter(text);
+        const std::string_view sequence = text.substr(0, character.length);
         text.remove_prefix(sequence.size());
         if (sequence == " " || sequence == "\n" || sequence == "\t") {
             blank = true;
@@ -62,7 +74,7 @@ std::string TerminalText(std::string_view text) {
         }
         if (blank && !out.empty()) out += ' ';
         blank = false;
-        out += length == 0 || IsControl(sequence) ? kReplacement : sequence;
+        out += !character.valid || IsControl(character.value) ? kReplacement : sequence;
     }
     return out;
 }
@@ -89,6 +101,12 @@ std::vector<std::string> Wrap(std::string_view text, std::size_t width) {
 std::string Fit(std::string_view text, std::size_t width) {
     std::string out(text.substr(0, ByteAt(text, width)));
     return out + std::string(width - Columns(out), ' ');
+}
+
+void Say(std::string_view text) {
+    const std::string line = "ipmisel: " + TerminalText(text) + "\n";
+    // In one piece; there is nobody to tell when it fails.
+    std::fwrite(line.data(), 1, line.size(), stderr);
 }
 
 }  // namespace ipmisel

@@ -1,0 +1,92 @@
+#include "collector/json_text.h"
+
+#include <type_traits>
+#include <variant>
+
+#include "base/text.h"
+#include "collector/terminal_text.h"
+
+namespace ipmisel {
+namespace {
+
+std::string Escaped(char32_t c) {
+    if (c < 0x10000) return Format("\\u%04x", static_cast<unsigned>(c));
+    // Beyond the first plane JSON wants a pair of surrogates (RFC 8259, clause 7).
+    const auto rest = static_cast<unsigned>(c) - 0x10000;
+    return Format("\\u%04x\\u%04x", 0xD800 + (rest >> 10), 0xDC00 + (rest & 0x3FF));
+}
+
+void AppendText(std::string& out, std::string_view text) {
+    out += '"';
+    while (!text.empty()) {
+        const Character character = FirstCharacter(text);
+        if (!character.valid) {
+            out += "\uFFFD";
+        } else if (character.value == U'"' || character.value == U'\\') {
+            out += '\\';
+            out += text.front();
+        } else if (character.value == U'\n') {
+            out += "\\n";
+        } else if (IsControl(character.value)) {
+            out += Escaped(character.value);
+        } else {
+            out += text.substr(0, character.length);
+        }
+        text.remove_prefix(character.length);
+    }
+    out += '"';
+}
+
+void AppendPair(std::string& out, std::string_view name, std::string_view text, bool first) {
+    if (!first) out += ", ";
+    AppendText(out, name);
+    out += ": ";
+    AppendText(out, text);
+}
+
+void AppendValue(std::string& out, const std::string& text) { AppendText(out, text); }
+
+void AppendValue(std::string& out, const std::vector<std::uint8_t>& numbers) {
+    out += '[';
+    for (std::size_t i = 0; i < numbers.size(); ++i) {
+        if (i > 0) out += ", ";
+        out += std::to_string(numbers[i]);
+    }
+    out += ']';
+}
+
+void AppendValue(std::string& out, const tqrhost::ObjectPath& path) {
+    out += '{';
+    AppendPair(out, "class", path.className, true);
+    out += ", \"keys\": {";
+    for (std::size_t i = 0; i < path.keys.size(); ++i) {
+        AppendPair(out, path.keys[i].first, path.keys[i].second, i == 0);
+    }
+    out += "}}";
+}
+
+}  // namespace
+
+std::string JsonText(std::string_view text) {
+    std::string out;
+    AppendText(out, text);
+    return out;
+}
+
+std::string JsonInstance(const tqrhost::Instance& instance) {
+    std::string out = "{";
+    AppendPair(out, "class", instance.className, true);
+    out += ", \"properties\": {";
+    bool first = true;
+    for (const auto& [name, value] : instance.properties) {
+        if (!first) out += ", ";
+        first = false;
+        AppendText(out, name);
+        out += ": ";
+        std::visit([&](const auto& each) { AppendValue(out, each); }, value);
+    }
+    out += "}}";
+    return out;
+}
+
+}  // namespace ipmisel
