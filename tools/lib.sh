@@ -1,3 +1,4 @@
+# shellcheck shell=bash disable=SC2034
 # What the scripts of this folder share. Sourced, not run.
 
 # install_packages NAME...: installs those that are missing; fails when one cannot be had.
