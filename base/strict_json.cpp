@@ -259,6 +259,8 @@ void ReadStrictJson(const std::string& text, const std::string& file,
             reason.erase(0, at);
         }
         Throw(file, firstLine + line, "", "not JSON: " + reason);
+    } catch (const nlohmann::json::out_of_range&) {
+        Throw(file, firstLine, "", "not JSON: a number is too large");
     } catch (const Refusal& refusal) {
         auto line = LineOf(text, refusal.place);
         if (line) *line += firstLine;

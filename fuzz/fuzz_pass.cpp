@@ -43,6 +43,7 @@ public:
         const std::uint8_t length = Take(answers_);
         if (length == 0xFF) return std::nullopt;
         const Input bytes = Take(answers_, length);
+        if (bytes.empty()) return tqrhost::Response();
         return tqrhost::Response(bytes.begin(), bytes.end());
     }
 
