@@ -18,8 +18,8 @@ constexpr std::int32_t kStatusOk = 0;
 /// A host operation refused its arguments or could not do its work; a plug-in section failed;
 /// a plug-in that is not started.
 constexpr std::int32_t kStatusFailed = 3;
-constexpr std::int32_t kStatusNoMemory = 4;   ///< an object of a pass could not be created
-constexpr std::int32_t kStatusBadTime = 21;   ///< a time that is no calendar time
+constexpr std::int32_t kStatusNoMemory = 4;  ///< an object of a pass could not be created
+constexpr std::int32_t kStatusBadTime = 21;  ///< a time that is no calendar time
 
 /// The host's exception: a status code; what() is its text.
 class TTQRException : public std::exception {

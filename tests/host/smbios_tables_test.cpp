@@ -106,8 +106,7 @@ TEST(SmbiosEntryPoint, BothFormsAreReadAndDamageIsSeen) {
             Bytes bad = good;
             ++bad[at];
             EXPECT_FALSE(ReadSmbiosEntryPoint(bad)) << at;
-            bad.resize(at);
-            EXPECT_FALSE(ReadSmbiosEntryPoint(bad)) << at;
+            EXPECT_FALSE(ReadSmbiosEntryPoint(std::span(good).first(at))) << at;
         }
     }
     Bytes old = EntryPoint2(0x40, 1);  // states one byte less than it has, as SMBIOS 2.1 did

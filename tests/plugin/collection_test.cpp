@@ -13,13 +13,14 @@ namespace {
 std::size_t gRefusedSize = 0;  // allocations of this size fail
 }  // namespace
 
-void* operator new(std::size_t size) {
+// Not inlined: the compiler would take the two for a pair that does not match.
+[[gnu::noinline]] void* operator new(std::size_t size) {
     if (size == gRefusedSize) throw std::bad_alloc();
     if (void* const memory = std::malloc(size == 0 ? 1 : size)) return memory;
     throw std::bad_alloc();
 }
-void operator delete(void* memory) noexcept { std::free(memory); }
-void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
+[[gnu::noinline]] void operator delete(void* memory) noexcept { std::free(memory); }
+[[gnu::noinline]] void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
 
 namespace ipmiseltest {
 namespace {

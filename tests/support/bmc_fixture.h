@@ -119,8 +119,7 @@ protected:
 };
 
 /// The text of a property; empty optional when the instance has none of that name.
-inline std::optional<std::string> TextOf(const tqrhost::Instance& instance,
-                                         std::string_view name) {
+inline std::optional<std::string> TextOf(const tqrhost::Instance& instance, std::string_view name) {
     for (const auto& [propertyName, value] : instance.properties) {
         if (propertyName == name) return std::get<std::string>(value);
     }

@@ -66,9 +66,9 @@ inline std::vector<std::uint8_t> FullSensor(std::uint16_t id, std::uint8_t senso
 inline std::vector<std::uint8_t> SmbiosStructure(std::uint8_t type,
                                                  std::initializer_list<std::uint8_t> formatted,
                                                  std::initializer_list<std::string_view> strings) {
-    std::vector<std::uint8_t> structure{type, static_cast<std::uint8_t>(4 + formatted.size()), 0x00,
-                                        0x30};
-    structure.insert(structure.end(), formatted.begin(), formatted.end());
+    std::vector<std::uint8_t> structure(formatted);
+    structure.insert(structure.begin(),
+                     {type, static_cast<std::uint8_t>(4 + formatted.size()), 0x00, 0x30});
     for (const std::string_view text : strings) {
         structure.insert(structure.end(), text.begin(), text.end());
         structure.push_back(0);
