@@ -46,6 +46,8 @@ ReadingWatch::ReadingWatch(std::unique_ptr<LoopGuard> guard)
 std::optional<Response> ReadingWatch::Exchange(const RequestFrame& request) {
     std::optional<Response> response;
     if (Stopped() == StopReason::kNone) response = guard_->Exchange(request);
+    // Not even a completion code: nothing came.
+    if (response && response->empty()) response.reset();
     if (request.netFn() == kNetFnStorage) Note(request, response);
     return response;
 }
