@@ -11,6 +11,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <variant>
 #include <vector>
@@ -31,6 +32,7 @@
 namespace ipmisel {
 namespace {
 
+constexpr std::string_view kInventory = "QORSG_IPMIFRU";
 constexpr std::uint8_t kIpmiDeviceStructure = 38;  // SMBIOS, IPMI device information
 
 /// Counts log records by node on their way to the report. Once the report cannot be written, it
@@ -103,29 +105,46 @@ struct Machine {
     Machine& operator=(const Machine&) = delete;
 };
 
-/// Those that a pass collects in one pass, then those that have a function of their own.
-NQORTQR20::TTQRStatusCode RunClasses(tqrhost::Plugin& plugin,
-                                     const std::vector<std::string>& wanted,
-                                     tqrhost::InstanceSink& sink) {
-    std::vector<std::string> collected;
-    std::vector<const char*> exporters;
+/// What is asked for, as the plug-in is called for it.
+struct Calls {
+    std::vector<std::vector<std::string>> passes;
+    std::vector<const char*> exporters;  ///< of the classes that no pass yields
+};
+
+/// The plug-in writes the inventory when a pass is over: what is to follow it takes another pass.
+Calls CallsFor(const std::vector<std::string>& wanted) {
+    Calls calls;
+    bool begun = false;
     for (const std::string& name : wanted) {
         const auto known = KnownClasses();
         const auto info = std::find_if(known.begin(), known.end(),
                                        [&name](const ClassInfo& c) { return c.name == name; });
         if (info != known.end() && info->exporter != nullptr) {
-            exporters.push_back(info->exporter);
-        } else {
-            collected.push_back(name);
+            calls.exporters.push_back(info->exporter);
+            continue;
         }
+        if (!begun) calls.passes.emplace_back();
+        calls.passes.back().push_back(name);
+        begun = name != kInventory;
     }
+    return calls;
+}
+
+/// The status is that of the first call that did not end well.
+NQORTQR20::TTQRStatusCode RunClasses(tqrhost::Plugin& plugin,
+                                     const std::vector<std::string>& wanted,
+                                     tqrhost::InstanceSink& sink) {
+    const Calls calls = CallsFor(wanted);
     NQORTQR20::TTQRStatusCode status{NQORTQR20::kStatusOk};
-    if (!collected.empty()) status = plugin.Collect(collected, sink);
+    const auto note = [&status](NQORTQR20::TTQRStatusCode ended) {
+        if (status.code == NQORTQR20::kStatusOk) status = ended;
+    };
+    for (const std::vector<std::string>& pass : calls.passes) {
+        if (tqrhost::Stopped() == tqrhost::StopReason::kNone) note(plugin.Collect(pass, sink));
+    }
     if (!HasBmc()) return status;
-    for (const char* exporter : exporters) {
-        if (plugin.RunExporter(exporter, sink).value_or(NQORTQR20::kStatusFailed) != 0) {
-            status.code = NQORTQR20::kStatusFailed;
-        }
+    for (const char* exporter : calls.exporters) {
+        note({plugin.RunExporter(exporter, sink).value_or(NQORTQR20::kStatusFailed)});
     }
     return status;
 }

@@ -174,7 +174,9 @@ private:
 
     void PrintProperties(const tqrhost::Instance& instance) {
         for (const auto& [name, value] : instance.properties) {
-            std::string lead = "  " + Fit(TerminalText(name) + ":", kNameWidth) + " ";
+            const std::string label = TerminalText(name) + ":";
+            const std::size_t width = std::clamp(Columns(label), kNameWidth, kWidth / 2);
+            std::string lead = "  " + Fit(label, width) + " ";
             const std::size_t indent = Columns(lead);
             for (const std::string& line : Wrap(TerminalText(ValueText(value)), kWidth - indent)) {
                 PrintLine(lead + line);

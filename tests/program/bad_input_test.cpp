@@ -1,0 +1,168 @@
+#include <fcntl.h>
+#include <sys/stat.h>
+
+#include "tests/program/program_fixture.h"
+
+namespace {
+
+using ipmiseltest::Ended;
+using ipmiseltest::Json;
+using ipmiseltest::ProgramTest;
+using ipmiseltest::ReadText;
+using testing::AllOf;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::MatchesRegex;
+using testing::StartsWith;
+
+class BadInput : public ProgramTest {
+protected:
+    /// Ends with the status and one line that holds `part`; nothing is written.
+    void ExpectRefused(const std::vector<std::string>& arguments, int exitStatus,
+                       const std::string& part) {
+        const Ended ended = Run(arguments);
+        const std::string shown = testing::PrintToString(arguments);
+        EXPECT_EQ(ended.exitStatus, exitStatus) << shown;
+        EXPECT_EQ(ended.out, "") << shown;
+        // One line: what failed; what to do
+        EXPECT_THAT(ended.err, AllOf(MatchesRegex("ipmisel: [^\n]+; [^\n]+\n"), HasSubstr(part)))
+            << shown;
+        EXPECT_THAT(Left(), IsEmpty()) << shown;
+    }
+    /// `collect` of a good source into a file, and what is wrong with it.
+    std::vector<std::string> Good(std::vector<std::string> more) {
+        more.insert(more.begin(), {"collect", "--from", Write(Server()), "--output",
+                                   InPlace("report"), "--log-level", "error"});
+        return more;
+    }
+};
+
+TEST_F(BadInput, WrongUsage) {
+    const struct {
+        std::vector<std::string> more;
+        const char* part;
+    } cases[] = {
+        {{"--class", "QORSG_IPMILog"}, "use one of QORSG_IPMIFirmwareElement, "},
+        {{"--format", "xml"}, "use one of table, json, ndjson"},
+        {{"--log-level", "debug"}, "use one of error, warning, notice, info, trace"},
+        {{"--privilege", "root"}, "use one of user, operator, admin"},
+        {{"--workaround", "none"}, "is not known"},
+        {{"--window", "0"}, "\"0\" is no number from 1 to 15"},
+        {{"--window", "16"}, "\"16\""},
+        {{"--timeout", "0"}, "--timeout"},
+        {{"--timeout", "nan"}, "--timeout"},
+        {{"--deadline", "-1"}, "--deadline"},
+        {{"--deadline", "soon"}, "--deadline"},
+        {{"--cipher-suite", "256"}, "--cipher-suite"},
+        {{"--log-file", ""}, "the name is empty"},
+        {{"--format"}, "--format"},
+        {{"--format", "json", "table"}, "table"},
+        {{"--frmat", "json"}, "--frmat"},
+        {{"--from", "lan:127.0.0.1"}, "stands alone"},
+        {{"--plugin", "/no/such.pi"}, "cannot load the plug-in /no/such.pi: No such file"},
+        {{"--log-file", "/no/such/log"}, "cannot write the log to /no/such/log"},
+        {{"--record", "/no/such/capture"}, "/no/such/capture cannot be written"},
+    };
+    for (const auto& c : cases) {
+        std::vector<std::string> arguments = Good(c.more);
+        // One option twice is another fault.
+        if (c.more[0] == "--log-level")
+            arguments.erase(arguments.begin() + 5, arguments.begin() + 7);
+        ExpectRefused(arguments, 2, c.part);
+    }
+    ExpectRefused({}, 2, "subcommand");
+    ExpectRefused({"collect", "--from", "tape:0"}, 2, "this build has no source \"tape:0\"");
+    ExpectRefused({"collect", "--from", "sim:"}, 2, "names no place");
+}
+
+TEST_F(BadInput, PluginsThatAreNone) {
+    ExpectRefused(Good({"--plugin", folder.Write("text.pi", "no library\n")}), 2, "no library");
+    const struct {
+        const char* fault;
+        const char* part;
+    } cases[] = {{"silent", "does not register"}, {"initialise", "failed to initialise"}};
+    for (const auto& c : cases) {
+        setting.environment["TEST_PLUGIN_FAULT"] = c.fault;
+        ExpectRefused(Good({"--plugin", TEST_PLUGIN}), 2, c.part);
+    }
+}
+
+TEST_F(BadInput, SourcesThatDoNotOpen) {
+    const auto collect = [this](const std::string& source) {
+        return std::vector<std::string>{"collect",         "--from",          source,
+                                        "--output",        InPlace("report"), "--record",
+                                        InPlace("capture")};
+    };
+    ExpectRefused(collect("sim:/no/such.json"), 3, "/no/such.json: ");
+    ExpectRefused(collect("replay:/no/such.capture"), 3, "/no/such.capture: ");
+    ExpectRefused(collect("sim:" + folder.Write("a", "{\n  \"bmcs\": [\n")), 3, "a:3: not JSON");
+    ExpectRefused(collect("sim:" + folder.Write("b", R"({"bmcs": [{"sel": {"entrys": []}}]})")), 3,
+                  "entrys");
+    ExpectRefused(collect("replay:" + folder.Write("c", "{\"ipmisel_capture\": 2}\n")), 3,
+                  "ipmisel_capture");
+    if (!std::filesystem::exists("/dev/ipmi0")) {
+        ExpectRefused({"collect", "--output", InPlace("report")}, 3, "--from");
+    }
+#ifdef IPMISEL_FREEIPMI
+    ExpectRefused(collect("lan:127.0.0.1:1"), 2, "--password-file");
+    std::vector<std::string> withFile = collect("lan:127.0.0.1:1");
+    withFile.insert(withFile.end(), {"--password-file", folder.Write("empty", "")});
+    ExpectRefused(withFile, 2, "empty");
+    withFile.back() = "/no/such/password";
+    ExpectRefused(withFile, 2, "/no/such/password");
+    setting.environment["IPMISEL_PASSWORD"] = "secret";
+    ExpectRefused(collect("lan:no-such-host.invalid"), 3, "no-such-host.invalid");
+    std::vector<std::string> silent = collect("lan:127.0.0.1:1");
+    silent.insert(silent.end(), {"--timeout", "1"});
+    ExpectRefused(silent, 3, "127.0.0.1:1");
+#endif
+}
+
+class Output : public BadInput {};
+
+TEST_F(Output, PlacesThatCannotBeWritten) {
+    const std::string source = Write(Server());
+    ExpectRefused({"collect", "--from", source, "--output", InPlace("none/report")}, 2,
+                  "cannot write " + InPlace("none/report") + ": No such file or directory");
+    ExpectRefused({"collect", "--from", source, "--output", place.path().string()}, 2,
+                  "Is a directory");
+}
+
+TEST_F(Output, WhatDoesNotFitLeavesWhatWasThere) {
+    const std::string source = Write(Server(100));
+    const std::string before = "what was there before";
+    const std::string file = place.Write("report", before);
+    setting.fileLimit = 20000;
+    for (const char* format : {"json", "ndjson", "table"}) {
+        const Ended ended =
+            Collect(source, {"--output", file, "--format", format, "--log-level", "error"});
+        EXPECT_EQ(ended.exitStatus, 2) << format;
+        EXPECT_THAT(ended.err, MatchesRegex("ipmisel: cannot [^\n]+: File too large; [^\n]+\n"));
+        EXPECT_EQ(ReadText(file), before);
+        EXPECT_THAT(Left(), ElementsAre("report"));
+    }
+}
+
+TEST_F(Output, ASymbolicLinkIsReplacedAndNotFollowed) {
+    const std::string other = place.Write("other", "precious");
+    std::filesystem::create_symlink(other, InPlace("report"));
+    EXPECT_EQ(Run(Good({})).exitStatus, 0);
+    EXPECT_EQ(ReadText(other), "precious");
+    EXPECT_FALSE(std::filesystem::is_symlink(InPlace("report")));
+    EXPECT_THAT(ReadText(InPlace("report")), StartsWith("Machine SIM-T"));
+}
+
+TEST_F(Output, APipeIsWrittenAndStays) {
+    const std::string pipe = InPlace("report");
+    ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+    const int reader = open(pipe.c_str(), O_RDONLY | O_NONBLOCK);
+    EXPECT_EQ(Run(Good({})).exitStatus, 0);
+    char begin[8] = {};
+    EXPECT_EQ(read(reader, begin, 7), 7);
+    EXPECT_STREQ(begin, "Machine");
+    close(reader);
+    EXPECT_TRUE(std::filesystem::is_fifo(pipe));
+}
+
+}  // namespace

@@ -1,0 +1,389 @@
+#include <sys/stat.h>
+
+#include <chrono>
+#include <cstdint>
+#include <set>
+
+#include "tests/program/program_fixture.h"
+
+namespace {
+
+using ipmiseltest::Ended;
+using ipmiseltest::Eventually;
+using ipmiseltest::IpmiSim;
+using ipmiseltest::Json;
+using ipmiseltest::ProgramTest;
+using ipmiseltest::ReadText;
+using ipmiseltest::RunningProgram;
+using testing::AllOf;
+using testing::Each;
+using testing::ElementsAre;
+using testing::EndsWith;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::Lt;
+using testing::Not;
+using testing::SizeIs;
+using testing::StartsWith;
+
+std::vector<std::string> Lines(const std::string& text) {
+    std::vector<std::string> lines;
+    std::istringstream in(text);
+    for (std::string line; std::getline(in, line);) lines.push_back(line);
+    return lines;
+}
+
+class Collecting : public ProgramTest {};
+
+TEST_F(Collecting, TheJsonReportHoldsEveryPropertyInTheOrderWritten) {
+    const std::string source = Write(Server());
+    const Ended ended = Collect(source, {"--format", "json"});
+    EXPECT_EQ(ended.exitStatus, 0);
+    const Json expected = Json::parse(R"({
+        "source": "",
+        "plugin": {"name": "IPMISEL", "version": "1.0", "interface": "1.0"},
+        "status": {"code": 0, "text": "Success"},
+        "instances": [{"class": "QORSG_IPMILogRecord", "properties": {
+            "CreationClassName": "QORSG_IPMILog",
+            "LogCreationClassName": "QORSG_IPMILog",
+            "LogName": "IPMILogEntry",
+            "RecordID": "1",
+            "MessageTimestamp": "20240305092816.000000+060",
+            "CreationTimeStamp": "20240305092816.000000+060",
+            "Source": "16 (address). LUN 0. Channel 0.",
+            "SensorType": "Temperature",
+            "EventType": "Assertion, Threshold.",
+            "Entity": "Processor",
+            "EntityInstance": "1",
+            "SensorInformation": "CPU1 Temp",
+            "Message": "Processor 1 (Temperature - CPU1 Temp): Assertion: Rose above the upper critical limit. \n               Trigger threshold value: 69 degrees C. \n               Trigger reading: 80 degrees C.",
+            "AuxLog": "No Extended Data",
+            "SourceNode": "1",
+            "RawData": [1, 0, 2, 176, 229, 230, 101, 32, 0, 4, 1, 48, 1, 89, 80, 69]}}],
+        "notices": [],
+        "completeness": [{"node": 0,
+            "log": {"announced": 1, "read": 1, "exported": 1},
+            "sensors": {"announced": 1, "read": 1}, "faults": []}]})");
+    Json report = Json::parse(ended.out);
+    EXPECT_EQ(report["source"], source);
+    report["source"] = "";
+    EXPECT_EQ(report, expected) << report.dump(2);
+}
+
+TEST_F(Collecting, FormatsAndPlacesAgree) {
+    const std::string source = Example("two-node");
+    const Json instances = Report(source)["instances"];
+    Json lines = Json::array();
+    for (const std::string& line : Lines(Collect(source, {"--format", "ndjson"}).out)) {
+        lines.push_back(Json::parse(line));
+    }
+    EXPECT_EQ(lines, instances);
+
+    const Ended table = Collect(source);
+    EXPECT_THAT(Lines(table.out), Each(SizeIs(Lt(101U))));
+    EXPECT_THAT(table.out,
+                AllOf(HasSubstr("QORSG_IPMILogRecord, node 2\n"), EndsWith("Complete.\n")));
+    EXPECT_EQ(Collect(source, {"--output", "-"}).out, table.out);
+
+    const std::string file = InPlace("report");
+    place.Write("report", "what was there before");
+    const mode_t before = umask(027);
+    EXPECT_EQ(Collect(source, {"--output", file}).out, "");
+    umask(before);
+    EXPECT_EQ(ReadText(file), table.out);
+    EXPECT_EQ(std::filesystem::status(file).permissions(), std::filesystem::perms(0640));
+    EXPECT_THAT(Left(), ElementsAre("report"));
+}
+
+TEST_F(Collecting, ClassesComeInTheirOrderOrTheUsers) {
+    const std::vector<std::string> listed = Lines(Run({"classes"}).out);
+    ASSERT_THAT(listed, SizeIs(9));
+    EXPECT_THAT(listed, Each(testing::ContainsRegex("^QORSG_[A-Za-z]+  +[A-Za-z]")));
+    EXPECT_THAT(listed[0], StartsWith("QORSG_IPMIFirmwareElement "));
+    EXPECT_THAT(listed[5], StartsWith("QORSG_IPMILogRecord "));
+
+    const auto classesOf = [](const Json& report) {
+        std::vector<std::string> classes;
+        for (const Json& instance : report["instances"]) {
+            const auto name = instance["class"].get<std::string>();
+            if (classes.empty() || classes.back() != name) classes.push_back(name);
+        }
+        return classes;
+    };
+    // By default those that a pass yields, in the order listed: the inventory before the log,
+    // although the plug-in writes it last.
+    const std::vector<std::string> all = classesOf(Report(Example("rack-server")));
+    auto next = listed.begin();
+    for (const std::string& name : all) {
+        next = std::find_if(next, listed.end(),
+                            [&](const std::string& line) { return line.starts_with(name + " "); });
+    }
+    EXPECT_NE(next, listed.end()) << testing::PrintToString(all);
+    EXPECT_THAT(all, testing::IsSupersetOf({"QORSG_IPMIFRU", "QORSG_IPMILogRecord"}));
+    EXPECT_THAT(all, Not(testing::Contains("QORSG_IPMIMessageLog")));
+
+    const Json named = Report(
+        Write(Server()), {"--class", "QORSG_IPMIRecordInLog", "--class", "QORSG_IPMIMessageLog"});
+    EXPECT_THAT(classesOf(named), ElementsAre("QORSG_IPMIRecordInLog", "QORSG_IPMIMessageLog"));
+    EXPECT_EQ(named["instances"][1]["properties"]["LogRecord"],
+              Json::parse(R"({"class": "QORSG_IPMILogRecord", "keys": {"RecordID": "2"}})"));
+}
+
+TEST_F(Collecting, HelpAndVersionAreTheOutputThatWasAskedFor) {
+    const Ended help = Run({"collect", "--help"});
+    EXPECT_EQ(help.exitStatus, 0);
+    EXPECT_THAT(help.out, AllOf(HasSubstr("table, json, ndjson"), HasSubstr("replay:FILE"),
+                                HasSubstr("error, warning, notice, info, trace")));
+#ifdef IPMISEL_FREEIPMI
+    EXPECT_THAT(help.out, HasSubstr("\n  opensesspriv "));
+#endif
+    EXPECT_THAT(Run({"--version"}).out, testing::MatchesRegex("ipmisel [0-9.]+\n"));
+}
+
+TEST_F(Collecting, AReplayGivesTheReportThatWasRecorded) {
+    const std::string capture = InPlace("capture");
+    Json recorded = Report(Example("two-node"), {"--record", capture});
+    Json replayed = Report("replay:" + capture);
+    EXPECT_EQ(replayed["source"], "replay:" + capture);
+    recorded.erase("source");
+    replayed.erase("source");
+    EXPECT_EQ(replayed, recorded);
+    EXPECT_GT(recorded["instances"].size(), 10U);
+}
+
+TEST_F(Collecting, TextsOfABmcDoNotSteerTheTerminal) {
+    Json server = Server();
+    server["machine_type"] = "SIM\u001b[31m";
+    // Four bytes of a shutdown comment: ESC and "[", or CSI as one character and DEL
+    server["bmcs"][0]["sel"]["entries"] = {"0100 dd b0e5e665 000000 00 1b5bff41 00",
+                                           "0200 dd b0e5e665 000000 00 c29b7f42 00"};
+    const std::string source = Write(server);
+    for (const char* format : {"table", "json", "ndjson"}) {
+        const Ended ended = Collect(source, {"--format", format, "--log-level", "trace"});
+        for (const std::string& text : {ended.out, ended.err}) {
+            EXPECT_FALSE(text.empty());
+            EXPECT_THAT(
+                text, AllOf(Not(HasSubstr("\x1b")), Not(HasSubstr("\x7f")), Not(HasSubstr("\xff")),
+                            Not(HasSubstr("\xc2\x9b")), Not(HasSubstr("\xe2\x80\xae"))))
+                << format;
+        }
+    }
+    const Json instances = Report(source)["instances"];
+    const std::string lead = "(Shutdown Event): Comment String Part 0: ";
+    EXPECT_EQ(instances[0]["properties"]["Message"], lead + "\x1b[\uFFFDA");
+    EXPECT_EQ(instances[1]["properties"]["Message"], lead +
+                                                         "\u009b\x7f"
+                                                         "B");
+}
+
+TEST_F(Collecting, TheLogFileHoldsEveryLineAndTheTerminalWhatWasAskedFor) {
+    const std::string file = InPlace("log");
+    const Ended ended = Collect(Write(Server()), {"--log-file", file});
+    std::set<int> severities;
+    std::set<std::string> texts;
+    for (const std::string& line : Lines(ReadText(file))) {
+        const Json json = Json::parse(line);
+        EXPECT_EQ(json.size(), 2U);
+        severities.insert(json["severity"].get<int>());
+        texts.insert(json["text"].get<std::string>());
+    }
+    EXPECT_THAT(ReadText(file),
+                HasSubstr("{\"severity\": 3, \"text\": \"Getting IPMI SEL data.\"}\n"));
+    EXPECT_THAT(severities, ElementsAre(1, 3, 4));
+    EXPECT_TRUE(texts.contains("num_SELentries = 1"));
+    EXPECT_THAT(Lines(ended.err), AllOf(Not(IsEmpty()), Each(StartsWith("ipmisel: warning: "))));
+    EXPECT_EQ(Collect(Write(Server()), {"--log-level", "error"}).err, "");
+    EXPECT_THAT(Collect(Write(Server()), {"--log-level", "info"}).err,
+                HasSubstr("ipmisel: info: Getting IPMI SEL data.\n"));
+}
+
+TEST_F(Collecting, ANoticeIsToldAndKept) {
+    Json server = Server();
+    server["ipmi_driver"] = false;
+    const Json report = Report(Write(server));
+    ASSERT_EQ(report["notices"].size(), 1U);
+    const auto text = report["notices"][0].get<std::string>();
+    EXPECT_THAT(text, StartsWith("A BMC/ZMC was detected, but the IPMI driver is not installed."));
+    EXPECT_THAT(ReadText((folder.path() / "stderr").string()), HasSubstr(Lines(text)[0]));
+}
+
+TEST_F(Collecting, WhatWentWrongShowsInExitStatusReportAndOneLine) {
+    const struct {
+        const char* what;
+        const char* fault;
+        int exitStatus;
+        int statusCode;
+        const char* line;
+    } cases[] = {
+        {"no log", R"({"netfn": "0a", "command": "40", "no_response": true})", 1, 3,
+         "the pass ended with status 3"},
+        {"a record in the middle",
+         R"({"netfn": "0a", "command": "43", "call": 3, "completion_code": "cb"})", 4, 0,
+         "1 of 3 log records not read, Get SEL Entry 0003: completion code cb"},
+        {"sensors", R"({"netfn": "0a", "command": "23", "no_response": true})", 4, 0,
+         "Get SDR 0000: no response"},
+        {"a log that is asked for twice",
+         R"({"netfn": "0a", "command": "40", "call": 1, "no_response": true})", 0, 0, ""},
+    };
+    for (const auto& c : cases) {
+        Json server = Server(3);
+        server["bmcs"][0]["faults"] = {Json::parse(c.fault)};
+        const Ended ended = Collect(Write(server), {"--format", "json", "--log-level", "error",
+                                                    "--class", "QORSG_IPMILogRecord"});
+        EXPECT_EQ(ended.exitStatus, c.exitStatus) << c.what;
+        EXPECT_EQ(Json::parse(ended.out)["status"]["code"], c.statusCode) << c.what;
+        const auto lines = Lines(ended.err);
+        if (c.exitStatus != 0) {
+            ASSERT_THAT(lines, Not(IsEmpty())) << c.what;
+            EXPECT_THAT(lines.back(), AllOf(StartsWith("ipmisel: "), HasSubstr(c.line))) << c.what;
+        }
+    }
+}
+
+TEST_F(Collecting, AMachineWithoutABmcGivesAnEmptyReport) {
+    Json noRecord = Server();
+    noRecord.erase("smbios");
+    Json noNode = Server();
+    noNode.erase("bmcs");
+    for (const Json& server : {noRecord, noNode}) {
+        for (const char* name : {"QORSG_IPMILogRecord", "QORSG_IPMIMessageLog"}) {
+            const Ended ended = Collect(
+                Write(server), {"--format", "json", "--class", name, "--log-level", "error"});
+            EXPECT_EQ(ended.exitStatus, 3);
+            EXPECT_EQ(Json::parse(ended.out)["instances"].size(), 0U);
+            EXPECT_THAT(Lines(ended.err), ElementsAre(StartsWith("ipmisel: no BMC")));
+        }
+    }
+}
+
+TEST_F(Collecting, AReaderThatLeavesEndsItQuietly) {
+    const std::string source = Write(Server(500));
+    const Ended ended =
+        RunningProgram(
+            folder.path().string(),
+            {"/bin/sh", "-c", "{ \"$@\"; echo status $? >&2; } | head -n 1", "sh", IPMISEL_PROGRAM,
+             "collect", "--from", source, "--format", "ndjson", "--log-level", "error"})
+            .Wait();
+    EXPECT_THAT(Lines(ended.out), SizeIs(1));
+    EXPECT_EQ(ended.err, "status 141\n");  // 128 + SIGPIPE
+}
+
+/// A BMC that is too slow for anybody's patience.
+class Slow : public ProgramTest {
+protected:
+    std::string SlowServer() {
+        Json server = Server(200);
+        server["bmcs"][0]["latency_us"] = 100000;
+        return Write(server);
+    }
+    std::vector<std::string> ToFile(std::vector<std::string> more = {}) {
+        more.insert(more.begin(),
+                    {"collect", "--from", SlowServer(), "--class", "QORSG_IPMILogRecord",
+                     "--format", "json", "--log-level", "trace", "--output", InPlace("report")});
+        return Command(more);
+    }
+    static bool IsReading(const RunningProgram& program) {
+        return Eventually(
+            [&] { return program.Errors().find("IPMIGetSELEntry") != std::string::npos; });
+    }
+    void ExpectPart(const Ended& ended, const std::string& why) {
+        EXPECT_EQ(ended.exitStatus, 4);
+        const Json report = Json::parse(ReadText(InPlace("report")), nullptr, false);
+        ASSERT_FALSE(report.is_discarded());
+        EXPECT_EQ(report["completeness"][0]["log"]["announced"], 200);
+        EXPECT_EQ(report["completeness"][0]["faults"][0]["problem"], why);
+        EXPECT_THAT(Left(), ElementsAre("report"));
+    }
+};
+
+TEST_F(Slow, ADeadlineOrAnInterruptionLeavesAReportOfWhatWasRead) {
+    const auto begin = std::chrono::steady_clock::now();
+    ExpectPart(RunningProgram(folder.path().string(), ToFile({"--deadline", "1.5"})).Wait(),
+               "deadline");
+    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::seconds(10));
+
+    RunningProgram program(folder.path().string(), ToFile());
+    ASSERT_TRUE(IsReading(program));
+    program.Signal(SIGINT);
+    ExpectPart(program.Wait(), "interrupted");
+}
+
+TEST_F(Slow, ASecondSignalEndsItAtOnceAndLeavesNothing) {
+    RunningProgram program(folder.path().string(), ToFile());
+    ASSERT_TRUE(IsReading(program));
+    EXPECT_THAT(Left(), SizeIs(1));
+    program.Signal(SIGTERM);
+    std::this_thread::sleep_for(std::chrono::milliseconds(20));
+    program.Signal(SIGTERM);
+    EXPECT_EQ(program.Wait().signal, SIGTERM);
+    EXPECT_THAT(Left(), IsEmpty());
+}
+
+class OverTheNetwork : public ProgramTest {
+protected:
+    void SetUp() override {
+#ifndef IPMISEL_FREEIPMI
+        GTEST_SKIP() << "built without FreeIPMI";
+#endif
+        if (!IpmiSim::Missing().empty()) GTEST_SKIP() << IpmiSim::Missing();
+    }
+    static std::vector<std::string> Access() {
+        return {"--user", "root", "--workaround", "opensesspriv"};
+    }
+};
+
+TEST_F(OverTheNetwork, TheSameLogReadsAsSimulatedAndFromItsCapture) {
+    // Without time stamps, which ipmi_sim gives itself.
+    const std::vector<std::uint8_t> first = {1, 0, 0xE0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13};
+    const std::vector<std::uint8_t> second = {2, 0, 0xE1, 9, 8, 7, 6, 5, 4, 3, 2, 1, 0, 1, 2, 3};
+    const IpmiSim sim({IpmiSim::SelLine(first), IpmiSim::SelLine(second)});
+    setting.environment["IPMISEL_PASSWORD"] = "secret";
+    std::vector<std::string> access = Access();
+    access.insert(access.end(), {"--class", "QORSG_IPMILogRecord", "--record", InPlace("capture")});
+    const Json lan = Report("lan:" + sim.Place(), access);
+    Json server = Server();
+    server["bmcs"][0]["sel"]["entries"] = {"0100 e0 0102030405060708090a0b0c0d",
+                                           "0200 e1 09080706050403020100010203"};
+    EXPECT_EQ(lan["instances"].size(), 2U);
+    EXPECT_EQ(lan["instances"],
+              Report(Write(server), {"--class", "QORSG_IPMILogRecord"})["instances"]);
+    EXPECT_EQ(lan["instances"], Report("replay:" + InPlace("capture"),
+                                       {"--class", "QORSG_IPMILogRecord"})["instances"]);
+    EXPECT_THAT(ReadText(InPlace("capture")), Not(HasSubstr("secret")));
+}
+
+TEST_F(OverTheNetwork, ThePasswordComesFromAFileOrIsAskedForUnseen) {
+    const IpmiSim sim({});
+    std::vector<std::string> access = Access();
+    access.insert(access.end(), {"--format", "json", "--class", "QORSG_IPMILogRecord"});
+    std::vector<std::string> fromFile = access;
+    fromFile.insert(fromFile.end(),
+                    {"--password-file", folder.Write("password", "secret\nmore\n")});
+    EXPECT_EQ(Collect("lan:" + sim.Place(), fromFile).exitStatus, 0);
+    fromFile.back() = folder.Write("password", "wrong\n");
+    EXPECT_EQ(Collect("lan:" + sim.Place(), fromFile).exitStatus, 3);
+
+    setting.onTerminal = true;
+    access.insert(access.begin(), {"collect", "--from", "lan:" + sim.Place()});
+    RunningProgram program(folder.path().string(), Command(access), setting);
+    std::string shown;
+    const auto read = [&] {
+        char part[64];
+        const ssize_t count = ::read(program.Terminal(), part, sizeof part);
+        if (count > 0) shown.append(part, static_cast<std::size_t>(count));
+        return shown.find("Password: ") != std::string::npos;
+    };
+    ASSERT_TRUE(Eventually(read));
+    termios quiet{};
+    tcgetattr(program.Terminal(), &quiet);
+    EXPECT_EQ(quiet.c_lflag & ECHO, 0U);
+    ASSERT_EQ(write(program.Terminal(), "secret\n", 7), 7);
+    const Ended ended = program.Wait();
+    EXPECT_EQ(ended.exitStatus, 0) << ended.err;
+    termios after{};
+    tcgetattr(program.Terminal(), &after);
+    EXPECT_NE(after.c_lflag & ECHO, 0U);
+    EXPECT_EQ(shown, "Password: ");
+}
+
+}  // namespace
