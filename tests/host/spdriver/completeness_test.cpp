@@ -1,0 +1,115 @@
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <array>
+#include <string>
+#include <tuple>
+#include <vector>
+
+#include "host/spdriver/stop.h"
+#include "host/spdriver/transport.h"
+#include "tests/support/bmc_fixture.h"
+
+namespace {
+
+using tqrhost::CompletenessOf;
+using tqrhost::NodeCompleteness;
+
+class Completeness : public ipmiseltest::BmcTest {
+protected:
+    Completeness() {
+        for (std::uint8_t i = 1; i <= 3; ++i) bmc.selEntries.push_back({i, 0, 2});
+    }
+    ~Completeness() override { tqrhost::ClearStop(); }
+
+    void Send(std::uint8_t command, const std::vector<std::uint8_t>& data = {}) {
+        std::array<unsigned char, 256> buffer{0x01, 0x20, 0x0A, 0x00, command};
+        buffer[5] = static_cast<unsigned char>(data.size());
+        std::copy(data.begin(), data.end(), buffer.begin() + 9);
+        int length = 256;
+        Library()->sendIPMICommand(buffer.data(), &length, 256, true);
+    }
+    void ReadLog() {
+        Send(0x40);
+        for (const std::uint8_t record : {0, 2, 3}) Send(0x43, {0, 0, record, 0, 0, 0xFF});
+    }
+    std::vector<std::string> Faults() {
+        std::vector<std::string> texts;
+        for (const auto& fault : CompletenessOf(*Library()).faults) {
+            texts.push_back(fault.what + " " + fault.record + ": " + fault.problem);
+        }
+        return texts;
+    }
+    using Texts = std::vector<std::string>;
+};
+
+TEST_F(Completeness, CountsEveryRecordOnceHoweverOftenItIsRead) {
+    ReadLog();
+    ReadLog();
+    const NodeCompleteness account = CompletenessOf(*Library());
+    EXPECT_EQ(account.log.announced, 3u);
+    EXPECT_EQ(account.log.read, 3u);
+    EXPECT_EQ(account.sensors.announced, std::nullopt);
+    EXPECT_TRUE(account.Whole());
+}
+
+TEST_F(Completeness, TellsWhatWentWrongWithEachRead) {
+    Silence(0x43, 1);
+    FailWith(0x43, 2, 0xCB);
+    bmc.faults.push_back({0x0A, 0x43, 3, ipmisim::Fault::Kind::kTruncate, 0, 7, {}});
+    ReadLog();
+    EXPECT_EQ(Faults(),
+              (Texts{"Get SEL Entry 0000: no response", "Get SEL Entry 0002: completion code cb",
+                     "Get SEL Entry 0003: short answer"}));
+    EXPECT_EQ(CompletenessOf(*Library()).log.read, 0u);
+    EXPECT_FALSE(CompletenessOf(*Library()).Whole());
+}
+
+TEST_F(Completeness, AQuestionAnsweredAtTheSecondTryLeavesNothingOut) {
+    Silence(0x40, 1);
+    Send(0x40);
+    EXPECT_EQ(Faults(), Texts{"Get SEL Info : no response"});
+    ReadLog();
+    EXPECT_EQ(Faults(), Texts{});
+    EXPECT_TRUE(CompletenessOf(*Library()).Whole());
+}
+
+TEST_F(Completeness, ACircleIsAFaultAndAnAbsentDeviceIsNone) {
+    ReadLog();
+    Send(0x43, {0, 0, 1, 0, 0, 0xFF});  // the first record again, under its own ID
+    EXPECT_EQ(Faults(), Texts{"Get SEL Entry 0001: ran in a circle"});
+    Send(0x11, {9, 0, 0, 16});
+    EXPECT_EQ(Faults().size(), 1u);
+}
+
+TEST_F(Completeness, AnEmptyLogIsWhole) {
+    bmc.selEntries.clear();
+    Send(0x40);
+    Send(0x43, {0, 0, 0, 0, 0, 0xFF});
+    EXPECT_EQ(Faults(), Texts{});
+    EXPECT_TRUE(CompletenessOf(*Library()).Whole());
+}
+
+TEST_F(Completeness, AnInventoryFaultLeavesLogAndSensorsWhole) {
+    bmc.fru[0] = ipmisim::Bytes(16, 1);
+    FailWith(0x11, 2, 0xC0);
+    Send(0x11, {0, 0, 0, 16});
+    Send(0x11, {0, 0, 0, 16});
+    Send(0x11, {0, 16, 0, 16});  // past the end: the device is smaller
+    EXPECT_EQ(Faults(), Texts{"Read FRU Data 0000: completion code c0"});
+    EXPECT_TRUE(CompletenessOf(*Library()).Whole());
+}
+
+TEST_F(Completeness, AfterADeadlineNothingIsSentAndTheReportSaysWhy) {
+    Send(0x40);
+    tqrhost::StopAt(std::chrono::steady_clock::now());
+    const std::size_t before = requests.size();
+    Send(0x43, {0, 0, 0, 0, 0, 0xFF});
+    EXPECT_EQ(requests.size(), before);
+    EXPECT_EQ(Faults(), Texts{"Get SEL Entry 0000: deadline"});
+    tqrhost::StopNow();
+    Send(0x43, {0, 0, 2, 0, 0, 0xFF});
+    EXPECT_EQ(Faults().back(), "Get SEL Entry 0002: interrupted");
+}
+
+}  // namespace
