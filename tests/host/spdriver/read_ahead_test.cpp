@@ -37,9 +37,9 @@ Ask SdrAsk(std::uint16_t record, std::uint8_t offset, std::uint8_t count,
 }
 
 Response Next(std::uint16_t record, std::vector<std::uint8_t> rest = {}) {
-    Response response{0, static_cast<std::uint8_t>(record), static_cast<std::uint8_t>(record >> 8)};
-    response.insert(response.end(), rest.begin(), rest.end());
-    return response;
+    rest.insert(rest.begin(),
+                {0, static_cast<std::uint8_t>(record), static_cast<std::uint8_t>(record >> 8)});
+    return rest;
 }
 
 /// The header of a record: ID, version, type, length, and so on to its sixth byte.
