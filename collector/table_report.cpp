@@ -84,7 +84,9 @@ std::string ValueText(const tqrhost::PropertyValue& value) {
     }
     const auto& path = std::get<tqrhost::ObjectPath>(value);
     std::string text = path.className;
-    for (const auto& [key, name] : path.keys) text += " " + key + "=" + name;
+    for (const auto& [key, name] : path.keys) {
+        text += Format(" %s=%s", key.c_str(), name.c_str());
+    }
     return text;
 }
 

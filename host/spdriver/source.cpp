@@ -83,6 +83,7 @@ Source OpenSources(const std::vector<std::string>& sources, const SourceOptions&
     }
     const Kind& kind = FindKind(sources.front());
     std::vector<std::string> places;
+    places.reserve(sources.size());
     for (const std::string& source : sources) places.push_back(PlaceOf(source, kind));
     return kind.open(places, askOnce);
 }
