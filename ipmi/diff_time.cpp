@@ -1,11 +1,11 @@
 #include "ipmi/diff_time.h"
 
 #include <cstdint>
-#include <ctime>
 #include <optional>
 #include <string>
 
 #include "ipmi/ipmi_message.h"
+#include "records/calendar_time.h"
 #include "tqr/status.h"
 
 using namespace ipmisel;
@@ -29,22 +29,6 @@ public:
     }
 };
 
-TCIMDateTime BmcTime(std::int32_t raw, short utcOffset) {
-    const std::time_t seconds = raw;
-    std::tm fields{};
-    if (gmtime_r(&seconds, &fields) == nullptr) {
-        WriteLog(kInfo, "Could not convert RawBMCTime.");
-        throw NQORTQR20::TTQRException({NQORTQR20::kStatusBadTime});
-    }
-    TCIMDateTime time;
-    time.Set(static_cast<unsigned short>(fields.tm_year + 1900),
-             static_cast<unsigned short>(fields.tm_mon + 1),
-             static_cast<unsigned int>(fields.tm_mday), static_cast<unsigned short>(fields.tm_hour),
-             static_cast<unsigned short>(fields.tm_min), static_cast<unsigned short>(fields.tm_sec),
-             0, utcOffset);
-    return time;
-}
-
 }  // namespace
 
 unsigned GetDiffTime(NQORTQR20::TCPluginCallbacks*, TCIMDateTime* difference, bool* bmcNotBehind,
@@ -59,7 +43,8 @@ unsigned GetDiffTime(NQORTQR20::TCPluginCallbacks*, TCIMDateTime* difference, bo
         const TCIMDateTime osTime = NQORTQR20::TOSSpecific::GetLocalTime();
         WriteLog(kTrace, "OSTime  = " + osTime.ToString());
         WriteLog(kTrace, "BMCTime raw = " + std::to_string(*raw));
-        const TCIMDateTime bmcTime = BmcTime(*raw, osTime.GetUTCOffset());
+        const TCIMDateTime bmcTime =
+            CalendarTime(*raw, osTime.GetUTCOffset(), "Could not convert RawBMCTime.");
         WriteLog(kTrace, "BMCTime = " + bmcTime.ToString());
         *difference = bmcTime - osTime;
         *bmcNotBehind = !(bmcTime < osTime);
