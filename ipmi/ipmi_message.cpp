@@ -98,8 +98,7 @@ unsigned IPMIMessage::Exchange(const ipmisel::IPMICommand& command,
 }
 
 std::span<const std::uint8_t> IPMIMessage::Response() const {
-    using ipmisel::kResponseAt;
-    const std::span<const std::uint8_t> all = std::span(transferBuffer_).subspan(kResponseAt);
+    const auto all = std::span(transferBuffer_).subspan(ipmisel::kResponseAt);
     if (length_ < 0) return {};
     return all.first(std::min(all.size(), static_cast<std::size_t>(length_) + 1));
 }
@@ -108,4 +107,8 @@ ipmisel::ByteReader IPMIMessage::Reply() const {
     ipmisel::ByteReader in(Response());
     in.Skip(1);
     return in;
+}
+
+ipmisel::ByteReader IPMIMessage::ReplyBuffer() const {
+    return ipmisel::ByteReader(std::span(transferBuffer_).subspan(ipmisel::kResponseAt + 1));
 }

@@ -47,6 +47,8 @@ struct IPMIRecordID {
     std::uint8_t low = 0;
 };
 static_assert(sizeof(IPMIRecordID) == 2);
+/// A log or repository that still goes on after as many records leads in a circle.
+constexpr unsigned kMostRecords = 0x10000;
 
 inline IPMIRecordID ReadRecordID(ByteReader* in) {
     IPMIRecordID id;
@@ -89,6 +91,8 @@ protected:
     std::span<const std::uint8_t> Response() const;
     /// The reply after the completion code.
     ipmisel::ByteReader Reply() const;
+    /// As Reply, as far as the buffer reaches, whatever length the transport reported.
+    ipmisel::ByteReader ReplyBuffer() const;
     /// Length of the reply after the completion code, as the transport reported it.
     int length() const { return length_; }
 

@@ -37,9 +37,11 @@ unsigned IPMIRequestAuxLog::IPMIGetAuxLogStatus(unsigned int* entryCount) {
         WriteLog(kInfo, "IPMIRequestAuxLog::Response Length = " + std::to_string(length()) +
                             "\nrspBuf = " + DumpBytes(Response(), Digits::kLowerHex));
     }
-    ByteReader reply = Reply();
+    // Compatibility: the number is taken whatever length the transport reported; a shorter reply
+    // leaves zeros there (Bounds.ClaimedLengthsAreBelievedAsFarAsTheBufferReaches).
+    ByteReader reply = ReplyBuffer();
     reply.Skip(kBeforeCount);
-    *entryCount = reply.U16();  // 0 when the reply is shorter
+    *entryCount = reply.U16();
     return kOk;
 }
 

@@ -43,10 +43,6 @@ constexpr std::uint8_t kToTheEnd = 0xFF;
 constexpr unsigned kInventoryBytes = 256;
 constexpr std::uint8_t kChunk = 16;
 
-/// Record IDs have 16 bits; a repository that still goes on after as many records leads in a
-/// circle.
-constexpr unsigned kMostRecords = 0x10000;
-
 /// Compatibility: unlike the walk over the sensors, only both bytes of 0xFF end this one
 /// (FruWalk.OneByteOfFfGoesOn).
 bool EndsRepository(const IPMIRecordID& id) { return id.high == 0xFF && id.low == 0xFF; }

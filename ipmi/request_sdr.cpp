@@ -44,10 +44,6 @@ constexpr std::uint8_t kFullStringOffset = 47;
 constexpr std::uint8_t kCompactStringOffset = 31;
 constexpr std::uint8_t kToTheEnd = 0xFF;
 
-/// Record IDs have 16 bits; a repository that still goes on after as many records leads in a
-/// circle.
-constexpr unsigned kMostRecords = 0x10000;
-
 /// Compatibility: one byte of 0xFF ends the repository, so that a record whose ID has such a byte
 /// is never read (SdrWalk.AnyFfByteEndsTheWalk).
 bool EndsRepository(const IPMIRecordID& id) { return id.high == 0xFF || id.low == 0xFF; }

@@ -16,7 +16,7 @@ class IPMIRequestSDR : public IPMIMessage {
 public:
     explicit IPMIRequestSDR(NQORTQR20::SPLibrary* transport);
 
-    /// `infoText` holds kSdrInfoTextLength characters.
+    /// Writes infoText[0..kSdrInfoTextLength), without a NUL when the text fills it.
     unsigned IPMIGetSDRInfo(NQORTQR20::TCPluginCallbacks* context, unsigned char* infoText);
     unsigned IPMIReserveSDR(NQORTQR20::TCPluginCallbacks* context);
     unsigned IPMIGetSDRHeader(NQORTQR20::TCPluginCallbacks* context, s_SDR_entry* entry);

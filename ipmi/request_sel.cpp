@@ -35,8 +35,6 @@ constexpr IPMICommand kGetLaterEntry{
 constexpr std::uint8_t kSelVersion = 0x51;
 constexpr std::size_t kDumpCapacity = 256;
 constexpr std::uint8_t kWholeRecord = 0xFF;
-/// Record IDs have 16 bits; a log that still goes on after as many reads leads in a circle.
-constexpr unsigned kMostReads = 0x10000;
 
 }  // namespace
 
@@ -71,7 +69,7 @@ unsigned IPMIRequestSEL::IPMIGetSELEntry(NQORTQR20::TCPluginCallbacks*, s_SEL_ro
     // (SelWalk.FirstEntryIsStoredEvenForNoRows).
     const unsigned stored = std::max(rowCount, 1U);
     nextRecordId_ = {};  // stands for the first entry
-    for (unsigned counter = 0; counter < kMostReads; ++counter) {
+    for (unsigned counter = 0; counter < kMostRecords; ++counter) {
         // A reservation is not needed for whole records, hence ID 0x0000.
         const std::array<std::uint8_t, 6> request{
             0x00, 0x00, nextRecordId_.low, nextRecordId_.high, 0x00, kWholeRecord};

@@ -16,8 +16,8 @@ struct s_SDR_entry {
 };
 static_assert(sizeof(s_SDR_entry) == 224);
 
-/// Text of Get SDR Repository Info, as it is handed from the request to the cache: at most 64
-/// characters and a NUL of its own.
+/// Most characters of the Get SDR Repository Info text, as it is handed from the request to the
+/// cache; a text that fills them is not terminated.
 constexpr unsigned kSdrInfoTextLength = 64;
 
 /// One raw auxiliary log entry: bytes 0-2 signature 4D 4F 00, 3-4 record size (from byte 10 on),
