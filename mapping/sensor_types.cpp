@@ -5,8 +5,9 @@
 namespace ipmisel {
 namespace {
 
-// Sensor type codes, IPMI 2.0 table 42-3. "Managment" is how the text has always read; do not
-// correct it. The first and the last entry are never looked up.
+// Sensor type codes, IPMI 2.0 table 42-3. The first and the last entry are never looked up.
+// Compatibility: "Managment" is how the text has always read
+// (SensorType.NamesStandardAndOemTypes).
 constexpr std::array<std::string_view, 46> kSensorTypes{
     "Unknown Sensor Type",
     "Temperature",

@@ -65,7 +65,8 @@ double ReadingValue(const s_SDR_Mod_Units& units, int reading) {
     return ConvertReading(units, reading);
 }
 
-/// By the analog data format.
+/// By the analog data format. Compatibility: signed readings are shown as they come, without the
+/// conversion (SensorUnits.ConvertsAndFormats).
 std::string ValueText(const s_SDR_Mod_Units& units, double value, int reading) {
     switch (units.SensorUnits1 >> 6) {
         case 1:
@@ -115,6 +116,8 @@ std::string SensorUnitsText(NQORTQR20::TCPluginCallbacks* context, const s_SDR_M
     TraceScope trace("IPMIMapping::GetSensorUnits()", TraceScope::kFunction);
     std::string text = ValueText(units, ReadingValue(units, reading), reading);
     if ((units.SensorUnits1 & 0x01) != 0) text += "%";
+    // Compatibility: the rate stands before the unit that it belongs to, not behind it
+    // (SensorUnits.ConvertsAndFormats).
     if (const int rate = units.SensorUnits1 >> 3 & 0x07; rate != 0) {
         text += " " + FetchText(context, kRateTexts + rate, kUnitCapacity);
     }

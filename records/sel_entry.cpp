@@ -121,6 +121,8 @@ unsigned IPMISELEntry::CopyRecordID(TCPluginCallbacks* /*context*/, char* out, u
 
 unsigned IPMISELEntry::CopyGeneratorID(TCPluginCallbacks* context, char* out, unsigned int len,
                                        IPMIMapping* /*mapping*/) const {
+    // Compatibility: the one name without parentheses
+    // (SelEntry.TextsAreTracedAndCutAtTheBufferWithoutANul).
     const TraceScope trace("IPMISELEntry::GetGeneratorID", TraceScope::kFunction);
     if (LogEnabled(kTrace)) {
         WriteLog(kTrace, Format("GenID1, GenID2 = %d, %d", int{bytes_[7]}, int{bytes_[8]}));

@@ -10,8 +10,9 @@
 #include "tqr/plugin.h"
 
 /// One System Event Log record: 16 bytes laid out as the IPMI 2.0 standard has them (table 32-1),
-/// except that the record ID is held high byte first. Arrays of records are handed about as raw
-/// memory, hence no virtual operation.
+/// except that the record ID is held high byte first (Compatibility:
+/// SelEntry.TakesTheRecordOutOfItsRow). Arrays of records are handed about as raw memory, hence no
+/// virtual operation.
 class IPMISELEntry {
 public:
     /// Parses row `index`; 0, or kEndOfData when the row is empty.
