@@ -46,7 +46,8 @@ const Kind& FindKind(const std::string& source) {
     for (const Kind& k : kKinds) {
         if (k.open != nullptr) known += (known.empty() ? "" : ", ") + std::string(k.usage);
     }
-    const std::string line = "this build has no source \"" + source + "\"; use one of " + known;
+    const std::string line =
+        "this build has no source \"" + source + "\"; name one of " + known + " with --from";
     if (kind != std::end(kKinds)) throw SourceError(line);
     throw SourceUsageError(line);
 }
