@@ -16,6 +16,7 @@ void AppendBounded(char* destination, unsigned int size, const char* source, std
     const std::size_t count = std::min(strnlen(source, most), size - 1 - used);
     std::memcpy(destination + used, source, count);
     destination[used + count] = '\0';
+    destination[size - 1] = '\0';
 }
 
 /// One conversion of a format that FormatIntegers honours.

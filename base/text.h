@@ -11,8 +11,9 @@
 
 /// Copies at most size - 1 characters, always terminates, and pads a longer buffer with NULs.
 void StringCchCopy(char* destination, unsigned int size, const char* source);
-/// Appends at most `size` characters of the source; the visible text never exceeds size - 1.
-/// The limit counts appended characters, but nothing is written outside destination[0..size).
+/// Appends at most `size` characters of the source; the visible text never exceeds size - 1, and
+/// the last byte is a NUL whatever the length. The limit counts appended characters, but nothing is
+/// written outside destination[0..size).
 void StringCchCat(char* destination, unsigned int size, const char* source);
 /// As StringCchCat, with at most the smaller of `count` and `size` characters appended.
 void StringCchCatN(char* destination, unsigned int size, const char* source, unsigned int count);

@@ -17,10 +17,12 @@ using ::testing::IsEmpty;
 
 namespace {
 
-/// A buffer on the heap, so that the address sanitizer sees a write outside of it.
+/// A buffer on the heap, so that the address sanitizer sees a write outside of it. Behind the NUL
+/// of its content stands '#'.
 struct Buffer {
-    Buffer(unsigned int size, const std::string& content) : bytes(new char[size]()), length(size) {
-        content.copy(bytes.get(), size);
+    Buffer(unsigned int size, const std::string& content) : bytes(new char[size]), length(size) {
+        std::memset(bytes.get(), '#', size);
+        std::string(content.c_str(), content.size() + 1).copy(bytes.get(), size);
     }
     std::string Text() const { return std::string(BoundedView(bytes.get(), length)); }
     std::unique_ptr<char[]> bytes;
@@ -57,7 +59,7 @@ TEST(StringCch, CatStaysInsideTheBuffer) {
         Buffer counted(c.size, c.before);
         StringCchCatN(counted.bytes.get(), c.size, c.source, c.count);
         EXPECT_EQ(counted.Text(), c.after) << c.before << '+' << c.source << ',' << c.count;
-        EXPECT_LT(counted.Text().size(), c.size);
+        EXPECT_EQ(counted.bytes[c.size - 1], '\0');
     }
 }
 
