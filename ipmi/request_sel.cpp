@@ -88,7 +88,8 @@ unsigned IPMIRequestSEL::IPMIGetSELEntry(NQORTQR20::TCPluginCallbacks*, s_SEL_ro
                 if (rowsFilled != nullptr) *rowsFilled = counter + 1;
             }
         }
-        ByteReader reply = Reply();
+        // Stands at its place in the buffer, whatever length the transport reported.
+        ByteReader reply = ReplyBuffer();
         nextRecordId_ = ReadRecordID(&reply);
         // Compatibility: any next ID of 0xFFxx ends the walk, not only 0xFFFF
         // (SelWalk.HighByteFfEndsTheWalk).

@@ -58,6 +58,7 @@ TEST(Bounds, ClaimedLengthsAreBelievedAsFarAsTheBufferReaches) {
         std::memset(row.data, 'x', sizeof row.data);
         IPMIRequestSEL(&library).IPMIGetSELEntry(nullptr, &row, 1);
         EXPECT_EQ(std::strlen(row.data), std::min<std::size_t>(3 * reach + 1, 57)) << length;
+        EXPECT_EQ(gSends, 1U) << "the next record ID stands in the buffer: " << length;
 
         std::vector<s_SDR_entry> entries;
         unsigned char info[kSdrInfoTextLength];
