@@ -165,17 +165,23 @@ Plugin::Plugin(const std::filesystem::path& file) : impl_(std::make_unique<Impl>
         fail("it does not register itself with this host; name a plug-in with --plugin");
     }
 
-    const TTQRStatusCode status = impl_->callbacks->initialise(impl_->context.get());
+    const TTQRStatusCode status =
+        Contained([&] { return impl_->callbacks->initialise(impl_->context.get()); },
+                  TTQRStatusCode{kStatusFailed});
     if (status.code != kStatusOk) {
         fail("it failed to initialise, status " + std::to_string(status.code) + " (" +
              status.TranslateStatusCode() + "); its log lines say more (--log-level trace)");
     }
 }
 
-Plugin::~Plugin() { impl_->callbacks->deinitialise(impl_->context.get()); }
+Plugin::~Plugin() {
+    Contained([&] { return impl_->callbacks->deinitialise(impl_->context.get()); },
+              TTQRStatusCode{kStatusFailed});
+}
 
 PluginInfo Plugin::Info() const {
-    const NQORTQR20::fdrPluginInfo info = impl_->callbacks->getInfo(impl_->context.get());
+    const auto info = Contained([&] { return impl_->callbacks->getInfo(impl_->context.get()); },
+                                NQORTQR20::fdrPluginInfo{});
     const auto text = [](const char* value) { return std::string(value == nullptr ? "" : value); };
     return {text(info.name), text(info.version), text(info.interfaceVersion)};
 }

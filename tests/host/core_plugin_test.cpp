@@ -83,12 +83,16 @@ TEST_F(PluginLoading, PluginThatCannotBeUnloadedIsLoadedAgain) {
     EXPECT_THAT(log, ElementsAre("registered 0, again 3", "de-initialised", "de-initialised"));
 }
 
-TEST_F(PluginLoading, ExceptionOfThePluginIsAFailedCollection) {
+TEST_F(PluginLoading, ExceptionsOfThePluginAreFailures) {
     setenv("TEST_PLUGIN_FAULT", "throw", 1);
-    tqrhost::Plugin plugin(TEST_PLUGIN);
-    ClassNames sink;
-    EXPECT_EQ(plugin.Collect({"A"}, sink).code, kStatusFailed);
-    EXPECT_THAT(log, Contains(HasSubstr("thrown by the plug-in")));
+    {
+        tqrhost::Plugin plugin(TEST_PLUGIN);
+        ClassNames sink;
+        EXPECT_EQ(plugin.Collect({"A"}, sink).code, kStatusFailed);
+        EXPECT_EQ(plugin.Info().name, "");
+    }
+    EXPECT_THAT(log, ElementsAre("registered 0, again 3", HasSubstr("thrown by the plug-in"),
+                                 HasSubstr("thrown"), HasSubstr("thrown")));
 }
 
 TEST_F(PluginLoading, RegistrationIsRefusedAtAnyOtherTime) {
@@ -112,7 +116,8 @@ TEST_F(PluginLoading, FailureSaysInOneLineWhatAndWhatToDo) {
                  {"silent", TEST_PLUGIN, "not register"},
                  {"size", TEST_PLUGIN, "not register"},
                  {"callback", TEST_PLUGIN, "not register"},
-                 {"initialise", TEST_PLUGIN, "status 4 (Out of memory)"}};
+                 {"initialise", TEST_PLUGIN, "status 4 (Out of memory)"},
+                 {"throw at start", TEST_PLUGIN, "status 3"}};
     for (const auto& c : cases) {
         setenv("TEST_PLUGIN_FAULT", c.fault, 1);
         EXPECT_THAT(Failure(c.file), AllOf(HasSubstr(c.file), HasSubstr(c.why), HasSubstr("; "),

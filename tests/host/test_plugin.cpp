@@ -16,17 +16,23 @@ bool Fault(const char* name) {
     return fault != nullptr && std::string(fault) == name;
 }
 
+void MayThrow(const char* fault) {
+    if (Fault(fault)) throw std::runtime_error("thrown by the plug-in");
+}
+
 TTQRStatusCode Initialise(TCPluginCallbacks*) {
+    MayThrow("throw at start");
     return {Fault("initialise") ? kStatusNoMemory : kStatusOk};
 }
 
 TTQRStatusCode DeInitialise(TCPluginCallbacks*) {
+    MayThrow("throw");
     fdrWriteLog(ILogger::kInfo, "de-initialised");
     return {kStatusOk};
 }
 
 TTQRStatusCode GetData(TCPluginCallbacks*, fdriIOHandle* output, const char** names, int count) {
-    if (Fault("throw")) throw std::runtime_error("thrown by the plug-in");
+    MayThrow("throw");
     for (int i = 0; i < count; ++i) {
         fdrGetInstance(output, names[i]);
         fdrAddInstance(output);
@@ -34,7 +40,10 @@ TTQRStatusCode GetData(TCPluginCallbacks*, fdriIOHandle* output, const char** na
     return {kStatusBadTime};
 }
 
-fdrPluginInfo GetInfo(TCPluginCallbacks*) { return {"TEST", "1.2", nullptr, 0, 0}; }
+fdrPluginInfo GetInfo(TCPluginCallbacks*) {
+    MayThrow("throw");
+    return {"TEST", "1.2", nullptr, 0, 0};
+}
 
 struct AtLoad {
     AtLoad() {
