@@ -104,6 +104,8 @@ bool Finish(fdriIOHandle* output, const s_AuxLog_entry& entry) {
         WriteLog(kWarning, "Failed to add array property.");
         return true;
     }
+    // Compatibility: before the instance is added, where the event records have it after
+    // (AuxDebugLog.WritesDebugCodesOfKnownRecords).
     WriteLog(kTrace, "Deleting valArray.");
     array.Delete();
     NQORTQR20::fdrAddInstance(output);

@@ -119,6 +119,8 @@ std::unique_ptr<Object> Create(const char* name, Arguments... arguments) {
 void CreateObjects(Node* node) {
     NodeObjects& objects = node->objects;
     objects.sdr = Create<IPMIRequestSDR>("ipmi_sdrp", node->library);
+    // Compatibility: the log calls both requests by one name
+    // (Pass.ObjectThatCannotBeCreatedEndsThePass).
     objects.sel = Create<IPMIRequestSEL>("ipmi_sdrp", node->library);
     objects.auxLog = Create<IPMIRequestAuxLog>("ipmi_auxlogp", node->library);
     objects.sdrHead = Create<IPMISDREntry>("ipmi_sdr_headp");

@@ -14,15 +14,30 @@ namespace ipmiseltest {
 namespace {
 
 using ::testing::Contains;
+using ::testing::Each;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::Not;
 
 constexpr const char* kAuxClass = "QORSG_ZMCAuxDebugRecord";
 
+/// Keeps the last log line before each instance.
+class LineRecorder : public InstanceRecorder {
+public:
+    explicit LineRecorder(const LogRecorder& log) : log_(log) {}
+    std::vector<std::string> lines;
+    bool CloseInstance() override {
+        lines.push_back(log_.All().back().second);
+        return InstanceRecorder::CloseInstance();
+    }
+
+private:
+    const LogRecorder& log_;
+};
+
 class AuxDebugLog : public BmcTest {
 protected:
-    InstanceRecorder written;
+    LineRecorder written{log};
     std::vector<s_AuxLog_entry> entries;
     std::vector<IPMISELEntry> selEntries;
 
@@ -100,6 +115,7 @@ TEST_F(AuxDebugLog, WritesDebugCodesOfKnownRecords) {
     EXPECT_EQ(TextOf(first, "LogName"), kAuxClass);
     EXPECT_THAT(RawData(first), ElementsAre(0x03, 11, 12, 13));
     EXPECT_THAT(RawData(written.instances[2]), IsEmpty());
+    EXPECT_THAT(written.lines, Each("Deleting valArray."));
     // The first of two records with one ID.
     EXPECT_EQ(Written("MessageTimestamp")[0].substr(0, 14), "20240305092522");
     EXPECT_EQ(Written("MessageTimestamp")[1].substr(0, 14), "20240305092521");

@@ -10,12 +10,15 @@
 #include "tests/support/machine_fixture.h"
 
 namespace {
-std::size_t gRefusedSize = 0;  // allocations of this size fail
+std::size_t gRefusedSize = 0;  // the next allocation of this size fails
 }  // namespace
 
 // Not inlined: the compiler would take the two for a pair that does not match.
 [[gnu::noinline]] void* operator new(std::size_t size) {
-    if (size == gRefusedSize) throw std::bad_alloc();
+    if (size != 0 && size == gRefusedSize) {
+        gRefusedSize = 0;
+        throw std::bad_alloc();
+    }
     if (void* const memory = std::malloc(size == 0 ? 1 : size)) return memory;
     throw std::bad_alloc();
 }
@@ -280,10 +283,10 @@ TEST_F(Pass, ObjectThatCannotBeCreatedEndsThePass) {
     const struct {
         std::size_t size;
         const char* name;
+        int status = 4;
     } cases[] = {
-        {sizeof(IPMIRequestSDR), "ipmi_sdrp"},
-        {sizeof(IPMIRequestSEL), "ipmi_sdrp"},
-        {sizeof(IPMIRequestAuxLog), "ipmi_auxlogp"},
+        {sizeof(IPMIVPDEntry), "fIpmiVpdentryFru", 3}, {sizeof(IPMIRequestSDR), "ipmi_sdrp"},
+        {sizeof(IPMIRequestSEL), "ipmi_sdrp"},         {sizeof(IPMIRequestAuxLog), "ipmi_auxlogp"},
         {sizeof(IPMISDREntry), "ipmi_sdr_headp"},
     };
     Collect({});
@@ -293,8 +296,7 @@ TEST_F(Pass, ObjectThatCannotBeCreatedEndsThePass) {
         const tqrhost::OutputHandle output(written);
         gRefusedSize = c.size;
         const int status = IPMISELGetData(context.get(), output.get(), nullptr, 0).code;
-        gRefusedSize = 0;
-        EXPECT_EQ(status, 4);
+        EXPECT_EQ(status, c.status);
         EXPECT_THAT(log.Lines(0),
                     ElementsAre(std::string("Could not allocate memory for ") + c.name + "."));
         EXPECT_EQ(ipmisel::Module().fIpmiVpdentryFru, nullptr);
