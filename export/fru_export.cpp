@@ -102,15 +102,6 @@ bool ExportLocated(const FruNode& node, IPMIRequestFRULocator* request, IPMIFRUL
 
 // ---- Listed devices -----------------------------------------------------------------------------
 
-/// Reads a device's inventory directly; what was read before a failure counts.
-IPMIFRULocator IPMIGetVPDEntryData(const FruNode& node, IPMIRequestFRULocator* request,
-                                   const VpdDevice& device) {
-    IPMIFRULocator data;
-    data.SetFRUDevIDSlaveAddr(device.fruDevice);
-    request->IPMIGetFRUData(node.context, &data, device.fruDevice == 0);
-    return data;
-}
-
 bool HasData(const IPMIFRULocator& locator) {
     const auto data = DataOf(locator);
     return std::any_of(data.begin(), data.end(), [](std::uint8_t byte) { return byte != 0; });
@@ -146,11 +137,12 @@ bool ExportLocatedFrus(const FruNode& node, IPMIRequestFRULocator* request,
     return any;
 }
 
-void ExportListedFrus(const FruNode& node, IPMIRequestFRULocator* request,
+void ExportListedFrus(const FruNode& node, IPMIRequestVPD* request,
                       std::span<const VpdDevice> devices, IPMIVPDEntry* collector) {
     WriteLog(kInfo, "Using hard-coded VPD info.");
     for (const VpdDevice& device : devices) {
-        const IPMIFRULocator data = IPMIGetVPDEntryData(node, request, device);
+        IPMIFRULocator data;
+        request->IPMIGetVPDEntryData(node.context, device, &data);  // what it has read counts
         const Strings strings = StringsOf(data);
         if (!IsAcceptable(strings) && !(IsToldWithoutStrings(device.name) && HasData(data))) {
             continue;

@@ -6,6 +6,7 @@
 
 #include "inventory/vpd_entry.h"
 #include "ipmi/request_fru_locator.h"
+#include "ipmi/request_vpd.h"
 #include "mapping/machine_families.h"
 #include "records/fru_locator.h"
 #include "tqr/plugin.h"
@@ -37,7 +38,7 @@ bool ExportLocatedFrus(const FruNode& node, IPMIRequestFRULocator* request,
                        std::vector<IPMIFRULocator>* locators, IPMIVPDEntry* collector);
 
 /// The devices that the machine's family is known to have.
-void ExportListedFrus(const FruNode& node, IPMIRequestFRULocator* request,
+void ExportListedFrus(const FruNode& node, IPMIRequestVPD* request,
                       std::span<const VpdDevice> devices, IPMIVPDEntry* collector);
 
 }  // namespace ipmisel

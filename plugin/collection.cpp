@@ -122,6 +122,7 @@ void CreateObjects(Node* node) {
     // Compatibility: the log calls both requests by one name
     // (Pass.ObjectThatCannotBeCreatedEndsThePass).
     objects.sel = Create<IPMIRequestSEL>("ipmi_sdrp", node->library);
+    objects.vpd = Create<IPMIRequestVPD>("ipmi_vpdp", node->library);
     objects.auxLog = Create<IPMIRequestAuxLog>("ipmi_auxlogp", node->library);
     objects.sdrHead = Create<IPMISDREntry>("ipmi_sdr_headp");
     objects.mapping = Create<IPMIMapping>("ipmi_mappingp");

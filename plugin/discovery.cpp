@@ -22,6 +22,7 @@ namespace ipmisel {
 namespace {
 
 enum StructureType : int {
+    kFirmware = 0,
     kOnBoardDevices = 10,
     kOemStrings = 11,
     kIpmiDevice = 38,
@@ -121,6 +122,11 @@ bool HasIpmiDevice(const SmbiosReader& reader, const char** finding) {
     return found;
 }
 
+// Of the firmware structure, from version 2.4 of DSP0134 on.
+constexpr std::size_t kControllerMajorAt = 0x16;
+constexpr std::size_t kControllerMinorAt = 0x17;
+constexpr unsigned char kNoRelease = 0xFF;
+
 /// Compatibility: all three drivers are looked for under one name
 /// (Discovery.DriverProbesTellOfTheOneLibrary).
 bool DriverIsMissing() {
@@ -151,6 +157,23 @@ unsigned DiscoverBMC(TCPluginCallbacks* context) {
 bool DiscoverCPLD() { return ipmisel::AnyStringHas(ipmisel::kOemStrings, "CPLD"); }
 
 bool DiscoverFPGA() { return ipmisel::AnyStringHas(ipmisel::kOemStrings, "FPGA"); }
+
+std::string DiscoverFirmwareRelease(TCPluginCallbacks* context) {
+    using namespace ipmisel;
+    const SmbiosReader reader(context);
+    std::vector<unsigned char> structure(kStructureRoom);
+    int length = static_cast<int>(structure.size());
+    if (!reader.ok() ||
+        NQORTQR20::smBiosGetFirst(reader.handle(), kFirmware, structure.data(), &length) != 0) {
+        return {};
+    }
+    const int end = static_cast<int>(kControllerMinorAt) + 1;
+    if (length < end || structure[kLengthAt] < end) return {};
+    const unsigned char major = structure[kControllerMajorAt];
+    const unsigned char minor = structure[kControllerMinorAt];
+    if (major == kNoRelease || minor == kNoRelease) return {};
+    return Format("%d.%d", major, minor);
+}
 
 bool IPMIselHasTSB2onBoardsmBios() {
     constexpr std::string_view kAdapter = "TSB II";

@@ -15,6 +15,9 @@ unsigned DiscoverBMC(NQORTQR20::TCPluginCallbacks* context);
 /// Whether the OEM strings (type 11) tell of the part.
 bool DiscoverCPLD();
 bool DiscoverFPGA();
+/// "major.minor" of the embedded controller's firmware as the firmware structure (type 0) has it;
+/// empty when it has none.
+std::string DiscoverFirmwareRelease(NQORTQR20::TCPluginCallbacks* context);
 /// Whether the machine names a supervisor adapter among its on-board devices or OEM strings.
 bool IPMIselHasTSB2onBoardsmBios();
 

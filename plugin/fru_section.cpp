@@ -42,7 +42,7 @@ std::vector<PropertyMap> CollectInstances(const Node& node) {
     const bool any = ExportLocatedFrus(fruNode, &request, &locators, &collector);
     WriteLog(kTrace, "Obtained the following FRU Locators.");
     request.printFRUVector(node.context, &locators);
-    if (!any) ExportListedFrus(fruNode, &request, node.vpdDevices, &collector);
+    if (!any) ExportListedFrus(fruNode, node.objects.vpd.get(), node.vpdDevices, &collector);
     return collector.GetFruInstances();
 }
 

@@ -10,6 +10,7 @@
 #include "ipmi/request_aux_log.h"
 #include "ipmi/request_sdr.h"
 #include "ipmi/request_sel.h"
+#include "ipmi/request_vpd.h"
 #include "mapping/ipmi_mapping.h"
 #include "mapping/machine_families.h"
 #include "records/sdr_entry.h"
@@ -43,6 +44,7 @@ private:
 /// released from the last member up.
 struct NodeObjects {
     std::shared_ptr<IPMIRequestAuxLog> auxLog;
+    std::unique_ptr<IPMIRequestVPD> vpd;
     std::unique_ptr<IPMIRequestSEL> sel;
     std::unique_ptr<IPMIRequestSDR> sdr;
     std::unique_ptr<OwnedSDRCache> sdrCache;
@@ -78,6 +80,10 @@ void CollectFpgaFirmware(Node& node);
 void CollectBackplaneFirmware(Node& node);
 
 inline constexpr std::string_view kFruClass = "QORSG_IPMIFRU";
+inline constexpr const char* kBmcFirmwareClass = "QORSG_IPMIFirmwareElement";
+inline constexpr const char* kCpldFirmwareClass = "QORSG_CPLDFirmwareElement";
+inline constexpr const char* kFpgaFirmwareClass = "QORSG_FPGAFirmwareElement";
+inline constexpr const char* kBackplaneFirmwareClass = "QORSG_AMIFirmwareElement";
 
 struct Section {
     std::string_view className;
@@ -87,10 +93,10 @@ inline constexpr Section kSections[] = {
     {"QORSG_IPMILogRecord", CollectLogRecords},
     {"QORSG_ZMCAuxDebugRecord", CollectAuxDebugRecords},
     {kFruClass, CollectFru},
-    {"QORSG_IPMIFirmwareElement", CollectBmcFirmware},
-    {"QORSG_CPLDFirmwareElement", CollectCpldFirmware},
-    {"QORSG_FPGAFirmwareElement", CollectFpgaFirmware},
-    {"QORSG_AMIFirmwareElement", CollectBackplaneFirmware},
+    {kBmcFirmwareClass, CollectBmcFirmware},
+    {kCpldFirmwareClass, CollectCpldFirmware},
+    {kFpgaFirmwareClass, CollectFpgaFirmware},
+    {kBackplaneFirmwareClass, CollectBackplaneFirmware},
 };
 
 }  // namespace ipmisel

@@ -47,9 +47,11 @@ protected:
         });
     }
     Instances Listed(const std::vector<ipmisel::VpdDevice>& devices) {
-        return Run([&](auto* request, auto* collector) {
-            ipmisel::ExportListedFrus(node, request, devices, collector);
-        });
+        NQORTQR20::SPLibrary library(std::make_unique<SimulatedTransport>(bmc, &requests));
+        IPMIRequestVPD request(&library);
+        IPMIVPDEntry collector;
+        ipmisel::ExportListedFrus(node, &request, devices, &collector);
+        return collector.GetFruInstances();
     }
 };
 
