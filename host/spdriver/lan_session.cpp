@@ -29,7 +29,10 @@ constexpr unsigned kMostAskedAgain = 3;
 constexpr std::uint32_t kSequencesAhead = 15;
 constexpr milliseconds kFirstSetupWait{1000};
 constexpr milliseconds kRqSeqQuarantine{10000};
-constexpr unsigned kReadyLimit = 64;
+// Answers to guesses that wait: no more are asked for once there are so many, and those that are
+// out then still find room.
+constexpr unsigned kReadyAhead = 32;
+constexpr unsigned kReadyLimit = 2 * kReadyAhead;
 
 bool IsBusy(std::uint8_t completionCode) {
     return completionCode == 0xC0 || completionCode == 0xC3 || completionCode == 0xCF;
@@ -417,7 +420,7 @@ void LanSession::FillWindow() {
     for (const Ask& ask : readAhead_.Next(size + ready_.size())) {
         if (outstanding_.size() >= size) return;
         if (sequence_ >= acknowledged_ + kSequencesAhead) return;
-        if (ready_.size() >= kReadyLimit) return;
+        if (ready_.size() >= kReadyAhead) return;
         if (ready_.count(ask) != 0) continue;
         const bool isOut =
             std::any_of(outstanding_.begin(), outstanding_.end(),
@@ -538,7 +541,7 @@ std::optional<Response> LanSession::WaitFor(const Ask& ask, Clock::time_point de
 
 void LanSession::DropStaleAnswers() {
     if (ready_.size() < kReadyLimit) return;
-    const std::vector<Ask> coming = readAhead_.Next(kReadyLimit / 2);
+    const std::vector<Ask> coming = readAhead_.Next(kReadyLimit);
     std::erase_if(ready_, [&coming](const auto& entry) {
         return std::find(coming.begin(), coming.end(), entry.first) == coming.end();
     });
