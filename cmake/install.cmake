@@ -1,6 +1,7 @@
 # What `cmake --install` puts where. The program finds its libraries and the plug-in from its own
 # place, so that the whole may go under any prefix and be moved afterwards.
-set_target_properties(tqrcore spdriver smbios PROPERTIES INSTALL_RPATH "\$ORIGIN")
+set_target_properties(tqrcore spdriver smbios PROPERTIES BUILD_WITH_INSTALL_RPATH ON
+                                                         INSTALL_RPATH "\$ORIGIN")
 
 install(TARGETS ipmisel RUNTIME DESTINATION bin)
 install(TARGETS tqrcore spdriver smbios LIBRARY DESTINATION lib)

@@ -1,5 +1,6 @@
 #include "collector/json_text.h"
 
+#include <algorithm>
 #include <type_traits>
 #include <variant>
 
@@ -16,9 +17,22 @@ std::string Escaped(char32_t c) {
     return Format("\\u%04x\\u%04x", 0xD800 + (rest >> 10), 0xDC00 + (rest & 0x3FF));
 }
 
+/// The length of what stands as it is and is nothing but ASCII, as nearly every text.
+std::size_t PlainLength(std::string_view text) {
+    const auto* const end = std::find_if(text.begin(), text.end(), [](char c) {
+        return c < ' ' || c > '~' || c == '"' ||
+               c == '\\';  // a byte beyond ASCII is below or above
+    });
+    return static_cast<std::size_t>(end - text.begin());
+}
+
 void AppendText(std::string& out, std::string_view text) {
     out += '"';
-    while (!text.empty()) {
+    while (true) {
+        const std::size_t plain = PlainLength(text);
+        out += text.substr(0, plain);
+        text.remove_prefix(plain);
+        if (text.empty()) break;
         const Character character = FirstCharacter(text);
         if (!character.valid) {
             out += "\uFFFD";

@@ -1,11 +1,10 @@
 #include "mapping/numbered_texts.h"
 
 #include <fcntl.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
+#include <array>
 #include <cerrno>
-#include <span>
 #include <utility>
 
 #include "base/log.h"
@@ -16,35 +15,39 @@ namespace {
 
 // A longer line is read in pieces, each a line of its own.
 constexpr std::size_t kLongestPiece = 511;
-constexpr off_t kLargestFile = 16 << 20;  // far beyond any real one
 
-/// Reads until the span is full or the file ends; the number of bytes read.
-std::size_t ReadAll(int file, std::span<char> room) {
-    std::size_t have = 0;
-    while (have < room.size()) {
-        const ssize_t count = read(file, room.data() + have, room.size() - have);
-        if (count < 0 && errno == EINTR) continue;
-        if (count <= 0) break;
-        have += static_cast<std::size_t>(count);
+/// A small text file, read whole; larger ones are none of ours.
+class TextFile {
+public:
+    explicit TextFile(const std::string& path) {
+        // Not blocking: a pipe in the file's place must not hold the collection up.
+        const int file = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+        if (file < 0) return;
+        read_ = ReadAll(file);
+        close(file);
     }
-    return have;
-}
+    /// Nothing when the file cannot be read or is too large.
+    std::optional<std::string_view> Contents() const {
+        if (!read_) return std::nullopt;
+        return std::string_view(room_.data(), have_);
+    }
 
-/// Nothing when the file cannot be opened or is no plain file of a sensible size.
-std::optional<std::string> ReadTextFile(const std::string& path) {
-    // Not blocking: a pipe in the file's place must not hold the collection up.
-    const int file = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
-    if (file < 0) return std::nullopt;
-    std::optional<std::string> contents;
-    struct stat facts {};
-    if (fstat(file, &facts) == 0 && S_ISREG(facts.st_mode) && facts.st_size <= kLargestFile) {
-        std::string text(static_cast<std::size_t>(facts.st_size), '\0');
-        text.resize(ReadAll(file, text));
-        contents = std::move(text);
+private:
+    bool ReadAll(int file) {
+        ssize_t count = 0;
+        do {
+            count = read(file, room_.data(), room_.size());
+        } while (count < 0 && errno == EINTR);
+        if (count < 0) return false;
+        have_ = static_cast<std::size_t>(count);  // all of it: only its end cuts a plain file short
+        return have_ < room_.size();
     }
-    close(file);
-    return contents;
-}
+
+    // Not set to zero: every text of every record comes through here.
+    std::array<char, 1 << 17> room_;
+    std::size_t have_ = 0;
+    bool read_ = false;
+};
 
 /// The first piece that shows `key`. A NUL hides the rest of its piece.
 std::string_view FindPiece(std::string_view contents, std::string_view key) {
@@ -104,7 +107,8 @@ std::optional<std::string> NumberedText(NQORTQR20::TCPluginCallbacks* context, i
     path.replace(name, std::string::npos, "ipmisel.INI");
     if (LogEnabled(kInfo)) WriteLog(kInfo, "Path found for ipmisel INI file: " + path);
 
-    const std::optional<std::string> contents = ReadTextFile(path);
+    const TextFile file(path);
+    const std::optional<std::string_view> contents = file.Contents();
     if (!contents) {
         WriteLog(kWarning, Format("Could not open file %s. Did not obtain string #%d\n",
                                   path.c_str(), number));

@@ -554,8 +554,11 @@ std::optional<Response> LanSession::Exchange(const Ask& ask) {
     if (const auto ready = ready_.find(ask); ready != ready_.end()) {
         Response response = std::move(ready->second);
         ready_.erase(ready);
-        Receive();
-        FillWindow();
+        // While there is plenty, the socket can wait: packets come and go by the handful.
+        if (ready_.size() < kReadyAhead / 2) {
+            Receive();
+            FillWindow();
+        }
         return response;
     }
     const auto deadline = std::min(Clock::now() + options_.timeout, StopTime());
