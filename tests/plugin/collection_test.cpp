@@ -6,17 +6,19 @@
 #include "ipmi/request_aux_log.h"
 #include "ipmi/request_sdr.h"
 #include "ipmi/request_sel.h"
+#include "ipmi/request_vpd.h"
 #include "records/sdr_entry.h"
 #include "tests/support/machine_fixture.h"
 
 namespace {
-std::size_t gRefusedSize = 0;  // the next allocation of this size fails
+int gRefusals = 0;  // so many allocations fail that have gRefusedSize
+std::size_t gRefusedSize = 0;
 }  // namespace
 
 // Not inlined: the compiler would take the two for a pair that does not match.
 [[gnu::noinline]] void* operator new(std::size_t size) {
-    if (size != 0 && size == gRefusedSize) {
-        gRefusedSize = 0;
+    if (gRefusals > 0 && size == gRefusedSize) {
+        --gRefusals;
         throw std::bad_alloc();
     }
     if (void* const memory = std::malloc(size == 0 ? 1 : size)) return memory;
@@ -50,7 +52,7 @@ protected:
         nodes[0].sdrRecords = {FullSensor(1, 0x30, 0x07, 1, "Ambient"),
                                FullSensor(2, 0x31, 0x03, 2, "CPU 2")};
     }
-    ~Pass() override { gRefusedSize = 0; }
+    ~Pass() override { gRefusals = 0; }
 
     /// Of the lines of this pass those that are in `wanted`, in the order in which they came.
     std::vector<std::string> Order(const std::vector<std::string>& wanted) const {
@@ -284,9 +286,13 @@ TEST_F(Pass, ObjectThatCannotBeCreatedEndsThePass) {
         std::size_t size;
         const char* name;
         int status = 4;
+        int refusals = 100;
     } cases[] = {
-        {sizeof(IPMIVPDEntry), "fIpmiVpdentryFru", 3}, {sizeof(IPMIRequestSDR), "ipmi_sdrp"},
-        {sizeof(IPMIRequestSEL), "ipmi_sdrp"},         {sizeof(IPMIRequestAuxLog), "ipmi_auxlogp"},
+        {sizeof(IPMIVPDEntry), "fIpmiVpdentryFru", 3, 1},  // its line may have that size, too
+        {sizeof(IPMIRequestSDR), "ipmi_sdrp"},
+        {sizeof(IPMIRequestSEL), "ipmi_sdrp"},
+        {sizeof(IPMIRequestVPD), "ipmi_vpdp"},
+        {sizeof(IPMIRequestAuxLog), "ipmi_auxlogp"},
         {sizeof(IPMISDREntry), "ipmi_sdr_headp"},
     };
     Collect({});
@@ -295,7 +301,9 @@ TEST_F(Pass, ObjectThatCannotBeCreatedEndsThePass) {
         log.Clear();
         const tqrhost::OutputHandle output(written);
         gRefusedSize = c.size;
+        gRefusals = c.refusals;
         const int status = IPMISELGetData(context.get(), output.get(), nullptr, 0).code;
+        gRefusals = 0;
         EXPECT_EQ(status, c.status);
         EXPECT_THAT(log.Lines(0),
                     ElementsAre(std::string("Could not allocate memory for ") + c.name + "."));
