@@ -176,11 +176,16 @@ private:
 
     void PrintProperties(const tqrhost::Instance& instance) {
         for (const auto& [name, value] : instance.properties) {
+            const std::string shown = ValueText(value);
+            // The heading says the class; what has no value says nothing.
+            if (name == "CreationClassName" || shown.find_first_not_of(' ') == std::string::npos) {
+                continue;
+            }
             const std::string label = TerminalText(name) + ":";
             const std::size_t width = std::clamp(Columns(label), kNameWidth, kWidth / 2);
             std::string lead = "  " + Fit(label, width) + " ";
             const std::size_t indent = Columns(lead);
-            for (const std::string& line : Wrap(TerminalText(ValueText(value)), kWidth - indent)) {
+            for (const std::string& line : Wrap(TerminalText(shown), kWidth - indent)) {
                 PrintLine(lead + line);
                 lead.assign(indent, ' ');
             }
