@@ -1,14 +1,6 @@
 #include "export/aux_debug_export.h"
 
-#include <numeric>
-#include <string>
-#include <vector>
-
-#include "base/bytes.h"
-#include "host/core/host.h"
-#include "tests/export/refusing_host.h"
-#include "tests/support/bmc_fixture.h"
-#include "tests/support/wire.h"
+#include "tests/export/export_fixture.h"
 
 namespace ipmiseltest {
 namespace {
@@ -35,57 +27,29 @@ private:
     const LogRecorder& log_;
 };
 
-class AuxDebugLog : public BmcTest {
+class AuxDebugLog : public ExportTest {
 protected:
     LineRecorder written{log};
-    std::vector<s_AuxLog_entry> entries;
-    std::vector<IPMISELEntry> selEntries;
-
-    ~AuxDebugLog() override { gNoArrays = false; }
+    std::vector<s_AuxLog_entry> auxEntries;
 
     /// `seconds` is the time of the record.
     void AddSel(std::uint16_t id, std::uint8_t seconds = 0) {
         SelRecord record = SystemEvent(id, 0x01, 0x30);
         record[3] = seconds;
-        s_SEL_row row{};
-        ("00 FF FF " + ipmisel::DumpBytes(record, ipmisel::Digits::kUpperHex))
-            .copy(row.data, sizeof row.data - 1);
-        ASSERT_EQ(selEntries.emplace_back().ScanSELDataFile(nullptr, &row, 0), 0U);
+        ExportTest::Add(record);
     }
     /// An entry of the type whose data counts up from there.
     void Add(std::uint16_t selId, std::uint8_t type = 0x03, std::uint16_t recordSize = 4) {
-        s_AuxLog_entry entry{};
-        std::iota(std::begin(entry.bytes), std::end(entry.bytes), std::uint8_t{0});
-        entry.bytes[0] = 0x4D;
-        entry.bytes[1] = 0x4F;
-        entry.bytes[2] = 0x00;
-        entry.bytes[3] = static_cast<std::uint8_t>(recordSize);
-        entry.bytes[4] = static_cast<std::uint8_t>(recordSize >> 8);
-        entry.bytes[5] = static_cast<std::uint8_t>(selId);
-        entry.bytes[6] = static_cast<std::uint8_t>(selId >> 8);
-        entry.bytes[10] = type;
-        entries.push_back(entry);
+        auxEntries.push_back(AuxEntry(selId, recordSize));
+        auxEntries.back().bytes[10] = type;
     }
     unsigned Export() {
         log.Clear();
         const tqrhost::OutputHandle output(written);
-        return ExportAuxDebugLog(1, nullptr, output.get(), entries.data(),
-                                 static_cast<unsigned>(entries.size()), selEntries.data(),
-                                 static_cast<unsigned>(selEntries.size()), &mapping_, Library());
+        return ExportAuxDebugLog(1, nullptr, output.get(), auxEntries.data(),
+                                 static_cast<unsigned>(auxEntries.size()), entries.data(),
+                                 static_cast<unsigned>(entries.size()), &mapping, Library());
     }
-    std::vector<std::string> Written(std::string_view property) const {
-        std::vector<std::string> values;
-        for (const auto& instance : written.instances) {
-            values.push_back(TextOf(instance, property).value_or("(none)"));
-        }
-        return values;
-    }
-    static std::vector<std::uint8_t> RawData(const tqrhost::Instance& instance) {
-        return std::get<std::vector<std::uint8_t>>(instance.properties.back().second);
-    }
-
-private:
-    IPMIMapping mapping_;
 };
 
 TEST_F(AuxDebugLog, WritesDebugCodesOfKnownRecords) {
@@ -96,20 +60,18 @@ TEST_F(AuxDebugLog, WritesDebugCodesOfKnownRecords) {
     Add(0x0304, 0x01);
     Add(0x0999);
     Add(0x0102);
-    entries.push_back({});
+    auxEntries.push_back({});
     Add(0x0102, 0x03, 0);
     Add(0x0102);
-    entries.back().bytes[2] = 0x01;  // signature
+    auxEntries.back().bytes[2] = 0x01;  // signature
     EXPECT_EQ(Export(), 0U);
 
-    EXPECT_THAT(Written("RecordID"), ElementsAre("0", "3", "5"));
+    EXPECT_THAT(written.Texts("RecordID"), ElementsAre("0", "3", "5"));
     ASSERT_EQ(written.instances.size(), 3U);
     const tqrhost::Instance& first = written.instances[0];
     EXPECT_EQ(first.className, kAuxClass);
-    std::vector<std::string> names;
-    for (const auto& property : first.properties) names.push_back(property.first);
-    EXPECT_THAT(names, ElementsAre("MessageTimestamp", "CreationClassName", "LogCreationClassName",
-                                   "LogName", "RecordID", "RawData"));
+    EXPECT_EQ(Names(first),
+              "MessageTimestamp CreationClassName LogCreationClassName LogName RecordID RawData ");
     EXPECT_EQ(TextOf(first, "CreationClassName"), kAuxClass);
     EXPECT_EQ(TextOf(first, "LogCreationClassName"), kAuxClass);
     EXPECT_EQ(TextOf(first, "LogName"), kAuxClass);
@@ -117,8 +79,8 @@ TEST_F(AuxDebugLog, WritesDebugCodesOfKnownRecords) {
     EXPECT_THAT(RawData(written.instances[2]), IsEmpty());
     EXPECT_THAT(written.lines, Each("Deleting valArray."));
     // The first of two records with one ID.
-    EXPECT_EQ(Written("MessageTimestamp")[0].substr(0, 14), "20240305092522");
-    EXPECT_EQ(Written("MessageTimestamp")[1].substr(0, 14), "20240305092521");
+    EXPECT_EQ(written.Texts("MessageTimestamp")[0].substr(0, 14), "20240305092522");
+    EXPECT_EQ(written.Texts("MessageTimestamp")[1].substr(0, 14), "20240305092521");
 
     EXPECT_THAT(log.Lines(1), ElementsAre("Found corresponding SEL Record Entry.",
                                           "No corresponding SEL Record found.",

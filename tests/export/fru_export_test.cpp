@@ -24,8 +24,7 @@ protected:
     template <typename Export>
     Instances Run(Export run) {
         log.Clear();
-        NQORTQR20::SPLibrary library(std::make_unique<SimulatedTransport>(bmc, &requests));
-        IPMIRequestFRULocator request(&library);
+        IPMIRequestFRULocator request(FreshLibrary());
         IPMIVPDEntry collector;
         run(&request, &collector);
         return collector.GetFruInstances();

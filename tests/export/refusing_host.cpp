@@ -1,7 +1,6 @@
-#include "tests/export/refusing_host.h"
-
 #include <dlfcn.h>
 
+#include "tests/export/export_fixture.h"
 #include "tqr/plugin.h"
 
 bool ipmiseltest::gNoArrays = false;

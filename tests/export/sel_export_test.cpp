@@ -4,12 +4,9 @@
 #include <string>
 #include <vector>
 
-#include "base/bytes.h"
 #include "base/log.h"
-#include "host/core/host.h"
-#include "tests/export/refusing_host.h"
-#include "tests/support/bmc_fixture.h"
-#include "tests/support/wire.h"
+#include "export/event_message.h"
+#include "tests/export/export_fixture.h"
 
 namespace ipmiseltest {
 namespace {
@@ -21,36 +18,12 @@ using ::testing::Not;
 
 constexpr const char* kNoTime = "19700101000000.000000+000";
 
-/// Refuses the first write of one property.
-class RefusingOnce : public InstanceRecorder {
-public:
-    std::string refusedOnce;
-    bool AddProperty(std::string_view name, const tqrhost::PropertyValue& value) override {
-        if (name == refusedOnce) {
-            refusedOnce.clear();
-            return false;
-        }
-        return InstanceRecorder::AddProperty(name, value);
-    }
-};
-
-class SelExport : public BmcTest {
+class SelExport : public ExportTest {
 protected:
-    RefusingOnce written;
-    std::vector<IPMISELEntry> entries;
     std::vector<IPMIExtendedSELDataEntry> extended;
-
-    ~SelExport() override { gNoArrays = false; }
 
     static SelRecord Record(std::uint16_t id, std::uint8_t type) {
         return type == 0x02 ? SystemEvent(id, 0x01, 0x30) : OtherRecord(id, type);
-    }
-    void Add(const SelRecord& record) {
-        const std::string text =
-            "00 FF FF " + ipmisel::DumpBytes(record, ipmisel::Digits::kUpperHex);
-        s_SEL_row row{};
-        text.copy(row.data, sizeof row.data - 1);
-        ASSERT_EQ(entries.emplace_back().ScanSELDataFile(context_.get(), &row, 0), 0U);
     }
     void AddSensor(std::uint8_t number, std::uint8_t entity, std::uint8_t instance,
                    const std::string& name) {
@@ -68,22 +41,12 @@ protected:
     unsigned Export(int node = 0, int recordIdOffset = 0) {
         const tqrhost::OutputHandle output(written);
         log.Clear();
-        return ExportSEL(node, context_.get(), output.get(), nullptr, &mapping_, nullptr, &cache_,
+        return ExportSEL(node, context.get(), output.get(), nullptr, &mapping, nullptr, &cache_,
                          entries.data(), static_cast<unsigned>(entries.size()), recordIdOffset,
                          extended, Library());
     }
-    static std::string Names(const tqrhost::Instance& instance) {
-        std::string names;
-        for (const auto& property : instance.properties) names += property.first + " ";
-        return names;
-    }
-    std::string Text(std::size_t instance, std::string_view property) {
-        return TextOf(written.instances.at(instance), property).value_or("(none)");
-    }
 
 private:
-    tqrhost::PluginContext context_{IPMISEL_TEXTS};
-    IPMIMapping mapping_;
     std::vector<std::unique_ptr<IPMISDREntry>> sensors_;
     SDRCache cache_;
 };
@@ -124,8 +87,7 @@ TEST_F(SelExport, WritesThePropertiesOfEachRecordTypeInOrder) {
         EXPECT_EQ(Text(i, "AuxLog"), "No Extended Data");
         EXPECT_EQ(Text(i, "MessageTimestamp") != kNoTime, cases[i].hasTime);
         const SelRecord record = Record(0x0105, cases[i].type);
-        EXPECT_EQ(std::get<std::vector<std::uint8_t>>(instance.properties.back().second),
-                  std::vector<std::uint8_t>(record.begin(), record.end()));
+        EXPECT_EQ(RawData(instance), std::vector<std::uint8_t>(record.begin(), record.end()));
     }
     EXPECT_THAT(log.Lines(ipmisel::kWarning), IsEmpty());
 }
@@ -134,12 +96,16 @@ TEST_F(SelExport, EntityNamesAboveTheNumberedOnesReachOnlyTheMessage) {
     AddSensor(0x31, 0x2C, 3, "Ambient");
     AddSensor(0x32, 0x35, 3, "Ambient");
     AddSensor(0x33, 0x0A, 1, "VRM 1");
+    AddSensor(0x35, 0x28, 1, "A");
+    AddSensor(0x36, 0x29, 1, "A");
     Add(SystemEvent(1, 0x01, 0x31));
     Add(SystemEvent(2, 0x01, 0x32, 0x81));
     Add(SystemEvent(3, 0x08, 0x33));
     Add(SystemEvent(4, 0x04, 0x34));
+    Add(SystemEvent(5, 0x04, 0x35));
+    Add(SystemEvent(6, 0x04, 0x36));
     Export();
-    ASSERT_EQ(written.instances.size(), 4U);
+    ASSERT_EQ(written.instances.size(), 6U);
     const struct {
         const char* entity;
         const char* instance;
@@ -152,6 +118,8 @@ TEST_F(SelExport, EntityNamesAboveTheNumberedOnesReachOnlyTheMessage) {
         {"Power supply", "1", "Power Supply", "VRM 1",
          "Power supply 1 (Voltage Regulator Module - VRM 1): Assertion: "},
         {"", "", "Fan", "", "  (Fan - ): Assertion: "},  // no such sensor
+        {"Battery", "1", "Fan", "A", "Battery 1 (Fan - A): Assertion: "},
+        {"", "1", "Fan", "A", "Processing blade 1 (Fan - A): Assertion: "},
     };
     for (std::size_t i = 0; i < std::size(cases); ++i) {
         EXPECT_EQ(Text(i, "Entity"), cases[i].entity);
@@ -162,6 +130,35 @@ TEST_F(SelExport, EntityNamesAboveTheNumberedOnesReachOnlyTheMessage) {
     }
 }
 
+TEST(EventMessage, RewritesSomeNames) {
+    // Entity, instance, sensor type, sensor, deassertion, event.
+    const struct {
+        ipmisel::EventMessage parts;
+        const char* message;
+    } cases[] = {
+        {{"Processor", "2", "Temperature", "CPU 2 Temp", false, "Too hot. "},
+         "Processor 2 (Temperature - CPU 2 Temp): Assertion: Too hot. "},
+        {{"Processor", "2", "Temperature", "CPU 2 Temp", true, "Too hot. "},
+         "Processor 2 (Temperature - CPU 2 Temp): Deassertion: Too hot. "},
+        {{"", "", "Fan", "", false, ""}, "  (Fan - ): Assertion: "},
+        // The instance goes with memory, one blank more stays.
+        {{"Memory Device", "32", "Memory", "DIMM 3", false, "ECC. "},
+         "Memory Device  (Memory - DIMM 3): Assertion: ECC. "},
+        {{"Power Unit", "1", "Power Supply", "VRM 1", false, ""},
+         "Power Unit 1 (Voltage Regulator Module - VRM 1): Assertion: "},
+        {{"Power Unit", "1", "Voltage", "VRM 1", false, ""},
+         "Power Unit 1 (Voltage - VRM 1): Assertion: "},
+        {{"Unknown", "1", "Fan", "HSDC Fan", false, ""},
+         "HS IO Expansion 1 (Fan - HSDC Fan): Assertion: "},
+        {{"Unknown", "1", "Fan", "Fan 7", false, ""}, "Fan 7 1 (Fan - Fan 7): Assertion: "},
+        {{"Cannot tell", "1", "Fan", "Fan 7", false, ""}, "Fan 7 1 (Fan - Fan 7): Assertion: "},
+        // The first occurrence alone, and not the blank beside it.
+        {{"Board", "1", "Unknown Sensor Unknown", "X", false, ""},
+         "Board 1 ( Sensor Unknown - X): Assertion: "},
+    };
+    for (const auto& c : cases) EXPECT_EQ(Compose(c.parts), c.message);
+}
+
 TEST_F(SelExport, UnknownTypeIsLoggedWithItsIdSwapped) {
     Add(Record(0x0102, 0x7F));
     Export();
@@ -169,6 +166,11 @@ TEST_F(SelExport, UnknownTypeIsLoggedWithItsIdSwapped) {
               "Unknown log type. Raw Data:\n02 01 7f 11 12 13 14 15 16 17 18 19 1a 1b 1c 1d");
     EXPECT_THAT(log.Lines(ipmisel::kTrace),
                 Contains("This SEL entry (ID 513) has an unknown type (0x7f).\n"));
+    written.refusedProperty = "Message";  // which it can do without
+    EXPECT_EQ(Export(), 0U);
+    ASSERT_EQ(written.instances.size(), 2U);
+    EXPECT_THAT(log.Lines(ipmisel::kWarning), IsEmpty());
+    EXPECT_THAT(log.Lines(ipmisel::kTrace), Contains("No Raw Data Message."));
 }
 
 TEST_F(SelExport, OffsetCountsForTheExtendedEntryToo) {
@@ -211,21 +213,12 @@ TEST_F(SelExport, RefusedPropertyAbandonsThatRecordOnly) {
         written.instances.clear();
         Add(Record(1, c.type));
         Add(Record(2, 0x02));
-        written.refusedOnce = c.property;
+        written.refusedProperty = c.property;
         EXPECT_EQ(Export(), 0U);
         EXPECT_THAT(log.Lines(ipmisel::kWarning), ElementsAre(c.line));
         ASSERT_EQ(written.instances.size(), 1U) << c.property;
         EXPECT_EQ(Text(0, "RecordID"), "2");
     }
-}
-
-TEST_F(SelExport, UnknownTypeCanDoWithoutItsMessage) {
-    Add(Record(1, 0x7F));
-    written.refusedOnce = "Message";
-    EXPECT_EQ(Export(), 0U);
-    ASSERT_EQ(written.instances.size(), 1U);
-    EXPECT_THAT(log.Lines(ipmisel::kWarning), IsEmpty());
-    EXPECT_THAT(log.Lines(ipmisel::kTrace), Contains("No Raw Data Message."));
 }
 
 TEST_F(SelExport, WithoutAValueArrayTheExportEnds) {

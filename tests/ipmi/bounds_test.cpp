@@ -93,14 +93,12 @@ TEST(Bounds, RoomThatIsToldTheTransport) {
     gLength = 312;
     IPMIRequestFRULocator fru(&library);
     IPMIFRULocator locator;
-    for (int use = 0; use < 2; ++use) {
-        fru.IPMIReserveSDR(nullptr);
-        EXPECT_EQ(gToldLength, 312);
-        fru.IPMIGetSDRString(nullptr, &locator);
-        EXPECT_EQ(gToldLength, 312);
-        fru.IPMIGetFRUData(nullptr, &locator, true);
-        EXPECT_EQ(gToldLength, 312);
-    }
+    fru.IPMIReserveSDR(nullptr);
+    EXPECT_EQ(gToldLength, 312);
+    fru.IPMIGetSDRString(nullptr, &locator);
+    EXPECT_EQ(gToldLength, 312);
+    fru.IPMIGetFRUData(nullptr, &locator, true);
+    EXPECT_EQ(gToldLength, 312);
     IPMIRequestSDR(&library).IPMIReserveSDR(nullptr);
     EXPECT_EQ(gToldLength, 256);
 }

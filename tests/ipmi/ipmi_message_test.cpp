@@ -16,22 +16,20 @@ using ::testing::ElementsAre;
 using ::testing::Pair;
 
 TEST(CompletionCodes, HaveTheirTexts) {
-    const std::pair<int, const char*> cases[] = {
-        {0x80, "Unknown error\n"},
-        {0xBF, "Unknown error\n"},
-        {0xC0, "Node Busy."},
-        {0xC5, "Reservation Canceled or Invalid Reservation ID."},
-        {0xC7, "Request data length"},
-        {0xD4, "Cannot execute command. Insufficient privilege level."},
-        {0xD3, "Destination unavailable."},
-        {0xD6, "Unknown error\n"},
-        {0xFF, "Unknown error\n"},
+    const std::tuple<int, bool, const char*> cases[] = {
+        {0x80, true, "Unknown error\n"},
+        {0x81, true, "Cannot execute command, SEL erase in progress.\n"},
+        {0x81, false, "Unknown error\n"},
+        {0xBF, true, "Unknown error\n"},
+        {0xC0, true, "Node Busy."},
+        {0xC7, true, "Request data length"},
+        {0xD4, true, "Cannot execute command. Insufficient privilege level."},
+        {0xD6, true, "Unknown error\n"},
+        {0xFF, true, "Unknown error\n"},
     };
-    for (const auto& [code, text] : cases) {
-        EXPECT_EQ(CompletionCodeText(static_cast<std::uint8_t>(code), true), text) << code;
+    for (const auto& [code, eraseTextToo, text] : cases) {
+        EXPECT_EQ(CompletionCodeText(static_cast<std::uint8_t>(code), eraseTextToo), text) << code;
     }
-    EXPECT_EQ(CompletionCodeText(0x81, true), "Cannot execute command, SEL erase in progress.\n");
-    EXPECT_EQ(CompletionCodeText(0x81, false), "Unknown error\n");
     EXPECT_EQ(IPMIMessage::GetNetFnLun(0x0A, 0x07), 0x2B);
 }
 
@@ -49,17 +47,10 @@ protected:
 };
 
 TEST_F(Exchange, SelInfoInFull) {
-    ipmisim::Fault answer;
-    answer.netFn = 0x0A;
-    answer.command = 0x40;
-    answer.kind = ipmisim::Fault::Kind::kData;
-    answer.data = {0x51, 0x34, 0x12, 0xEE};
-    bmc.faults = {answer};
+    bmc.faults = {ipmiseltest::Answer(0x40, 1, {0x51, 0x34, 0x12, 0xEE})};
     EXPECT_EQ(SelInfo(), kOk);
     EXPECT_EQ(count, 4660U);
-    ASSERT_EQ(requests.size(), 1U);
-    EXPECT_EQ(DumpBytes(requests[0], Digits::kUpperHex),
-              "01 20 0A 00 40 00 00 00 00 00 00 00 00 00 00 ");
+    EXPECT_THAT(Frames(), ElementsAre("01 20 0A 00 40 00 00 00 00 00 00 00 00 00 00 "));
     EXPECT_THAT(log.All(), ElementsAre(Pair(4, "IPMIRequestSEL::IPMIGetSELInfo() entered."),
                                        Pair(4,
                                             "Contents of buffer to send (rspBuf):\n\t1 32 10 0 64 "
@@ -144,6 +135,39 @@ TEST_F(Exchange, EveryCommandReportsNoAnswerAndCompletionCodes) {
     }
     EXPECT_EQ(count, 0U) << "of the auxiliary log, whose operation clears it first";
     EXPECT_EQ(difference.ToString(), NQORTQR20::TCIMDateTime().ToString());
+}
+
+TEST_F(Exchange, DiffTimeComparesTheClocks) {
+    const ipmiseltest::Machine now("", "20240305120304.000000+060");
+    const struct {
+        std::uint32_t raw;
+        const char* bmcTime;
+        const char* difference;
+        bool notBehind;
+    } cases[] = {{1709640184, "20240305120304.000000+060", "00000000000000.000000:000", true},
+                 {1709640185, "20240305120305.000000+060", "00000000000001.000000:000", true},
+                 {1709640123, "20240305120203.000000+060", "00000000000101.000000:000", false},
+                 {0xFFFFFFFF, "19691231235959.000000+060", "00019787120305.000000:000", false}};
+    for (const auto& c : cases) {
+        bmc.selTime = c.raw;
+        notBehind = !c.notBehind;
+        log.Clear();
+        EXPECT_EQ(GetDiffTime(nullptr, &difference, &notBehind, FreshLibrary()), kOk);
+        EXPECT_EQ(difference.ToString(), c.difference);
+        EXPECT_EQ(notBehind, c.notBehind);
+        EXPECT_THAT(
+            log.Lines(kTrace),
+            ElementsAre("GetDiffTime entered.",
+                        "Contents of buffer to send (rspBuf):\n\t1 32 10 0 72 "
+                        "\n\t0 0 0 0 0 \n\t0 0 0 0 0 ",
+                        "OSTime  = 20240305120304.000000+060",
+                        "BMCTime raw = " + std::to_string(static_cast<int>(c.raw)),
+                        std::string("BMCTime = ") + c.bmcTime,
+                        std::string("DiffTime = ") + c.difference, "GetDiffTime completed."));
+    }
+    EXPECT_EQ(GetDiffTime(nullptr, nullptr, nullptr, nullptr), kFailed);
+    EXPECT_THAT(log.Lines(kError),
+                ElementsAre("Could not allocate memory for SPLibrary in DiffTime."));
 }
 
 TEST(DebugFiles, OpenAndClose) {

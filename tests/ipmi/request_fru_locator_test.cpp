@@ -4,6 +4,7 @@
 #include <numeric>
 
 #include "tests/support/bmc_fixture.h"
+#include "tests/support/wire.h"
 
 namespace {
 
@@ -12,48 +13,37 @@ using ::testing::Contains;
 using ::testing::ElementsAre;
 
 constexpr std::uint8_t kGetSdr = 0x23;
-constexpr std::uint8_t kReadFruData = 0x11;
 
-class FruTest : public ipmiseltest::BmcTest {
+class FruWalk : public ipmiseltest::BmcTest {
 protected:
     std::vector<IPMIFRULocator> locators;
-    IPMIFRULocator locator;
 
-    /// A way to the BMC as it is described now.
-    std::unique_ptr<NQORTQR20::SPLibrary> Fresh() {
-        return std::make_unique<NQORTQR20::SPLibrary>(
-            std::make_unique<ipmiseltest::SimulatedTransport>(bmc, &requests));
+    /// A record whose byte i is i, but for what is given.
+    void AddRecord(std::uint16_t id, std::uint8_t device, const std::string& idString,
+                   std::uint8_t typeLength, std::uint8_t type = 0x11) {
+        ipmisim::Bytes record{ipmiseltest::Low(id),
+                              ipmiseltest::High(id),
+                              2,
+                              type,
+                              4,
+                              5,
+                              device,
+                              7,
+                              8,
+                              9,
+                              10,
+                              11,
+                              12,
+                              13,
+                              14,
+                              typeLength};
+        record.insert(record.end(), idString.begin(), idString.end());
+        bmc.sdrRecords.push_back(record);
     }
     unsigned Walk() {
         locators.clear();
         log.Clear();
-        return IPMIRequestFRULocator(Fresh().get()).IPMIGetSDREntry(nullptr, &locators);
-    }
-    unsigned Read(bool deviceZero = false) {
-        log.Clear();
-        return IPMIRequestFRULocator(Fresh().get()).IPMIGetFRUData(nullptr, &locator, deviceZero);
-    }
-    std::vector<std::string> Frames() const {
-        std::vector<std::string> frames;
-        for (const auto& frame : requests) frames.push_back(DumpBytes(frame, Digits::kUpperHex));
-        return frames;
-    }
-};
-
-class FruWalk : public FruTest {
-protected:
-    /// A record whose byte i is i, but for what is given.
-    void AddRecord(int id, std::uint8_t device, const std::string& idString,
-                   std::uint8_t typeLength, std::uint8_t type = 0x11) {
-        ipmisim::Bytes record(16);
-        std::iota(record.begin(), record.end(), std::uint8_t{0});
-        record[0] = static_cast<std::uint8_t>(id);
-        record[1] = static_cast<std::uint8_t>(id >> 8);
-        record[3] = type;
-        record[6] = device;
-        record[15] = typeLength;
-        record.insert(record.end(), idString.begin(), idString.end());
-        bmc.sdrRecords.push_back(record);
+        return IPMIRequestFRULocator(FreshLibrary()).IPMIGetSDREntry(nullptr, &locators);
     }
     std::vector<std::string> Found() {
         std::vector<std::string> found;
@@ -145,95 +135,87 @@ TEST_F(FruWalk, FailureKeepsWhatWasFound) {
     AddRecord(1, 3, "A", 1);
     AddRecord(2, 4, "B", 1);
     for (const auto& c : cases) {
-        bmc.faults.clear();
-        Silence(c.command, c.call);
+        bmc.faults = {ipmiseltest::NoResponse(c.command, c.call)};
         EXPECT_EQ(Walk(), kFailed);
-        EXPECT_EQ(locators.size(), c.found);
         EXPECT_THAT(log.Lines(kError), ElementsAre("Failure in sending command to " + c.what));
-        bmc.faults.clear();
-        FailWith(c.command, c.call, 0x81);
+        bmc.faults = {ipmiseltest::CompletionCode(c.command, c.call, 0x81)};
         EXPECT_EQ(Walk(), kFailed);
         EXPECT_EQ(locators.size(), c.found);
         EXPECT_EQ(log.Lines(kInfo).back(), "IPMI error in " + c.prefix + "Unknown error\n");
     }
 }
 
-class FruData : public FruTest {
+class FruData : public ipmiseltest::BmcTest {
 protected:
+    IPMIFRULocator locator;
+
     FruData() {
-        ipmisim::Bytes inventory(300);
-        std::iota(inventory.begin(), inventory.end(), std::uint8_t{1});
-        bmc.fru = {{0, {0xAA}}, {7, inventory}};
-        Forget();
-    }
-    void Forget() {
+        bmc.fru = {{0, {0xAA}}, {7, ipmisim::Bytes(300)}};
+        std::iota(bmc.fru[7].begin(), bmc.fru[7].end(), std::uint8_t{1});
         locator.SetFRUDevIDSlaveAddr(7);
-        const std::vector<unsigned char> earlier(IPMIFRULocator::kFruDataLength, 0xEE);
-        locator.SetFRUData(0, earlier.data(), IPMIFRULocator::kFruDataLength);
     }
-    void AnswerWith(unsigned call, ipmisim::Bytes data) {
-        bmc.faults.push_back({.netFn = 0x0A,
-                              .command = kReadFruData,
-                              .call = call,
-                              .kind = ipmisim::Fault::Kind::kData,
-                              .data = std::move(data)});
-    }
-    /// The inventory, but for [from, to), which is untouched.
-    void ExpectDataBut(unsigned from, unsigned to) const {
-        for (unsigned i = 0; i < IPMIFRULocator::kFruDataLength; ++i) {
-            const bool untouched = (i >= from && i < to) || i >= 256;
-            EXPECT_EQ(locator.GetFRUData()[i], untouched ? 0xEE : (i + 1) & 0xFF) << i;
-        }
+    unsigned Read(bool deviceZero = false) {
+        log.Clear();
+        return IPMIRequestFRULocator(FreshLibrary()).IPMIGetFRUData(nullptr, &locator, deviceZero);
     }
 };
 
 TEST_F(FruData, IsReadInSixteenChunks) {
     EXPECT_EQ(Read(), kOk);
-    ExpectDataBut(0, 0);
-    ASSERT_EQ(requests.size(), 16U);
-    EXPECT_EQ(Frames()[0], "01 20 0A 00 11 04 00 00 00 07 00 00 10 00 00 ");
-    EXPECT_EQ(Frames()[15], "01 20 0A 00 11 04 00 00 00 07 F0 00 10 00 00 ");
+    EXPECT_EQ(requests.size(), 16U);
+    EXPECT_EQ(Frames().front(), "01 20 0A 00 11 04 00 00 00 07 00 00 10 00 00 ");
+    EXPECT_EQ(Frames().back(), "01 20 0A 00 11 04 00 00 00 07 F0 00 10 00 00 ");
     EXPECT_EQ(log.Lines(kInfo)[0],
               "fRspBuf = 00 10 01 02 03 04 05 06 07 08 09 0A 0B 0C 0D 0E 0F 10 ");
-
     EXPECT_EQ(Read(true), kFailed) << "device 0, of one byte";
     EXPECT_EQ(locator.GetFRUData()[0], 0xAA);
 }
 
-TEST_F(FruData, ShortAnswerFillsAsFarAsItGoes) {
-    const std::pair<ipmisim::Bytes, unsigned> cases[] = {
-        {{}, 0}, {{0x10}, 0}, {{0x10, 0x21}, 1}, {{0x03, 0x21, 0x22}, 2}};
-    for (const auto& [answer, copied] : cases) {
-        Forget();
-        bmc.faults.clear();
-        AnswerWith(3, answer);
-        EXPECT_EQ(Read(), kOk);
-        ExpectDataBut(32 + copied, 48);
+TEST_F(FruData, EachAnswerFillsItsChunkAsFarAsItGoes) {
+    const auto answer = [](unsigned call, ipmisim::Bytes data) {
+        return ipmiseltest::Answer(0x11, call, std::move(data));
+    };
+    ipmisim::Bytes tooLong(400, 0xCC);
+    std::iota(tooLong.begin() + 1, tooLong.begin() + 17, std::uint8_t{0xF1});
+    const struct {
+        std::vector<ipmisim::Fault> faults;
+        unsigned from, to;  // untouched
+        std::size_t deviceSize = 300;
+        std::pair<int, std::string> line{};
+    } cases[] = {
+        {{}, 0, 0},
+        {{answer(3, {})}, 32, 48},
+        {{answer(3, {0x10})}, 32, 48},
+        {{answer(3, {0x10, 0x21})}, 33, 48},
+        {{answer(3, {0x03, 0x21, 0x22})}, 34, 48},
+        {{answer(16, tooLong)}, 0, 0},
+        {{},
+         100,
+         256,
+         100,
+         {kInfo, "FRU data not available for Device ID 7: Parameter out of range."}},
+        {{ipmiseltest::NoResponse(0x11, 2)},
+         16,
+         256,
+         300,
+         {kError, "Failure in sending command to obtain FRU Data."}},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(&c - cases);
+        bmc.faults = c.faults;
+        bmc.fru[7].resize(c.deviceSize);
+        std::iota(bmc.fru[7].begin(), bmc.fru[7].end(), std::uint8_t{1});
+        const std::vector<unsigned char> earlier(IPMIFRULocator::kFruDataLength, 0xEE);
+        locator.SetFRUData(0, earlier.data(), IPMIFRULocator::kFruDataLength);
+        EXPECT_EQ(Read(), c.to == 256 ? kFailed : kOk);
+        for (unsigned i = 0; i < IPMIFRULocator::kFruDataLength; ++i) {
+            const bool untouched = (i >= c.from && i < c.to) || i >= 256;
+            EXPECT_EQ(locator.GetFRUData()[i], untouched ? 0xEE : (i + 1) & 0xFF) << i;
+        }
+        if (c.to == 256) {
+            EXPECT_THAT(log.All(), Contains(c.line));
+        }
     }
-}
-
-TEST_F(FruData, LongAnswerStaysInItsChunk) {
-    for (const unsigned call : {1U, 15U, 16U}) {
-        ipmisim::Bytes answer(400, 0xCC);
-        std::iota(answer.begin() + 1, answer.begin() + 17,
-                  static_cast<std::uint8_t>(16 * call - 15));
-        AnswerWith(call, answer);
-    }
-    EXPECT_EQ(Read(), kOk);
-    ExpectDataBut(0, 0);
-}
-
-TEST_F(FruData, EndsWhereTheDeviceEnds) {
-    bmc.fru[7].resize(100);
-    EXPECT_EQ(Read(), kFailed);
-    ExpectDataBut(100, 256);
-    EXPECT_EQ(log.Lines(kInfo).back(),
-              "FRU data not available for Device ID 7: Parameter out of range.");
-    Forget();
-    Silence(kReadFruData, 2);
-    EXPECT_EQ(Read(), kFailed);
-    ExpectDataBut(16, 256);
-    EXPECT_THAT(log.Lines(kError), ElementsAre("Failure in sending command to obtain FRU Data."));
 }
 
 }  // namespace

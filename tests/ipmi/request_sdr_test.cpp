@@ -4,6 +4,7 @@
 #include <numeric>
 
 #include "tests/support/bmc_fixture.h"
+#include "tests/support/wire.h"
 
 namespace {
 
@@ -16,11 +17,11 @@ protected:
     unsigned char info[kSdrInfoTextLength] = {};
 
     /// A record of 64 bytes whose byte i is i, but for ID and type.
-    void AddRecord(int id, std::uint8_t type) {
+    void AddRecord(std::uint16_t id, std::uint8_t type) {
         ipmisim::Bytes record(64);
         std::iota(record.begin(), record.end(), std::uint8_t{0});
-        record[0] = static_cast<std::uint8_t>(id);
-        record[1] = static_cast<std::uint8_t>(id >> 8);
+        record[0] = ipmiseltest::Low(id);
+        record[1] = ipmiseltest::High(id);
         record[3] = type;
         bmc.sdrRecords.push_back(record);
     }
@@ -41,16 +42,14 @@ TEST_F(SdrWalk, ReadsThreePiecesOfFullAndCompactRecords) {
                  "3E 3F ");
     EXPECT_EQ(std::string(entries[1].SDRStringData, 64),
               "00 FF FF 1F 20 21 22 23 24 25 26 27 28 29 2A 2B 2C 2D 2E 2F 30 3");
-    std::vector<std::string> frames;
-    for (const auto& frame : requests) frames.push_back(DumpBytes(frame, Digits::kUpperHex));
-    EXPECT_THAT(frames, ElementsAre("01 20 0A 00 20 00 00 00 00 00 00 00 00 00 00 ",
-                                    "01 20 0A 00 22 00 00 00 00 00 00 00 00 00 00 ",
-                                    "01 20 0A 00 23 06 00 00 00 01 00 00 00 00 0A ",
-                                    "01 20 0A 00 23 06 00 00 00 01 00 00 00 14 0A ",
-                                    "01 20 0A 00 23 06 00 00 00 01 00 00 00 2F FF ",
-                                    "01 20 0A 00 23 06 00 00 00 01 00 34 12 00 0A ",
-                                    "01 20 0A 00 23 06 00 00 00 01 00 34 12 14 0A ",
-                                    "01 20 0A 00 23 06 00 00 00 01 00 34 12 1F FF "));
+    EXPECT_THAT(Frames(), ElementsAre("01 20 0A 00 20 00 00 00 00 00 00 00 00 00 00 ",
+                                      "01 20 0A 00 22 00 00 00 00 00 00 00 00 00 00 ",
+                                      "01 20 0A 00 23 06 00 00 00 01 00 00 00 00 0A ",
+                                      "01 20 0A 00 23 06 00 00 00 01 00 00 00 14 0A ",
+                                      "01 20 0A 00 23 06 00 00 00 01 00 00 00 2F FF ",
+                                      "01 20 0A 00 23 06 00 00 00 01 00 34 12 00 0A ",
+                                      "01 20 0A 00 23 06 00 00 00 01 00 34 12 14 0A ",
+                                      "01 20 0A 00 23 06 00 00 00 01 00 34 12 1F FF "));
 }
 
 TEST_F(SdrWalk, OtherRecordTypesAreSkipped) {
@@ -68,34 +67,15 @@ TEST_F(SdrWalk, OtherRecordTypesAreSkipped) {
 }
 
 TEST_F(SdrWalk, AnyFfByteEndsTheWalk) {
-    for (const int next : {0x12FF, 0xFF12}) {
+    for (const std::uint16_t next : {0x12FF, 0xFF12}) {
         bmc.sdrRecords.clear();
         entries.clear();
         AddRecord(1, 1);
         AddRecord(next, 1);
-        NQORTQR20::SPLibrary library(
-            std::make_unique<ipmiseltest::SimulatedTransport>(bmc, &requests));
-        EXPECT_EQ(IPMIRequestSDR(&library).IPMIGetSDREntry(nullptr, &entries, info), kOk);
+        FreshLibrary();
+        EXPECT_EQ(Walk(), kOk);
         EXPECT_EQ(entries.size(), 1U) << next;
     }
-}
-
-TEST_F(SdrWalk, SecondWalkOnTheSameObjectFindsNothing) {
-    AddRecord(1, 1);
-    IPMIRequestSDR request(Library());
-    EXPECT_EQ(request.IPMIGetSDREntry(nullptr, &entries, info), kOk);
-    EXPECT_EQ(request.IPMIGetSDREntry(nullptr, &entries, info), kOk);
-    EXPECT_EQ(entries.size(), 1U);
-    EXPECT_EQ(requests.size(), 5U + 2U) << "information and reservation only";
-}
-
-TEST_F(SdrWalk, LostReservationEndsItAndKeepsTheEntries) {
-    AddRecord(1, 1);
-    AddRecord(2, 1);
-    FailWith(0x23, 5, 0xC5);
-    EXPECT_EQ(Walk(), kFailed);
-    EXPECT_EQ(entries.size(), 1U);
-    EXPECT_EQ(requests.size(), 7U) << "neither reserved again nor retried";
 }
 
 }  // namespace

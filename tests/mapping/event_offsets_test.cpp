@@ -105,6 +105,7 @@ TEST_F(SensorOffset, HeldTexts) {
 
 TEST_F(SensorOffset, SecondTexts) {
     const std::string extension = "\n" + kIndent + "Sensor-specific event extension code ";
+    const std::string all = "Logging has been disabled for all events of ";
     const struct {
         int sensorType, data1, data2, data3;
         std::string text;
@@ -129,46 +130,30 @@ TEST_F(SensorOffset, SecondTexts) {
         {0x23, 0xC8, 0x46, 0, "<458>. "},
         {0x23, 0xC7, 0x11, 0, "<457>. "},
         {0x23, 0x08, 0x11, 0, "<458>. "},
+        // Logging disabled: for what. A type outside the list has no name, not one out of another.
+        {0x10, 1, 0x6F, 0x03,
+         "<347:111:3>. " + kIndent + "Deassertion event. Sensor-specific Type. "},
+        {0x10, 1, 0x01, 0x12, "<347:1:2>. " + kIndent + "Assertion event. Threshold Type. "},
+        {0x10, 1, 0x0C, 0x31,
+         "<347:12:1>. " + kIndent + "Assertion event. " + all + "<662>. <662> - "},
+        {0x10, 1, 0x00, 0x20, "<347:0:0>. " + kIndent + "Deassertion event. " + all + "<650>. "},
+        {0x10, 1, 0x47, 0x20, "<347:71:0>. " + kIndent + "Deassertion event. " + all},
+        {0x10, 0, 0x6F, 0x30, "<346>. "},
+        // System event: what. Codes outside do not run into other lists.
+        {0x12, 3, 0x52, 0, "<376>. <387>. <417>. "},
+        {0x12, 3, 0x63, 0, "<376>. "},
+        {0x12, 4, 0xC1, 0, "<377>. Reserved  Alert.  "},
+        {0x12, 4, 0x40, 0, "<377>. Reserved  "},
+        {0x12, 4, 0x3E, 0,
+         "<377>. Diagnostic Interrupt (NMI).  OEM action.  power cycle.  reset.  power off.  "},
+        {0x12, 5, 0x81, 0, "<378>. event is second of pair. SDR Timestamp Clock updated."},
+        {0x12, 5, 0x00, 0, "<378>. event is first of pair. SEL Timestamp Clock updated."},
+        {0x12, 2, 0xFF, 0, "<375>. "},
     };
     for (const auto& c : cases) {
         EXPECT_EQ(Sensor(c.sensorType, c.data1, c.data2, c.data3), c.text)
             << c.sensorType << " " << c.data1 << " " << c.data2;
     }
-}
-
-TEST_F(SensorOffset, LoggingDisabledSaysForWhat) {
-    const std::string all = "Logging has been disabled for all events of ";
-    const struct {
-        int data2, data3;
-        std::string text;
-    } cases[] = {
-        {0x6F, 0x03, "<347:111:3>. " + kIndent + "Deassertion event. Sensor-specific Type. "},
-        {0x01, 0x12, "<347:1:2>. " + kIndent + "Assertion event. Threshold Type. "},
-        {0x0C, 0x31, "<347:12:1>. " + kIndent + "Assertion event. " + all + "<662>. <662> - "},
-        {0x00, 0x20, "<347:0:0>. " + kIndent + "Deassertion event. " + all + "<650>. "},
-        // A type outside the list has no name, not one out of another list.
-        {0x47, 0x20, "<347:71:0>. " + kIndent + "Deassertion event. " + all},
-    };
-    for (const auto& c : cases) EXPECT_EQ(Sensor(0x10, 0x01, c.data2, c.data3), c.text) << c.data2;
-    EXPECT_EQ(Sensor(0x10, 0x00, 0x6F, 0x30), "<346>. ");
-}
-
-TEST_F(SensorOffset, SystemEventSaysWhat) {
-    const struct {
-        int offset, data2;
-        const char* text;
-    } cases[] = {
-        {3, 0x52, "<376>. <387>. <417>. "},
-        {3, 0x63, "<376>. "},  // codes outside do not run into other lists
-        {4, 0xC1, "<377>. Reserved  Alert.  "},
-        {4, 0x40, "<377>. Reserved  "},
-        {4, 0x3E,
-         "<377>. Diagnostic Interrupt (NMI).  OEM action.  power cycle.  reset.  power off.  "},
-        {5, 0x81, "<378>. event is second of pair. SDR Timestamp Clock updated."},
-        {5, 0x00, "<378>. event is first of pair. SEL Timestamp Clock updated."},
-        {2, 0xFF, "<375>. "},
-    };
-    for (const auto& c : cases) EXPECT_EQ(Sensor(0x12, c.offset, c.data2), c.text) << c.data2;
 }
 
 TEST_F(SensorOffset, SeverityAndPreviousState) {

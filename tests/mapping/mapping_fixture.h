@@ -2,55 +2,23 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <unistd.h>
 
-#include <filesystem>
-#include <fstream>
-#include <memory>
 #include <string>
 
 #include "base/text.h"
 #include "host/core/host.h"
 #include "mapping/ipmi_mapping.h"
 #include "tests/support/bmc_fixture.h"
+#include "tests/support/temporary_folder.h"
 
 namespace ipmiseltest {
 
 constexpr const char* kFifteenBlanks = "               ";
 
-/// A folder of its own that holds an "ipmisel.INI". Its path has the plug-in's word in it, as that
-/// of a source tree may.
-class TextFolder {
-public:
-    TextFolder() {
-        std::string pattern =
-            (std::filesystem::temp_directory_path() / "ipmisel-texts-XXXXXX").string();
-        path_ = mkdtemp(pattern.data());
-    }
-    explicit TextFolder(const std::string& contents) : TextFolder() {
-        std::ofstream(File(), std::ios::binary) << contents;
-    }
-    ~TextFolder() { std::filesystem::remove_all(path_); }
-    TextFolder(const TextFolder&) = delete;
-    TextFolder& operator=(const TextFolder&) = delete;
-
-    const std::filesystem::path& path() const { return path_; }
-    std::filesystem::path File() const { return path_ / "ipmisel.INI"; }
-
-private:
-    std::filesystem::path path_;
-};
-
-/// The machine that the host reports while this lives.
-struct MachineType {
-    explicit MachineType(const char* name) {
-        tqrhost::MachineFacts facts;
-        facts.machineType = name;
-        tqrhost::SetMachineFacts(facts);
-    }
-    ~MachineType() { tqrhost::SetMachineFacts({}); }
-    MachineType(const MachineType&) = delete;
-    MachineType& operator=(const MachineType&) = delete;
+/// A folder with an "ipmisel.INI". Its path has the plug-in's word in it, as that of a source tree
+/// may.
+struct TextFolder : TemporaryFolder {
+    explicit TextFolder(const std::string& contents) { Write("ipmisel.INI", contents); }
 };
 
 /// Every number's text is the number in angle brackets; the formats show their integers.
@@ -74,24 +42,22 @@ protected:
 
     std::string Sensor(int sensorType, int data1, int data2 = 0, int data3 = 0) {
         char out[kRoom] = {};
-        EXPECT_EQ(mapping.GetSensorOffset(context.get(), sensorType, data1, data2, data3, 0x6F, out,
-                                          kRoom),
-                  0);
+        EXPECT_EQ(0, mapping.GetSensorOffset(context.get(), sensorType, data1, data2, data3, 0x6F,
+                                             out, kRoom));
         return out;
     }
     std::string Generic(int readingType, int data1, int data2 = 0, int data3 = 0,
                         int sensorType = 0x01, int sensorNumber = 0) {
         char out[kRoom] = {};
-        EXPECT_EQ(mapping.GetGenericOffset(context.get(), data1, data2, data3, readingType,
-                                           sensorType, sensorNumber, out, kRoom),
-                  0);
+        EXPECT_EQ(0, mapping.GetGenericOffset(context.get(), data1, data2, data3, readingType,
+                                              sensorType, sensorNumber, out, kRoom));
         return out;
     }
     std::string Threshold(int data1, int data2 = 0, int data3 = 0,
                           const s_SDR_Mod_Units* units = nullptr) {
         char out[kRoom] = {};
-        EXPECT_EQ(mapping.GetThresholdOffset(context.get(), data1, data2, data3, out, kRoom, units),
-                  0);
+        EXPECT_EQ(
+            0, mapping.GetThresholdOffset(context.get(), data1, data2, data3, out, kRoom, units));
         return out;
     }
     std::string Units(const s_SDR_Mod_Units* units, int reading) {

@@ -33,10 +33,6 @@ protected:
         EXPECT_EQ(Collect({kFru}), 0);
         return Written("Name");
     }
-    std::vector<std::string> ElementNames() {
-        Names();
-        return Written("ElementName");
-    }
 };
 
 TEST_F(FruSection, WritesDeviceZeroThenTheLocatedDevices) {
@@ -68,9 +64,9 @@ TEST_F(FruSection, InstancesAreKeptForTenMinutes) {
 TEST_F(FruSection, NamesTellTheNodeWhereThereAreSeveral) {
     nodes.push_back(nodes[0]);
     nodes[1].fru[0] = FixedLayout("Maker", "Second board", "S-8");
-    EXPECT_THAT(ElementNames(),
+    EXPECT_THAT(Names(), ElementsAre("Board", "Supply", "Second board", "Supply"));
+    EXPECT_THAT(Written("ElementName"),
                 ElementsAre("(none)", "Node 0 : PSU 1", "(none)", "Node 1 : PSU 1"));
-    EXPECT_THAT(Written("Name"), ElementsAre("Board", "Supply", "Second board", "Supply"));
     std::vector<std::string> told;
     for (const std::string& line : log.Lines(3)) {
         if (line.ends_with("ipmifruonce.") || line == "Getting VPD records.") told.push_back(line);
@@ -101,15 +97,17 @@ TEST_F(FruSection, MachinesWithoutLocatedDevicesHaveAList) {
     facts.machineType = "SIM-1";
     nodes[0].sdrRecords = {FruLocator(2, 4, "DC1"), FruLocator(3, 5, "PSU 2")};
     nodes[0].fru[1] = FixedLayout("Maker", "Card", "S-1");
-    EXPECT_THAT(ElementNames(), ElementsAre("(none)", "CPU Card", "System Board", "Memory Card 1",
-                                            "Power Supply 1"));
+    Names();
+    EXPECT_THAT(Written("ElementName"), ElementsAre("(none)", "CPU Card", "System Board",
+                                                    "Memory Card 1", "Power Supply 1"));
     EXPECT_TRUE(Logged(3, "Using hard-coded VPD info."));
     EXPECT_THAT(Written("Status"), ElementsAre("(none)", "NORMAL", "NORMAL", "NORMAL", "NORMAL"));
 
     ipmisel::Module().ipmifruonce = false;
     nodes.push_back(nodes[0]);
     ipmisel::Module().gPass = 0;  // counts the nodes anew
-    EXPECT_THAT(ElementNames(), Contains("Node:1 CPU Card"));
+    Names();
+    EXPECT_THAT(Written("ElementName"), Contains("Node:1 CPU Card"));
 }
 
 TEST_F(FruSection, DeviceZeroNeedsAPass) {

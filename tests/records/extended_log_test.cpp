@@ -2,9 +2,7 @@
 
 #include <gmock/gmock.h>
 
-#include <algorithm>
-#include <numeric>
-
+#include "tests/records/text_field.h"
 #include "tests/support/bmc_fixture.h"
 
 namespace {
@@ -14,17 +12,8 @@ using ::testing::Pair;
 
 /// Every byte differs from its neighbours.
 s_AuxLog_entry Entry(unsigned recordSize, std::uint8_t recordId = 0x34) {
-    s_AuxLog_entry entry;
-    std::iota(std::begin(entry.bytes), std::end(entry.bytes), std::uint8_t{0});
-    const std::uint8_t head[] = {0x4D,
-                                 0x4F,
-                                 0x00,
-                                 static_cast<std::uint8_t>(recordSize),
-                                 static_cast<std::uint8_t>(recordSize >> 8),
-                                 recordId,
-                                 0x12};
-    std::copy(std::begin(head), std::end(head), entry.bytes);
-    return entry;
+    return ipmiseltest::AuxEntry(static_cast<std::uint16_t>(0x1200 + recordId),
+                                 static_cast<std::uint16_t>(recordSize));
 }
 
 std::vector<IPMIExtendedSELDataEntry> Parse(const std::vector<s_AuxLog_entry>& entries) {

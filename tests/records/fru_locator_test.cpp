@@ -33,34 +33,26 @@ TEST(FruLocator, MarkerSelectsTheFixedLayout) {
                                                 "Maker", std::string(30, 'N'), "S1"));
 }
 
-TEST(FruLocator, FixedLayoutAtTheEndOfTheDataStaysInside) {
-    IPMIFRULocator locator;
-    Put(&locator, 309, std::string("\x01%\x00", 3));
-    EXPECT_THAT(StringsOf(locator), ElementsAre("No chassis part number", "", "", "", "", ""));
-}
-
-TEST(FruLocator, WithoutTheMarkerPlausibleRunsAreKept) {
+TEST(FruLocator, RunAtTheEndIsKeptWithoutBracketTests) {
     const struct {
+        int at;
         std::string bytes;
         std::vector<std::string> strings;
     } cases[] = {
-        {std::string("ABC\0X\0(12)\0", 11), {"ABC", "(12)"}},
-        {"A]B[", {}},
-        {"FOO(", {"FOO("}},
-        {"FOO)", {}},
-        {"[1]#Q-7/B", {"[1]", "Q-7/B"}},
+        {3, std::string("ABC\0X\0(12)\0", 11), {"ABC", "(12)"}},
+        {3, "A]B[", {}},
+        {3, "FOO(", {"FOO("}},
+        {3, "FOO)", {}},
+        {3, "[1]#Q-7/B", {"[1]", "Q-7/B"}},
+        {308, "A)]B", {"A)]B"}},
+        // The fixed layout, all of it behind the end.
+        {309, std::string("\x01%\x00", 3), {"No chassis part number", "", "", "", "", ""}},
     };
     for (const auto& c : cases) {
         IPMIFRULocator locator;
-        Put(&locator, 3, c.bytes);
+        Put(&locator, c.at, c.bytes);
         EXPECT_EQ(StringsOf(locator), c.strings) << c.bytes;
     }
-}
-
-TEST(FruLocator, RunAtTheEndIsKeptWithoutBracketTests) {
-    IPMIFRULocator locator;
-    Put(&locator, 308, "A)]B");
-    EXPECT_THAT(StringsOf(locator), ElementsAre("A)]B"));
 }
 
 TEST(FruLocator, DataOutsideTheBufferIsLeftOut) {

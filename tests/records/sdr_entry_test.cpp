@@ -3,20 +3,36 @@
 #include <gmock/gmock.h>
 
 #include <cctype>
-#include <utility>
-#include <vector>
+#include <memory>
 
-#include "tests/mapping/mapping_fixture.h"
-#include "tests/records/sensor_texts.h"
+#include "base/text.h"
+#include "tests/records/text_field.h"
+#include "tests/support/bmc_fixture.h"
 
 namespace {
 
-using ipmiseltest::Bytes;
 using ipmiseltest::Fill;
-using ipmiseltest::Scan;
-using ipmiseltest::SensorTexts;
 using ::testing::ElementsAre;
 using ::testing::Pair;
+
+/// A full sensor record "CPU 1 Temp" as its three texts; neighbouring values differ.
+s_SDR_entry SensorTexts(int sensorNumber = 0x30) {
+    s_SDR_entry texts;
+    Fill(texts.SDRHeaderData,
+         ipmisel::Format("00 F1 F2 04 03 51 01 35 20 10 %02X 07 61 ", sensorNumber));
+    Fill(texts.SDRUnitsData, "00 F1 F2 81 12 13 0A 05 C0 06 41 99 D3 ");
+    Fill(texts.SDRStringData, "00 F1 F2 CA 43 50 55 20 31 20 54 65 6D 70 ");
+    return texts;
+}
+
+const unsigned char* Bytes(const char* text) {
+    return reinterpret_cast<const unsigned char*>(text);
+}
+
+int Scan(const s_SDR_entry& texts, IPMISDREntry* entry) {
+    return entry->ScanSDRDataFile(nullptr, nullptr, Bytes(texts.SDRHeaderData),
+                                  Bytes(texts.SDRUnitsData), Bytes(texts.SDRStringData));
+}
 
 class SdrEntry : public ::testing::Test {
 protected:
@@ -99,24 +115,74 @@ TEST_F(SdrEntry, RepositoryInformationMustBeOfItsVersion) {
     EXPECT_THAT(log.Lines(0), ElementsAre("Error in reading data file for SDRInfostring"));
 }
 
-using SdrEntities = ipmiseltest::MappingTest;
+/// Leaks and double frees show under the sanitizer.
+class SdrCache : public ::testing::Test {
+protected:
+    ipmiseltest::LogRecorder log;
+    SDRCache cache;
+    std::unique_ptr<IPMISDREntry> first = std::make_unique<IPMISDREntry>();
+    std::vector<s_SDR_entry> texts;
 
-TEST_F(SdrEntities, NameTheSensorAndItsEntity) {
-    const std::pair<std::uint8_t, const char*> cases[] = {
-        {0x07, "<1007>"}, {0x28, "<1040>"}, {0x29, "Processing blade"}, {0x35, ""}};
-    for (const auto& [entityId, entityName] : cases) {
-        IPMISDREntry entry;
-        ASSERT_EQ(Scan(SensorTexts(), &entry), 0);
-        entry.entityId = entityId;
-        char id[17], name[64], instance[2];
-        const auto describe = [&](const IPMISDREntry* sensor) {
-            IPMISDREntry::GetSensorSDREntities(sensor, context.get(), &mapping, id, name, instance,
-                                               sizeof id, sizeof name, sizeof instance);
-            return std::string(id) + "|" + name + "|" + std::string(instance, 2);
-        };
-        EXPECT_EQ(describe(&entry), std::string("CPU 1 Temp|") + entityName + "|97");
-        EXPECT_EQ(describe(nullptr), std::string("||\0\0", 4));
+    ~SdrCache() override { DeleteSDRCache(nullptr, &cache); }
+    int Create(const char* info = "00 51 ") {
+        const int result = CreateSDRCache(nullptr, first.get(), &cache, &texts, Bytes(info));
+        if (!cache.empty()) {
+            EXPECT_EQ(cache.back(), first.get());
+            static_cast<void>(first.release());
+        }
+        return result;
     }
+    std::vector<int> Numbers() const {
+        std::vector<int> numbers;
+        for (const IPMISDREntry* entry : cache) numbers.push_back(entry->sensorNumber);
+        return numbers;
+    }
+};
+
+TEST_F(SdrCache, HoldsTheLastRecordOfTheRepositoryFirst) {
+    texts = {SensorTexts(0x30), SensorTexts(0x31), SensorTexts(0x30)};
+    EXPECT_EQ(Create(), 0);
+    EXPECT_THAT(Numbers(), ElementsAre(0x30, 0x31, 0x30));
+    EXPECT_EQ(GetSensorSDR(0x30, &cache), cache.front());
+    EXPECT_EQ(GetSensorSDR(0x32, &cache), nullptr);
+}
+
+TEST_F(SdrCache, KeepsARecordOfAnotherVersion) {
+    texts = {SensorTexts(0x30), SensorTexts(0x31)};
+    Fill(texts[0].SDRHeaderData, "00 F1 F2 04 03 02 01 35 20 10 30 07 61 ");
+    EXPECT_EQ(Create(), 0);
+    EXPECT_THAT(Numbers(), ElementsAre(0x31, 0x30));
+}
+
+TEST_F(SdrCache, EmptyTextEndsItWithWhatItHas) {
+    texts = {SensorTexts(0x30), SensorTexts(0x31), SensorTexts(0x32)};
+    Fill(texts[1].SDRStringData, "");
+    EXPECT_EQ(Create(), 0);
+    EXPECT_THAT(Numbers(), ElementsAre(0x30));
+    EXPECT_THAT(log.Lines(1), ElementsAre("Failed to scan all SDRs from buffer."));
+    EXPECT_EQ(log.All().back().second, "CreateSDRCache() function completed.");
+}
+
+TEST_F(SdrCache, FirstStaysTheCallersWhereNothingIsCached) {
+    EXPECT_EQ(Create(), 0);
+    EXPECT_EQ(GetSensorSDR(0, &cache), nullptr);
+    texts = {SensorTexts()};
+    log.Clear();
+    EXPECT_EQ(Create("00 20 "), 1);
+    EXPECT_THAT(log.Lines(0), ElementsAre("Failed to obtain correct SDR info."));
+    Fill(texts[0].SDRHeaderData, "");
+    EXPECT_EQ(Create(), 0);
+    EXPECT_TRUE(cache.empty());
+}
+
+TEST_F(SdrCache, IsDeletedOnceHoweverOftenItIsAsked) {
+    texts = {SensorTexts(0x30), SensorTexts(0x31)};
+    Create();
+    log.Clear();
+    DeleteSDRCache(nullptr, &cache);
+    EXPECT_THAT(log.Lines(4), ElementsAre("DeleteSDRCacheSDRCache() function entered.",
+                                          "DeleteSDRCacheSDRCache() function completed."));
+    EXPECT_EQ(GetSensorSDR(0x30, &cache), nullptr);
 }
 
 }  // namespace

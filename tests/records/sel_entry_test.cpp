@@ -4,13 +4,16 @@
 
 #include <array>
 #include <cstdio>
+#include <limits>
 #include <memory>
 
+#include "records/sel_texts.h"
 #include "tests/mapping/mapping_fixture.h"
 #include "tests/records/text_field.h"
 
 namespace {
 
+using namespace ipmisel;
 using ipmiseltest::Row;
 using ::testing::Contains;
 using ::testing::ElementsAre;
@@ -156,6 +159,110 @@ TEST_F(SelEntry, ReadsTheInformationLineOfAFile) {
     EXPECT_THAT(
         log.Lines(1),
         ElementsAre("This SEL Version (0x52) does not match the current IPMI Version (0x51).\n"));
+}
+
+class Timestamp : public ::testing::Test {
+protected:
+    ipmiseltest::LogRecorder log;
+    ipmiseltest::Machine now{"", "20240305120304.000000+060"};
+};
+
+TEST_F(Timestamp, IsTheCalendarTimeWithTheLocalOffset) {
+    const struct {
+        int raw;
+        std::string time;
+        const char* addition;
+    } cases[] = {{0, "19700101000000", "Adding 0 hours to Timestamp."},
+                 {0x1FFFFFFF, "19870105184831", "Adding 0 hours to Timestamp."},
+                 {0x20000000, "19870105184832", "No addition to Timestamp."},
+                 {0x65E70304, "20240305113324", "No addition to Timestamp."},
+                 {-1, "19691231235959", "Adding 0 hours to Timestamp."}};
+    for (const auto& c : cases) {
+        const std::string expected = c.time + ".000000+060";
+        IPMISELEntry entry;
+        const s_SEL_row row = ipmiseltest::Row(
+            ipmisel::Format("0 0 0 1 0 2 %x %x %x %x", c.raw & 0xFF, c.raw >> 8 & 0xFF,
+                            c.raw >> 16 & 0xFF, c.raw >> 24 & 0xFF));
+        ASSERT_EQ(entry.ScanSELDataFile(nullptr, &row, 0), 0U);
+        log.Clear();
+        char out[64] = {};
+        EXPECT_EQ(entry.CopyTimestamp(nullptr, out, sizeof out, nullptr, {}, true, true), 0U);
+        EXPECT_EQ(out, expected);
+        EXPECT_THAT(
+            log.Lines(4),
+            ElementsAre(
+                "IPMISELEntry::GetTimestamp() function entered.", c.addition,
+                "RawTimeStamp = " + std::to_string(c.raw) + "\n         PreTimeStamp = " + expected,
+                "Timestamp = " + expected, "IPMISELEntry::GetTimestamp() function completed."));
+        char boot[5] = "####";
+        entry.CopyOSBootTimestamp(nullptr, boot, 4, nullptr, {}, false, false);
+        EXPECT_EQ(boot, c.time.substr(0, 4));
+    }
+}
+
+TEST_F(Timestamp, BeyondTheCalendarIsNoTime) {
+    EXPECT_EQ(ipmisel::TimestampText(std::numeric_limits<std::int64_t>::max(), 60),
+              "19700101000000.000000+000");
+    const std::string reason = NQORTQR20::TTQRStatusCode{21}.TranslateStatusCode();
+    EXPECT_THAT(log.All(),
+                ElementsAre(Pair(3, "Could not convert CurrentTimeStamp."),
+                            Pair(2, "Unable to obtain Timestamp due to caught exception " + reason +
+                                        ". Using default Timestamp (1/2/1970).")));
+}
+
+TEST(EventType, NamesDirectionAndClass) {
+    const struct {
+        std::uint8_t byte;
+        const char* text;
+    } cases[] = {{0x00, "Assertion, Unknown event type."}, {0x01, "Assertion, Threshold."},
+                 {0x81, "Deassertion, Threshold."},        {0x02, "Assertion, Generic."},
+                 {0x8C, "Deassertion, Generic."},          {0x0D, "Assertion, Unknown event type."},
+                 {0x6E, "Assertion, Unknown event type."}, {0x6F, "Assertion, Sensor-specific."},
+                 {0x70, "Assertion, Unknown event type."}};
+    for (const auto& c : cases) EXPECT_EQ(EventTypeText(c.byte), c.text) << int{c.byte};
+}
+
+TEST(Source, TellsSoftwareFromAddresses) {
+    const ipmiseltest::TextFolder folder(
+        "535=BIOS. \r\n536=SMI. \n537=System. \n538=OEM. \n539=Remote. \n540=Terminal. \n"
+        "541=Reserved. \n543=LUN %d. \n544=Channel %d.\n");
+    const tqrhost::PluginContext context(folder.path());
+    const struct {
+        int id;
+        const char* text;
+    } software[] = {{0x00, "BIOS. "},    {0x0F, "BIOS. "},     {0x10, "SMI. "},
+                    {0x20, "System. "},  {0x3F, "OEM. "},      {0x40, "Remote. "},
+                    {0x46, "Remote. "},  {0x47, "Terminal. "}, {0x48, "Reserved. "},
+                    {0x7F, "Reserved. "}};
+    for (const auto& c : software) {
+        EXPECT_EQ(SourceText(context.get(), static_cast<std::uint8_t>(c.id * 2 + 1), 0xF3),
+                  std::string(c.text) + "Channel 15.")
+            << c.id;
+    }
+    EXPECT_EQ(SourceText(context.get(), 0x20, 0x2D), "16 (address). LUN 1. Channel 2.");
+}
+
+TEST(Source, LeavesOutTextsThatAreNotThereAndCutsLongOnes) {
+    const ipmiseltest::TextFolder folder("543=" + std::string(110, 'L') +
+                                         "\n544=" + std::string(50, 'C') + "%d\n");
+    const tqrhost::PluginContext context(folder.path());
+    const ipmiseltest::LogRecorder log;
+    EXPECT_EQ(SourceText(context.get(), 0x41, 0x30), std::string(50, 'C') + "3");
+    EXPECT_THAT(log.Lines(0),
+                ElementsAre("Could not find data_number 537", "Error in obtaining string."));
+    EXPECT_EQ(SourceText(context.get(), 0x20, 0x30),
+              "16 (address). " + std::string(110, 'L') + "CCC");  // 127 characters
+}
+
+TEST(ShutDown, OnlyPartZeroCarriesComment) {
+    const struct {
+        std::array<std::uint8_t, 5> bytes;
+        const char* text;
+    } cases[] = {{{0, 'a', 0, 'b', 'c'}, "(Shutdown Event): Comment String Part 0: abc"},
+                 {{0, 0, 0, 0, 0}, "(Shutdown Event): Comment String Part 0: "},
+                 {{1, 0x04, 0x03, 0x02, 0x01}, "(Shutdown Event): ReasonCode: 16909060"},
+                 {{2, 0xFE, 0xFF, 0xFF, 0xFF}, "(Shutdown Event): ReasonCode: -2"}};
+    for (const auto& c : cases) EXPECT_EQ(ShutDownText(c.bytes), c.text);
 }
 
 }  // namespace

@@ -9,6 +9,7 @@
 #include <utility>
 #include <vector>
 
+#include "base/bytes.h"
 #include "host/core/host.h"
 #include "host/spdriver/transport.h"
 #include "simulator/simulated_bmc.h"
@@ -45,6 +46,20 @@ private:
     int identity_;
 };
 
+/// What the host says of the machine while this lives.
+class Machine {
+public:
+    explicit Machine(std::string type, std::optional<std::string> localTime = {}) {
+        tqrhost::MachineFacts facts;
+        facts.machineType = std::move(type);
+        facts.localTime = std::move(localTime);
+        tqrhost::SetMachineFacts(std::move(facts));
+    }
+    ~Machine() { tqrhost::SetMachineFacts({}); }
+    Machine(const Machine&) = delete;
+    Machine& operator=(const Machine&) = delete;
+};
+
 /// A simulated BMC as the host's transport, which also keeps the request frames.
 class SimulatedTransport : public tqrhost::Transport {
 public:
@@ -61,6 +76,29 @@ private:
     std::vector<std::vector<std::uint8_t>>* requests_;
 };
 
+/// The call-th use (0 for every use) of a Storage command gets no response.
+inline ipmisim::Fault NoResponse(std::uint8_t command, unsigned call) {
+    ipmisim::Fault fault;
+    fault.netFn = 0x0A;
+    fault.command = command;
+    if (call != 0) fault.call = call;
+    return fault;
+}
+/// It answers a completion code.
+inline ipmisim::Fault CompletionCode(std::uint8_t command, unsigned call, std::uint8_t code) {
+    ipmisim::Fault fault = NoResponse(command, call);
+    fault.kind = ipmisim::Fault::Kind::kCompletionCode;
+    fault.completionCode = code;
+    return fault;
+}
+/// It answers these data.
+inline ipmisim::Fault Answer(std::uint8_t command, unsigned call, ipmisim::Bytes data) {
+    ipmisim::Fault fault = NoResponse(command, call);
+    fault.kind = ipmisim::Fault::Kind::kData;
+    fault.data = std::move(data);
+    return fault;
+}
+
 /// A case over one simulated BMC: describe it in `bmc`, then take Library().
 class BmcTest : public ::testing::Test {
 protected:
@@ -76,46 +114,28 @@ protected:
         }
         return library_.get();
     }
-    /// The call-th use (0 for every use) of a Storage command answers a completion code.
-    void FailWith(std::uint8_t command, unsigned call, std::uint8_t completionCode) {
-        ipmisim::Fault fault;
-        fault.netFn = 0x0A;
-        fault.command = command;
-        if (call != 0) fault.call = call;
-        fault.kind = ipmisim::Fault::Kind::kCompletionCode;
-        fault.completionCode = completionCode;
-        bmc.faults.push_back(fault);
+    /// A way to the BMC as it is described now.
+    NQORTQR20::SPLibrary* FreshLibrary() {
+        library_.reset();
+        return Library();
     }
-    /// The call-th use (0 for every use) of a Storage command gets no response.
+    void FailWith(std::uint8_t command, unsigned call, std::uint8_t completionCode) {
+        bmc.faults.push_back(CompletionCode(command, call, completionCode));
+    }
     void Silence(std::uint8_t command, unsigned call) {
-        ipmisim::Fault fault;
-        fault.netFn = 0x0A;
-        fault.command = command;
-        if (call != 0) fault.call = call;
-        bmc.faults.push_back(fault);
+        bmc.faults.push_back(NoResponse(command, call));
+    }
+    /// The request frames in hexadecimal digits.
+    std::vector<std::string> Frames() const {
+        std::vector<std::string> frames;
+        for (const auto& frame : requests) {
+            frames.push_back(ipmisel::DumpBytes(frame, ipmisel::Digits::kUpperHex));
+        }
+        return frames;
     }
 
 private:
     std::unique_ptr<NQORTQR20::SPLibrary> library_;
-};
-
-/// The instances of a collection, in memory.
-class InstanceRecorder : public tqrhost::WholeInstanceSink {
-public:
-    std::vector<tqrhost::Instance> instances;
-    /// A property that the host refuses, as a full disk would: every time it is written.
-    std::string refusedProperty;
-
-    bool AddProperty(std::string_view name, const tqrhost::PropertyValue& value) override {
-        if (!refusedProperty.empty() && name == refusedProperty) return false;
-        return WholeInstanceSink::AddProperty(name, value);
-    }
-
-protected:
-    bool Take(const tqrhost::Instance& instance) override {
-        instances.push_back(instance);
-        return true;
-    }
 };
 
 /// The text of a property; empty optional when the instance has none of that name.
@@ -125,5 +145,35 @@ inline std::optional<std::string> TextOf(const tqrhost::Instance& instance, std:
     }
     return std::nullopt;
 }
+
+/// The instances of a collection, in memory.
+class InstanceRecorder : public tqrhost::WholeInstanceSink {
+public:
+    std::vector<tqrhost::Instance> instances;
+    /// A property that the host refuses the next time that it is written.
+    std::string refusedProperty;
+
+    bool AddProperty(std::string_view name, const tqrhost::PropertyValue& value) override {
+        if (refusedProperty.empty() || name != refusedProperty) {
+            return WholeInstanceSink::AddProperty(name, value);
+        }
+        refusedProperty.clear();
+        return false;
+    }
+    /// The texts of one property in all instances.
+    std::vector<std::string> Texts(std::string_view property) const {
+        std::vector<std::string> texts;
+        for (const tqrhost::Instance& instance : instances) {
+            texts.push_back(TextOf(instance, property).value_or("(none)"));
+        }
+        return texts;
+    }
+
+protected:
+    bool Take(const tqrhost::Instance& instance) override {
+        instances.push_back(instance);
+        return true;
+    }
+};
 
 }  // namespace ipmiseltest

@@ -6,6 +6,8 @@
 #include <string_view>
 #include <vector>
 
+#include "tests/support/wire.h"
+
 // Inventory of FRU devices and their locators, as they come over the wire.
 
 namespace ipmiseltest {
@@ -42,8 +44,8 @@ inline std::vector<std::uint8_t> Runs(std::initializer_list<std::string_view> st
 /// A FRU device locator (IPMI 2.0, table 43-7).
 inline std::vector<std::uint8_t> FruLocator(std::uint16_t id, std::uint8_t device,
                                             std::string_view idString) {
-    std::vector<std::uint8_t> record{static_cast<std::uint8_t>(id),
-                                     static_cast<std::uint8_t>(id >> 8),
+    std::vector<std::uint8_t> record{Low(id),
+                                     High(id),
                                      0x51,
                                      0x11,
                                      static_cast<std::uint8_t>(11 + idString.size()),

@@ -25,6 +25,8 @@
 #include <utility>
 #include <vector>
 
+#include "tests/support/temporary_folder.h"
+
 namespace ipmiseltest {
 
 /// A UDP port of 127.0.0.1 on which nothing listened a moment ago.
@@ -41,33 +43,6 @@ inline std::uint16_t FreeUdpPort() {
     if (!bound) throw std::runtime_error("no free UDP port on 127.0.0.1");
     return ntohs(address.sin_port);
 }
-
-/// A folder that is removed with the object.
-class TemporaryFolder {
-public:
-    TemporaryFolder() {
-        std::string name = (std::filesystem::temp_directory_path() / "ipmisel-XXXXXX").string();
-        if (mkdtemp(name.data()) == nullptr) throw std::runtime_error("no temporary folder");
-        path_ = name;
-    }
-    ~TemporaryFolder() {
-        std::error_code ignored;
-        std::filesystem::remove_all(path_, ignored);
-    }
-    TemporaryFolder(const TemporaryFolder&) = delete;
-    TemporaryFolder& operator=(const TemporaryFolder&) = delete;
-
-    const std::filesystem::path& path() const { return path_; }
-    /// Writes a file there and answers its path.
-    std::string Write(const std::string& name, const std::string& text) const {
-        const auto file = path_ / name;
-        std::ofstream(file, std::ios::binary) << text;
-        return file.string();
-    }
-
-private:
-    std::filesystem::path path_;
-};
 
 /// The BMC of OpenIPMI's ipmi_sim, over RMCP+ on a loopback port, with the user "root" and the
 /// password "secret". It has cipher suite 3 only and wants the workaround opensesspriv. It ends

@@ -62,11 +62,7 @@ protected:
             .code;
     }
     std::vector<std::string> Written(std::string_view property) const {
-        std::vector<std::string> values;
-        for (const tqrhost::Instance& instance : written.instances) {
-            values.push_back(TextOf(instance, property).value_or("(none)"));
-        }
-        return values;
+        return written.Texts(property);
     }
     bool Logged(int severity, const std::string& line) const {
         const auto lines = log.Lines(severity);
@@ -76,19 +72,6 @@ protected:
     long Sent(std::uint8_t command) const {
         return std::count_if(requests.begin(), requests.end(),
                              [&](const auto& frame) { return frame[4] == command; });
-    }
-    static ipmisim::Fault NoResponse(std::uint8_t command, unsigned call) {
-        ipmisim::Fault fault;
-        fault.netFn = 0x0A;
-        fault.command = command;
-        fault.call = call;
-        return fault;
-    }
-    static ipmisim::Fault CompletionCode(std::uint8_t command, unsigned call, std::uint8_t code) {
-        ipmisim::Fault fault = NoResponse(command, call);
-        fault.kind = ipmisim::Fault::Kind::kCompletionCode;
-        fault.completionCode = code;
-        return fault;
     }
 };
 

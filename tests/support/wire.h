@@ -3,6 +3,7 @@
 #include <array>
 #include <cstdint>
 #include <initializer_list>
+#include <numeric>
 #include <string_view>
 #include <vector>
 
@@ -10,34 +11,23 @@
 
 namespace ipmiseltest {
 
+constexpr std::uint8_t Low(std::uint16_t id) { return static_cast<std::uint8_t>(id); }
+constexpr std::uint8_t High(std::uint16_t id) { return static_cast<std::uint8_t>(id >> 8); }
+
 using SelRecord = std::array<std::uint8_t, 16>;
 
 /// A system event record (IPMI 2.0, table 32-1) of the BMC itself.
 inline SelRecord SystemEvent(std::uint16_t id, std::uint8_t sensorType, std::uint8_t sensor,
                              std::uint8_t directionAndType = 0x01, std::uint8_t data1 = 0x59,
                              std::uint8_t data2 = 0x50, std::uint8_t data3 = 0x45) {
-    return {static_cast<std::uint8_t>(id),
-            static_cast<std::uint8_t>(id >> 8),
-            0x02,
-            0xB0,
-            0xE5,
-            0xE6,
-            0x65,
-            0x20,
-            0x00,
-            0x04,
-            sensorType,
-            sensor,
-            directionAndType,
-            data1,
-            data2,
-            data3};
+    return {Low(id), High(id),         0x02,  0xB0,  0xE5, 0xE6, 0x65, 0x20, 0x00, 0x04, sensorType,
+            sensor,  directionAndType, data1, data2, data3};
 }
 
 /// A record of another type; its payload counts up from 0x11.
 inline SelRecord OtherRecord(std::uint16_t id, std::uint8_t recordType) {
-    SelRecord record{static_cast<std::uint8_t>(id), static_cast<std::uint8_t>(id >> 8), recordType};
-    for (std::size_t i = 3; i < record.size(); ++i) record[i] = static_cast<std::uint8_t>(0x0E + i);
+    SelRecord record{Low(id), High(id), recordType};
+    std::iota(record.begin() + 3, record.end(), std::uint8_t{0x11});
     return record;
 }
 
@@ -45,16 +35,10 @@ inline SelRecord OtherRecord(std::uint16_t id, std::uint8_t recordType) {
 inline std::vector<std::uint8_t> FullSensor(std::uint16_t id, std::uint8_t sensor,
                                             std::uint8_t entity, std::uint8_t instance,
                                             std::string_view name) {
-    std::vector<std::uint8_t> record(48);
-    record[0] = static_cast<std::uint8_t>(id);
-    record[1] = static_cast<std::uint8_t>(id >> 8);
-    record[2] = 0x51;
-    record[3] = 0x01;
-    record[4] = static_cast<std::uint8_t>(record.size() + name.size() - 5);
-    record[5] = 0x20;
-    record[7] = sensor;
-    record[8] = entity;
-    record[9] = instance;
+    std::vector<std::uint8_t> record{
+        Low(id), High(id), 0x51,   0x01,   static_cast<std::uint8_t>(43 + name.size()),
+        0x20,    0,        sensor, entity, instance};
+    record.resize(48);
     record[21] = 0x01;  // degrees C
     record[24] = 0x01;  // M
     record[47] = static_cast<std::uint8_t>(0xC0 | name.size());
