@@ -132,10 +132,7 @@ TEST_F(SelExport, EntityNamesAboveTheNumberedOnesReachOnlyTheMessage) {
 
 TEST(EventMessage, RewritesSomeNames) {
     // Entity, instance, sensor type, sensor, deassertion, event.
-    const struct {
-        ipmisel::EventMessage parts;
-        const char* message;
-    } cases[] = {
+    const std::tuple<ipmisel::EventMessage, const char*> cases[] = {
         {{"Processor", "2", "Temperature", "CPU 2 Temp", false, "Too hot. "},
          "Processor 2 (Temperature - CPU 2 Temp): Assertion: Too hot. "},
         {{"Processor", "2", "Temperature", "CPU 2 Temp", true, "Too hot. "},
@@ -156,7 +153,7 @@ TEST(EventMessage, RewritesSomeNames) {
         {{"Board", "1", "Unknown Sensor Unknown", "X", false, ""},
          "Board 1 ( Sensor Unknown - X): Assertion: "},
     };
-    for (const auto& c : cases) EXPECT_EQ(Compose(c.parts), c.message);
+    for (const auto& [parts, message] : cases) EXPECT_EQ(Compose(parts), message);
 }
 
 TEST_F(SelExport, UnknownTypeIsLoggedWithItsIdSwapped) {

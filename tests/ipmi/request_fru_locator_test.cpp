@@ -94,22 +94,18 @@ TEST_F(FruWalk, KeepsFruDeviceLocatorsAlone) {
 }
 
 TEST_F(FruWalk, IdStringIsTheTextOfTheRecord) {
-    const struct {
-        std::string text;
-        std::uint8_t typeLength;
-        std::string idString;
-    } cases[] = {
+    const std::tuple<std::string, std::uint8_t, std::string> cases[] = {
         {"PSU 1", 0xC5, "PSU 1"},  // type bits count as length
         {"PSU 1", 3, "PSU"},
         {"PSU 1", 0x0F, "PSU 1"},  // longer than the record
         {std::string("PS\0U", 4), 4, "PS"},
         {"", 0xC8, ""},
     };
-    for (const auto& c : cases) {
+    for (const auto& [text, typeLength, idString] : cases) {
         bmc.sdrRecords.clear();
-        AddRecord(1, 3, c.text, c.typeLength);
+        AddRecord(1, 3, text, typeLength);
         EXPECT_EQ(Walk(), kOk);
-        EXPECT_THAT(Found(), ElementsAre(c.idString));
+        EXPECT_THAT(Found(), ElementsAre(idString));
     }
 }
 

@@ -15,10 +15,7 @@ const std::string kIndent = kFifteenBlanks;
 
 TEST_F(ThresholdOffset, AppendsThresholdThenReading) {
     const std::string extension = "\n" + kIndent + "Sensor-specific event extension code 0a. \n";
-    const struct {
-        int data1, data2, data3;
-        std::string text;
-    } cases[] = {
+    const std::tuple<int, int, int, std::string> cases[] = {
         {0x51, 0x40, 0x45,
          "<101>. \n" + kIndent + "Trigger threshold value: 69.00 <730>. \n" + kIndent +
              "Trigger reading: 64.00 <730>."},
@@ -30,7 +27,8 @@ TEST_F(ThresholdOffset, AppendsThresholdThenReading) {
         {0xF0, 0x0B, 0x0A,
          "<100>. " + extension + kIndent + "Sensor-specific event extension code 0b."},
     };
-    for (const auto& c : cases) EXPECT_EQ(Threshold(c.data1, c.data2, c.data3), c.text) << c.data1;
+    for (const auto& [data1, data2, data3, text] : cases)
+        EXPECT_EQ(Threshold(data1, data2, data3), text) << data1;
     EXPECT_EQ(log.All().front().second, "IPMIMapping::GetThresholdOffset() function entered.");
     EXPECT_EQ(log.All().back().second, "IPMIMapping::GetThresholdOffset() function completed.");
 }
@@ -78,10 +76,7 @@ TEST_F(SensorOffset, OffsetsEndWithTheirSensorType) {
 }
 
 TEST_F(SensorOffset, HeldTexts) {
-    const struct {
-        int sensorType, offset;
-        const char* text;
-    } cases[] = {
+    const std::tuple<int, int, const char*> cases[] = {
         {0x07, 9, "<259>. "},
         {0x07, 10, "Processor Automatically Throttled. "},
         {0x07, 11, ""},
@@ -97,8 +92,8 @@ TEST_F(SensorOffset, HeldTexts) {
         {0xD0, 15, "SEL Fullness"},
         {0xD2, 6, "CPU Cores"},
         {0xD2, 7, ""}};
-    for (const auto& c : cases) {
-        EXPECT_EQ(Sensor(c.sensorType, c.offset), c.text) << c.sensorType << " " << c.offset;
+    for (const auto& [sensorType, offset, text] : cases) {
+        EXPECT_EQ(Sensor(sensorType, offset), text) << sensorType << " " << offset;
     }
     EXPECT_EQ(log.Lines(0).size(), 0u);
 }

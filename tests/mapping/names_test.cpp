@@ -8,31 +8,27 @@
 namespace {
 
 TEST(SensorType, NamesStandardAndOemTypes) {
-    const struct {
-        int sensorType;
-        unsigned sensorNumber;
-        const char* name;
-    } cases[] = {{0x00, 0, "Unknown Sensor Type"},
-                 {0x01, 0x65, "Temperature"},
-                 {0x14, 0, "Button"},
-                 {0x28, 0, "Managment Subsystem Health"},
-                 {0x2C, 0, "FRU State"},
-                 {0x2D, 0, "Unknown Sensor Type"},
-                 {0xC1, 0x60, "Drive Status"},
-                 {0xD1, 0x65, "Drive Status"},
-                 {0xD1, 0x68, "Drive/Slot Status"},
-                 {0xD1, 0x94, "CPU 1 Mismatch"},
-                 {0xC1, 0x97, "CPU 4 Mismatch"},
-                 {0xC1, 0x98, "Drive/Slot Status"},
-                 {0xD1, 0x70, "Drive/Slot Status"},
-                 {0xD0, 0x60, "SEL Fullness"},
-                 {-1, 0, "Unknown Sensor Type"},
-                 {0x1000001, 0, "Unknown Sensor Type"}};
+    const std::tuple<int, unsigned, const char*> cases[] = {{0x00, 0, "Unknown Sensor Type"},
+                                                            {0x01, 0x65, "Temperature"},
+                                                            {0x14, 0, "Button"},
+                                                            {0x28, 0, "Managment Subsystem Health"},
+                                                            {0x2C, 0, "FRU State"},
+                                                            {0x2D, 0, "Unknown Sensor Type"},
+                                                            {0xC1, 0x60, "Drive Status"},
+                                                            {0xD1, 0x65, "Drive Status"},
+                                                            {0xD1, 0x68, "Drive/Slot Status"},
+                                                            {0xD1, 0x94, "CPU 1 Mismatch"},
+                                                            {0xC1, 0x97, "CPU 4 Mismatch"},
+                                                            {0xC1, 0x98, "Drive/Slot Status"},
+                                                            {0xD1, 0x70, "Drive/Slot Status"},
+                                                            {0xD0, 0x60, "SEL Fullness"},
+                                                            {-1, 0, "Unknown Sensor Type"},
+                                                            {0x1000001, 0, "Unknown Sensor Type"}};
     IPMIMapping mapping;
-    for (const auto& c : cases) {
+    for (const auto& [sensorType, sensorNumber, name] : cases) {
         char out[128] = "stale";
-        EXPECT_EQ(mapping.GetSensorType(nullptr, c.sensorType, out, 128, c.sensorNumber), 0);
-        EXPECT_STREQ(out, c.name) << c.sensorType << " " << c.sensorNumber;
+        EXPECT_EQ(mapping.GetSensorType(nullptr, sensorType, out, 128, sensorNumber), 0);
+        EXPECT_STREQ(out, name) << sensorType << " " << sensorNumber;
     }
     char small[5];
     mapping.GetSensorType(nullptr, 0x01, small, sizeof small, 0);

@@ -13,11 +13,7 @@ TEST(NumberedTexts, LookupRules) {
     const auto filler = [](std::size_t length, const char* rest) {
         return std::string(length, 'x') + rest;
     };
-    const struct {
-        std::string contents;
-        std::size_t capacity;
-        const char* text;
-    } cases[] = {
+    const std::tuple<std::string, std::size_t, const char*> cases[] = {
         {"4=four\n5=five\n6=six\n", 256, "five"},
         {"535=longer\n15=other\n5=own\n", 256, "longer"},  // the key counts anywhere
         {"; see 5= here\n5=own\n", 256, " here"},
@@ -42,9 +38,9 @@ TEST(NumberedTexts, LookupRules) {
         {"5=abcdef\n", 2, ""},
         {"5=abcdef\n", 0, ""},
     };
-    for (const auto& c : cases) {
-        EXPECT_EQ(ipmisel::FindNumberedText(c.contents, 5, c.capacity), c.text)
-            << c.contents << " " << c.capacity;
+    for (const auto& [contents, capacity, text] : cases) {
+        EXPECT_EQ(ipmisel::FindNumberedText(contents, 5, capacity), text)
+            << contents << " " << capacity;
     }
 }
 

@@ -15,10 +15,7 @@ TEST(OemRecord, LosesNothing) {
     using Operation =
         int (IPMIMapping::*)(NQORTQR20::TCPluginCallbacks*, const std::uint8_t*, char*, unsigned);
     const char* const all = "OEM data: 57 01 00 44 69 73 6B 00 61 62 63 7F 80. Text: \"Disk\"";
-    const struct {
-        Operation operation;
-        const char* text;
-    } cases[] = {
+    const std::tuple<Operation, const char*> cases[] = {
         {&IPMIMapping::GetOEMxC0, "Manufacturer ID: 343 (0x000157). OEM data: 44 69"},
         {&IPMIMapping::GetOEMxC1, "Manufacturer ID: 343 (0x000157). OEM data: 44 69 73 6B"},
         {&IPMIMapping::GetOEMxE0, "OEM data: 57 01 00 44 69 73 6B 00 61 62. Text: \"Disk\""},
@@ -27,15 +24,15 @@ TEST(OemRecord, LosesNothing) {
         {&IPMIMapping::GetOEMxE3, all},
     };
     IPMIMapping mapping;
-    for (const auto& c : cases) {
+    for (const auto& [operation, text] : cases) {
         char out[128];
-        EXPECT_EQ((mapping.*c.operation)(nullptr, kBytes.data(), out, sizeof out), 0);
-        EXPECT_STREQ(out, c.text);
-        EXPECT_EQ((mapping.*c.operation)(nullptr, kBytes.data(), out, 4), 0);
-        EXPECT_EQ(std::string(out), std::string(c.text).substr(0, 3));
-        EXPECT_NE((mapping.*c.operation)(nullptr, kBytes.data(), out, 0), 0);
-        EXPECT_NE((mapping.*c.operation)(nullptr, nullptr, out, sizeof out), 0);
-        EXPECT_NE((mapping.*c.operation)(nullptr, kBytes.data(), nullptr, 4), 0);
+        EXPECT_EQ((mapping.*operation)(nullptr, kBytes.data(), out, sizeof out), 0);
+        EXPECT_STREQ(out, text);
+        EXPECT_EQ((mapping.*operation)(nullptr, kBytes.data(), out, 4), 0);
+        EXPECT_EQ(std::string(out), std::string(text).substr(0, 3));
+        EXPECT_NE((mapping.*operation)(nullptr, kBytes.data(), out, 0), 0);
+        EXPECT_NE((mapping.*operation)(nullptr, nullptr, out, sizeof out), 0);
+        EXPECT_NE((mapping.*operation)(nullptr, kBytes.data(), nullptr, 4), 0);
     }
 }
 

@@ -11,11 +11,7 @@ class SensorUnits : public ipmiseltest::MappingTest {};
 
 // Fields in the order of the record: type, units 1 to 3, linearization, M, B, R and B exponents.
 TEST_F(SensorUnits, ConvertsAndFormats) {
-    const struct {
-        s_SDR_Mod_Units units;
-        int reading;
-        const char* text;
-    } cases[] = {
+    const std::tuple<s_SDR_Mod_Units, int, const char*> cases[] = {
         {{1, 0x00, 1, 0, 0, 2, 0, 0, 0}, 0x20, "64.00 <731>"},
         {{1, 0x00, 1, 0, 0, 0x3FF, 0, 0, 0}, 5, "-5.00 <731>"},
         {{1, 0x00, 4, 0, 0, 195, 0, 0xD, 0}, 0xC8, "39.00 <734>"},
@@ -36,7 +32,7 @@ TEST_F(SensorUnits, ConvertsAndFormats) {
         {{1, 0x06, 5, 24, 0, 1, 0, 0, 0}, 45, "45.00 reserved units"},
         {{1, 0x00, 93, 0, 0, 1, 0, 0, 0}, 45, "45.00 "},  // no unit, and none of another list
     };
-    for (const auto& c : cases) EXPECT_EQ(Units(&c.units, c.reading), c.text);
+    for (const auto& [units, reading, text] : cases) EXPECT_EQ(Units(&units, reading), text);
     EXPECT_EQ(Units(nullptr, 45), "45.00 <730>");
 }
 
@@ -70,14 +66,12 @@ TEST_F(SensorUnits, WithinTheBufferAndCutToTheRoomOfAReading) {
 }
 
 TEST_F(SensorUnits, OnesComplement) {
-    const struct {
-        int value;
-        const char* text;
-    } cases[] = {{0xFE, "-1"}, {0x80, "-127"}, {0xFF, "-0"}, {0x00, "0"}, {0x7F, "127"}};
-    for (const auto& c : cases) {
+    const std::tuple<int, const char*> cases[] = {
+        {0xFE, "-1"}, {0x80, "-127"}, {0xFF, "-0"}, {0x00, "0"}, {0x7F, "127"}};
+    for (const auto& [value, text] : cases) {
         char out[16];
-        EXPECT_EQ(mapping.GetOnesComplement(context.get(), static_cast<char>(c.value), out, 16), 0);
-        EXPECT_STREQ(out, c.text);
+        EXPECT_EQ(mapping.GetOnesComplement(context.get(), static_cast<char>(value), out, 16), 0);
+        EXPECT_STREQ(out, text);
     }
     EXPECT_THAT(log.Lines(4), Contains("IPMIMapping::GetOnesComplement() function completed."));
 }

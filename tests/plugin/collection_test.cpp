@@ -163,37 +163,31 @@ TEST_F(Pass, SelInfoIsAskedForTwice) {
 }
 
 TEST_F(Pass, SensorsReadBeforeAFailureAreUsed) {
-    const struct {
-        ipmisim::Fault fault;
-        std::vector<std::string> names;
-    } cases[] = {
+    const std::tuple<ipmisim::Fault, std::vector<std::string>> cases[] = {
         {NoResponse(kGetSdrInfo, 1), {"", "", ""}},
         {CompletionCode(kGetSdr, 4, 0xC5), {"Ambient", "", "Ambient"}},  // header of the second
     };
-    for (const auto& c : cases) {
+    for (const auto& [fault, names] : cases) {
         written.instances.clear();
-        nodes[0].faults = {c.fault};
+        nodes[0].faults = {fault};
         EXPECT_EQ(Collect({kLog}), 0);
         EXPECT_TRUE(Logged(0, "Could not collect all sensor data records\n"));
-        EXPECT_EQ(Logged(1, "No SDR data obtained.\n"), c.names[0].empty());
-        EXPECT_EQ(Written("SensorInformation"), c.names);
+        EXPECT_EQ(Logged(1, "No SDR data obtained.\n"), names[0].empty());
+        EXPECT_EQ(Written("SensorInformation"), names);
     }
 }
 
 TEST_F(Pass, WalkThatEndsEarlyExportsWhatWasRead) {
-    const struct {
-        ipmisim::Fault fault;
-        std::size_t exported;
-    } cases[] = {
+    const std::tuple<ipmisim::Fault, std::size_t> cases[] = {
         {NoResponse(kGetSelEntry, 1), 0},
         {NoResponse(kGetSelEntry, 3), 2},
         {CompletionCode(kGetSelEntry, 2, 0xCB), 1},
     };
-    for (const auto& c : cases) {
+    for (const auto& [fault, exported] : cases) {
         written.instances.clear();
-        nodes[0].faults = {c.fault};
+        nodes[0].faults = {fault};
         EXPECT_EQ(Collect({kLog}), 0);
-        EXPECT_EQ(written.instances.size(), c.exported);
+        EXPECT_EQ(written.instances.size(), exported);
         EXPECT_TRUE(Logged(1, "Failed to fill all the entries into SEL array.\n"));
         EXPECT_TRUE(Logged(4, "num_SELentries = 3"));
     }
@@ -246,24 +240,21 @@ TEST_F(Pass, AuxiliaryLogStatusMayFail) {
 }
 
 TEST_F(Pass, FruAndFirmwareAreReadInBandOnly) {
-    const struct {
-        const char* className;
-        const char* line;
-    } cases[] = {
+    const std::tuple<const char*, const char*> cases[] = {
         {kFru, "Getting VPD records."},
         {"QORSG_IPMIFirmwareElement", "Getting BMC firmware data."},
         {"QORSG_CPLDFirmwareElement", "Getting CPLD firmware data."},
         {"QORSG_FPGAFirmwareElement", "Getting FPGA firmware data."},
         {"QORSG_AMIFirmwareElement", "Getting AMI backplane firmware data."},
     };
-    for (const auto& c : cases) {
+    for (const auto& [className, line] : cases) {
         ipmisel::Module().ipmifruonce = false;
         facts.ipmiLan = true;
-        EXPECT_EQ(Collect({c.className}), 0);
-        EXPECT_FALSE(Logged(3, c.line));
+        EXPECT_EQ(Collect({className}), 0);
+        EXPECT_FALSE(Logged(3, line));
         facts.ipmiLan = false;
-        EXPECT_EQ(Collect({c.className}), 0);
-        EXPECT_TRUE(Logged(3, c.line));
+        EXPECT_EQ(Collect({className}), 0);
+        EXPECT_TRUE(Logged(3, line));
     }
 }
 

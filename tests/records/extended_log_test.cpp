@@ -53,17 +53,15 @@ TEST(ExtendedLog, ExtendedDataStaysInsideTheEntry) {
 TEST(ExtendedLog, NamesClassAndSubclass) {
     IPMIExtendedSELDataEntry entry;
     EXPECT_EQ(entry.GetClassString() + entry.GetSubclassString(), "Not setNot set");
-    const struct {
-        std::uint8_t classCode, subclass;
-        const char* texts;
-    } cases[] = {{0, 7, "Computing/Unknown"},     {1, 9, "Peripheral/Spec Reserved"},
-                 {1, 12, "Peripheral/Network"},   {2, 4, "I/O BUS/Unknown"},
-                 {2, 12, "I/O BUS/I2C"},          {3, 11, "Software/Unknown"},
-                 {3, 18, "Software/DXE Service"}, {3, 255, "Software/Unknown"}};
-    for (const auto& c : cases) {
-        entry.SetSubclass(c.subclass);
-        entry.SetClass(c.classCode);
-        EXPECT_EQ(entry.GetClassString() + "/" + entry.GetSubclassString(), c.texts);
+    const std::tuple<std::uint8_t, std::uint8_t, const char*> cases[] = {
+        {0, 7, "Computing/Unknown"},     {1, 9, "Peripheral/Spec Reserved"},
+        {1, 12, "Peripheral/Network"},   {2, 4, "I/O BUS/Unknown"},
+        {2, 12, "I/O BUS/I2C"},          {3, 11, "Software/Unknown"},
+        {3, 18, "Software/DXE Service"}, {3, 255, "Software/Unknown"}};
+    for (const auto& [classCode, subclass, texts] : cases) {
+        entry.SetSubclass(subclass);
+        entry.SetClass(classCode);
+        EXPECT_EQ(entry.GetClassString() + "/" + entry.GetSubclassString(), texts);
     }
 }
 

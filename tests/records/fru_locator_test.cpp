@@ -34,11 +34,7 @@ TEST(FruLocator, MarkerSelectsTheFixedLayout) {
 }
 
 TEST(FruLocator, RunAtTheEndIsKeptWithoutBracketTests) {
-    const struct {
-        int at;
-        std::string bytes;
-        std::vector<std::string> strings;
-    } cases[] = {
+    const std::tuple<int, std::string, std::vector<std::string>> cases[] = {
         {3, std::string("ABC\0X\0(12)\0", 11), {"ABC", "(12)"}},
         {3, "A]B[", {}},
         {3, "FOO(", {"FOO("}},
@@ -48,10 +44,10 @@ TEST(FruLocator, RunAtTheEndIsKeptWithoutBracketTests) {
         // The fixed layout, all of it behind the end.
         {309, std::string("\x01%\x00", 3), {"No chassis part number", "", "", "", "", ""}},
     };
-    for (const auto& c : cases) {
+    for (const auto& [at, bytes, strings] : cases) {
         IPMIFRULocator locator;
-        Put(&locator, c.at, c.bytes);
-        EXPECT_EQ(StringsOf(locator), c.strings) << c.bytes;
+        Put(&locator, at, bytes);
+        EXPECT_EQ(StringsOf(locator), strings) << bytes;
     }
 }
 

@@ -168,21 +168,18 @@ protected:
 };
 
 TEST_F(Timestamp, IsTheCalendarTimeWithTheLocalOffset) {
-    const struct {
-        int raw;
-        std::string time;
-        const char* addition;
-    } cases[] = {{0, "19700101000000", "Adding 0 hours to Timestamp."},
-                 {0x1FFFFFFF, "19870105184831", "Adding 0 hours to Timestamp."},
-                 {0x20000000, "19870105184832", "No addition to Timestamp."},
-                 {0x65E70304, "20240305113324", "No addition to Timestamp."},
-                 {-1, "19691231235959", "Adding 0 hours to Timestamp."}};
-    for (const auto& c : cases) {
-        const std::string expected = c.time + ".000000+060";
+    const std::tuple<int, std::string, const char*> cases[] = {
+        {0, "19700101000000", "Adding 0 hours to Timestamp."},
+        {0x1FFFFFFF, "19870105184831", "Adding 0 hours to Timestamp."},
+        {0x20000000, "19870105184832", "No addition to Timestamp."},
+        {0x65E70304, "20240305113324", "No addition to Timestamp."},
+        {-1, "19691231235959", "Adding 0 hours to Timestamp."}};
+    for (const auto& [raw, time, addition] : cases) {
+        const std::string expected = time + ".000000+060";
         IPMISELEntry entry;
-        const s_SEL_row row = ipmiseltest::Row(
-            ipmisel::Format("0 0 0 1 0 2 %x %x %x %x", c.raw & 0xFF, c.raw >> 8 & 0xFF,
-                            c.raw >> 16 & 0xFF, c.raw >> 24 & 0xFF));
+        const s_SEL_row row =
+            ipmiseltest::Row(ipmisel::Format("0 0 0 1 0 2 %x %x %x %x", raw & 0xFF, raw >> 8 & 0xFF,
+                                             raw >> 16 & 0xFF, raw >> 24 & 0xFF));
         ASSERT_EQ(entry.ScanSELDataFile(nullptr, &row, 0), 0U);
         log.Clear();
         char out[64] = {};
@@ -191,12 +188,12 @@ TEST_F(Timestamp, IsTheCalendarTimeWithTheLocalOffset) {
         EXPECT_THAT(
             log.Lines(4),
             ElementsAre(
-                "IPMISELEntry::GetTimestamp() function entered.", c.addition,
-                "RawTimeStamp = " + std::to_string(c.raw) + "\n         PreTimeStamp = " + expected,
+                "IPMISELEntry::GetTimestamp() function entered.", addition,
+                "RawTimeStamp = " + std::to_string(raw) + "\n         PreTimeStamp = " + expected,
                 "Timestamp = " + expected, "IPMISELEntry::GetTimestamp() function completed."));
         char boot[5] = "####";
         entry.CopyOSBootTimestamp(nullptr, boot, 4, nullptr, {}, false, false);
-        EXPECT_EQ(boot, c.time.substr(0, 4));
+        EXPECT_EQ(boot, time.substr(0, 4));
     }
 }
 
@@ -211,15 +208,13 @@ TEST_F(Timestamp, BeyondTheCalendarIsNoTime) {
 }
 
 TEST(EventType, NamesDirectionAndClass) {
-    const struct {
-        std::uint8_t byte;
-        const char* text;
-    } cases[] = {{0x00, "Assertion, Unknown event type."}, {0x01, "Assertion, Threshold."},
-                 {0x81, "Deassertion, Threshold."},        {0x02, "Assertion, Generic."},
-                 {0x8C, "Deassertion, Generic."},          {0x0D, "Assertion, Unknown event type."},
-                 {0x6E, "Assertion, Unknown event type."}, {0x6F, "Assertion, Sensor-specific."},
-                 {0x70, "Assertion, Unknown event type."}};
-    for (const auto& c : cases) EXPECT_EQ(EventTypeText(c.byte), c.text) << int{c.byte};
+    const std::tuple<std::uint8_t, const char*> cases[] = {
+        {0x00, "Assertion, Unknown event type."}, {0x01, "Assertion, Threshold."},
+        {0x81, "Deassertion, Threshold."},        {0x02, "Assertion, Generic."},
+        {0x8C, "Deassertion, Generic."},          {0x0D, "Assertion, Unknown event type."},
+        {0x6E, "Assertion, Unknown event type."}, {0x6F, "Assertion, Sensor-specific."},
+        {0x70, "Assertion, Unknown event type."}};
+    for (const auto& [byte, text] : cases) EXPECT_EQ(EventTypeText(byte), text) << int{byte};
 }
 
 TEST(Source, TellsSoftwareFromAddresses) {
@@ -227,17 +222,14 @@ TEST(Source, TellsSoftwareFromAddresses) {
         "535=BIOS. \r\n536=SMI. \n537=System. \n538=OEM. \n539=Remote. \n540=Terminal. \n"
         "541=Reserved. \n543=LUN %d. \n544=Channel %d.\n");
     const tqrhost::PluginContext context(folder.path());
-    const struct {
-        int id;
-        const char* text;
-    } software[] = {{0x00, "BIOS. "},    {0x0F, "BIOS. "},     {0x10, "SMI. "},
-                    {0x20, "System. "},  {0x3F, "OEM. "},      {0x40, "Remote. "},
-                    {0x46, "Remote. "},  {0x47, "Terminal. "}, {0x48, "Reserved. "},
-                    {0x7F, "Reserved. "}};
-    for (const auto& c : software) {
-        EXPECT_EQ(SourceText(context.get(), static_cast<std::uint8_t>(c.id * 2 + 1), 0xF3),
-                  std::string(c.text) + "Channel 15.")
-            << c.id;
+    const std::tuple<int, const char*> software[] = {
+        {0x00, "BIOS. "},     {0x0F, "BIOS. "},    {0x10, "SMI. "},    {0x20, "System. "},
+        {0x3F, "OEM. "},      {0x40, "Remote. "},  {0x46, "Remote. "}, {0x47, "Terminal. "},
+        {0x48, "Reserved. "}, {0x7F, "Reserved. "}};
+    for (const auto& [id, text] : software) {
+        EXPECT_EQ(SourceText(context.get(), static_cast<std::uint8_t>(id * 2 + 1), 0xF3),
+                  std::string(text) + "Channel 15.")
+            << id;
     }
     EXPECT_EQ(SourceText(context.get(), 0x20, 0x2D), "16 (address). LUN 1. Channel 2.");
 }
@@ -255,14 +247,12 @@ TEST(Source, LeavesOutTextsThatAreNotThereAndCutsLongOnes) {
 }
 
 TEST(ShutDown, OnlyPartZeroCarriesComment) {
-    const struct {
-        std::array<std::uint8_t, 5> bytes;
-        const char* text;
-    } cases[] = {{{0, 'a', 0, 'b', 'c'}, "(Shutdown Event): Comment String Part 0: abc"},
-                 {{0, 0, 0, 0, 0}, "(Shutdown Event): Comment String Part 0: "},
-                 {{1, 0x04, 0x03, 0x02, 0x01}, "(Shutdown Event): ReasonCode: 16909060"},
-                 {{2, 0xFE, 0xFF, 0xFF, 0xFF}, "(Shutdown Event): ReasonCode: -2"}};
-    for (const auto& c : cases) EXPECT_EQ(ShutDownText(c.bytes), c.text);
+    const std::tuple<std::array<std::uint8_t, 5>, const char*> cases[] = {
+        {{0, 'a', 0, 'b', 'c'}, "(Shutdown Event): Comment String Part 0: abc"},
+        {{0, 0, 0, 0, 0}, "(Shutdown Event): Comment String Part 0: "},
+        {{1, 0x04, 0x03, 0x02, 0x01}, "(Shutdown Event): ReasonCode: 16909060"},
+        {{2, 0xFE, 0xFF, 0xFF, 0xFF}, "(Shutdown Event): ReasonCode: -2"}};
+    for (const auto& [bytes, text] : cases) EXPECT_EQ(ShutDownText(bytes), text);
 }
 
 }  // namespace

@@ -61,11 +61,7 @@ TEST(ServerFile, TheMachineIsRead) {
 
 TEST(ServerFile, RefusalNamesLineKeyAndReason) {
     // Each is the good file with one thing replaced.
-    const struct {
-        const char* from;
-        const char* to;
-        const char* message;
-    } cases[] = {
+    const std::tuple<const char*, const char*, const char*> cases[] = {
         {"_type", "", "3: machine: no such key here"},
         {"\"SIM-1\"", "5", "3: machine_type: must be a text, not number"},
         {"true, \"ipmi_d", "1, \"ipmi_d", "3: integrated_bmc: must be true or false, not number"},
@@ -96,9 +92,9 @@ TEST(ServerFile, RefusalNamesLineKeyAndReason) {
          "data, not 2 of them"},
         {"\"3f\"", "\"40\"", "19: bmcs[1].faults[3].netfn: a NetFn has six bits, 00 to 3f"},
     };
-    for (const auto& c : cases) {
+    for (const auto& [from, to, message] : cases) {
         std::string text = kWhole;
-        EXPECT_EQ(Refusal(text.replace(text.find(c.from), std::strlen(c.from), c.to)), c.message);
+        EXPECT_EQ(Refusal(text.replace(text.find(from), std::strlen(from), to)), message);
     }
 }
 
