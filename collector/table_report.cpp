@@ -123,9 +123,10 @@ public:
         if (last.empty()) last = "nothing";
         const Outcome outcome = OutcomeOf(end);
         PrintLine("");
-        PrintLine(TerminalText("Collected: " + last +
-                               (outcome.problem.empty() ? ". Complete" : "; " + outcome.problem) +
-                               "."));
+        last += (outcome.problem.empty() ? ". Complete" : "; " + outcome.problem) + ".";
+        for (const std::string& line : Wrap(TerminalText("Collected: " + last), kWidth)) {
+            PrintLine(line);
+        }
     }
 
 private:

@@ -107,7 +107,6 @@ TEST_F(Table, AnyOtherClassIsReadableToo) {
     EXPECT_EQ(Print({one, other}),
               "\nQORSG_New\uFFFD\n"
               "  Name:                    a b\n"
-              "  Last:\n"
               "\n"
               "  RawData:                 01 ab\n"
               "  Log:                     QORSG_Y Name=z\n"
