@@ -6,9 +6,7 @@
 namespace ipmisel {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-using ::testing::Optional;
+using namespace ::testing;
 
 TEST(ByteReader, ReadsLittleEndianAndStaysNotOkPastTheEnd) {
     const std::vector<std::uint8_t> bytes{1, 2, 3, 4, 5, 6, 7, 8};

@@ -5,11 +5,7 @@
 namespace ipmiseltest {
 namespace {
 
-using ::testing::Contains;
-using ::testing::Each;
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-using ::testing::Not;
+using namespace ::testing;
 
 constexpr const char* kAuxClass = "QORSG_ZMCAuxDebugRecord";
 

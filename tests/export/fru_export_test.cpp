@@ -9,10 +9,7 @@ namespace {
 
 using ipmisel::FruNode;
 using ipmisel::PropertyMap;
-using ::testing::Contains;
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-using ::testing::Pair;
+using namespace ::testing;
 
 class FruExport : public BmcTest {
 protected:

@@ -11,10 +11,7 @@
 namespace ipmiseltest {
 namespace {
 
-using ::testing::Contains;
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-using ::testing::Not;
+using namespace ::testing;
 
 constexpr const char* kNoTime = "19700101000000.000000+000";
 

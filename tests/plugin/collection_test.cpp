@@ -30,10 +30,7 @@ std::size_t gRefusedSize = 0;
 namespace ipmiseltest {
 namespace {
 
-using ::testing::Contains;
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-using ::testing::Not;
+using namespace ::testing;
 
 constexpr const char* kLog = "QORSG_IPMILogRecord";
 constexpr const char* kAux = "QORSG_ZMCAuxDebugRecord";

@@ -7,11 +7,7 @@
 namespace ipmiseltest {
 namespace {
 
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::Not;
-using ::testing::SizeIs;
-using ::testing::StartsWith;
+using namespace ::testing;
 
 class DriverNotice : public MachineTest {
 protected:

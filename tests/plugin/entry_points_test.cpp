@@ -13,9 +13,7 @@
 namespace ipmiseltest {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::Pair;
-using ::testing::UnorderedElementsAre;
+using namespace ::testing;
 
 class EntryPoints : public ::testing::Test {
 protected:

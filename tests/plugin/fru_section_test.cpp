@@ -5,9 +5,7 @@
 namespace ipmiseltest {
 namespace {
 
-using ::testing::Contains;
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
+using namespace ::testing;
 
 constexpr const char* kFru = "QORSG_IPMIFRU";
 

@@ -15,9 +15,7 @@ namespace {
 
 using namespace ipmisel;
 using ipmiseltest::Row;
-using ::testing::Contains;
-using ::testing::ElementsAre;
-using ::testing::Pair;
+using namespace ::testing;
 
 // Neighbouring bytes differ; the record ID is 0x1234.
 constexpr const char* kRow = "00 FF FE 34 12 02 A1 A2 A3 64 B3 C2 04 0C 87 6F D1 D2 D3 ";
