@@ -163,6 +163,7 @@ TEST_F(Pass, SensorsReadBeforeAFailureAreUsed) {
     const std::tuple<ipmisim::Fault, std::vector<std::string>> cases[] = {
         {NoResponse(kGetSdrInfo, 1), {"", "", ""}},
         {CompletionCode(kGetSdr, 4, 0xC5), {"Ambient", "", "Ambient"}},  // header of the second
+        {CompletionCode(kGetSdr, 5, 0xC5), {"Ambient", "", "Ambient"}},  // and its units
     };
     for (const auto& [fault, names] : cases) {
         written.instances.clear();

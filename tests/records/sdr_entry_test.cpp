@@ -5,9 +5,8 @@
 #include <cctype>
 #include <memory>
 
-#include "base/text.h"
+#include "tests/mapping/mapping_fixture.h"
 #include "tests/records/text_field.h"
-#include "tests/support/bmc_fixture.h"
 
 namespace {
 
@@ -113,6 +112,26 @@ TEST_F(SdrEntry, RepositoryInformationMustBeOfItsVersion) {
     EXPECT_THAT(log.Lines(1), ElementsAre("This SDR Version (0x52) does not match the current IPMI "
                                           "Version (0x51).\n"));
     EXPECT_THAT(log.Lines(0), ElementsAre("Error in reading data file for SDRInfostring"));
+}
+
+using SdrEntities = ipmiseltest::MappingTest;
+
+TEST_F(SdrEntities, NameTheSensorAndItsEntity) {
+    const std::pair<std::uint8_t, const char*> cases[] = {
+        {0x07, "<1007>"}, {0x28, "<1040>"}, {0x29, "Processing blade"}, {0x35, ""}};
+    for (const auto& [entityId, entityName] : cases) {
+        IPMISDREntry entry;
+        ASSERT_EQ(Scan(SensorTexts(), &entry), 0);
+        entry.entityId = entityId;
+        char id[17], name[64], instance[2];
+        const auto describe = [&](const IPMISDREntry* sensor) {
+            IPMISDREntry::GetSensorSDREntities(sensor, context.get(), &mapping, id, name, instance,
+                                               sizeof id, sizeof name, sizeof instance);
+            return std::string(id) + "|" + name + "|" + std::string(instance, 2);
+        };
+        EXPECT_EQ(describe(&entry), std::string("CPU 1 Temp|") + entityName + "|97");
+        EXPECT_EQ(describe(nullptr), std::string("||\0\0", 4));
+    }
 }
 
 /// Leaks and double frees show under the sanitizer.
