@@ -18,10 +18,13 @@ constexpr std::uint8_t kOutOfRange = 0xC9;
 // Answers, completion code included: version and count; next record ID and one byte of a record;
 // the count of FRU bytes.
 constexpr std::size_t kInfoAnswer = 4;
-constexpr std::size_t kRecordAnswer = 4;
-constexpr std::size_t kWholeSelEntry = 19;
 constexpr std::size_t kFruAnswer = 2;
 constexpr std::size_t kCountAt = 2;
+constexpr std::size_t kRecordAt = 3;
+constexpr std::size_t kSelEntryLength = 16;
+// The length of a sensor record counts what follows its header (IPMI 2.0, clause 43).
+constexpr std::size_t kSdrHeaderLength = 5;
+constexpr std::uint8_t kToTheEnd = 0xFF;
 
 const char* StopText(StopReason reason) {
     return reason == StopReason::kDeadline ? "deadline" : "interrupted";
@@ -40,8 +43,8 @@ bool NodeCompleteness::Whole() const {
 
 ReadingWatch::ReadingWatch(std::unique_ptr<LoopGuard> guard)
     : guard_(std::move(guard)),
-      log_{"Get SEL Info", "Get SEL Entry", kWholeSelEntry, &account_.log, {}},
-      sensors_{"Get SDR Repository Info", "Get SDR", kRecordAnswer, &account_.sensors, {}} {}
+      log_{"Get SEL Info", "Get SEL Entry", true, &account_.log, {}, {}},
+      sensors_{"Get SDR Repository Info", "Get SDR", false, &account_.sensors, {}, {}} {}
 
 std::optional<Response> ReadingWatch::Exchange(const RequestFrame& request) {
     std::optional<Response> response;
@@ -53,17 +56,19 @@ std::optional<Response> ReadingWatch::Exchange(const RequestFrame& request) {
 }
 
 void ReadingWatch::Note(const RequestFrame& request, const std::optional<Response>& response) {
+    const bool askedAgain = std::exchange(lastCommand_, request.command()) == request.command();
     switch (request.command()) {
         case kGetSelInfo:
-            NoteInfo(log_, response);
+            NoteInfo(&log_, askedAgain, response);
             break;
         case kGetSelEntry:
             NoteRecord(&log_, request, response);
             break;
         case kGetSdrRepositoryInfo:
-            NoteInfo(sensors_, response);
+            NoteInfo(&sensors_, askedAgain, response);
             break;
         case kReserveSdrRepository:
+            FinishWalk(&sensors_);
             if (const std::string problem = ProblemOf(response, 3); !problem.empty()) {
                 AddFault({"Reserve SDR Repository", "", problem, true});
             }
@@ -79,18 +84,51 @@ void ReadingWatch::Note(const RequestFrame& request, const std::optional<Respons
     }
 }
 
-void ReadingWatch::NoteInfo(const Source& source, const std::optional<Response>& response) {
-    const std::string what = source.infoCommand;
+const NodeCompleteness& ReadingWatch::Account() {
+    FinishWalk(&log_);
+    FinishWalk(&sensors_);
+    return account_;
+}
+
+void ReadingWatch::NoteInfo(Source* source, bool askedAgain,
+                            const std::optional<Response>& response) {
+    const std::string what = source->infoCommand;
     const std::string problem = ProblemOf(response, kInfoAnswer);
     if (!problem.empty()) {
         AddFault({what, "", problem, true});
         return;
     }
-    // A question that was asked again and then answered left nothing out.
-    std::erase_if(account_.faults, [&what](const ReadFault& fault) { return fault.what == what; });
+    // A question that was asked again at once and then answered left nothing out.
+    if (askedAgain) {
+        std::erase_if(account_.faults,
+                      [&what](const ReadFault& fault) { return fault.what == what; });
+    }
+    // By the count as it was then; the inventory's walk comes before anybody has asked for it.
+    if (source->account->announced) FinishWalk(source);
     ipmisel::ByteReader in(*response);
     in.Skip(kCountAt);
-    source.account->announced = in.U16();
+    source->account->announced = in.U16();
+    FinishWalk(source);
+}
+
+void ReadingWatch::FinishWalk(Source* source) {
+    const Walk walk = std::exchange(source->walk, Walk());
+    const bool whole = walk.fromFirst && walk.ended;
+    if (whole && walk.count < source->account->announced.value_or(0)) {
+        AddFault(
+            {source->readCommand, ipmisel::Format("%04x", source->record), "ended early", true});
+    }
+}
+
+std::size_t ReadingWatch::WholeAnswer(const Source& source, std::uint16_t record,
+                                      std::uint8_t offset, std::uint8_t count) {
+    std::size_t length = source.isLog ? kSelEntryLength : 1;
+    if (!source.isLog && source.record == record && source.recordLength > offset) {
+        length = source.recordLength - offset;
+    } else if (!source.isLog && count != kToTheEnd) {
+        length = std::min<std::size_t>(count, kSdrHeaderLength);
+    }
+    return kRecordAt + (count == kToTheEnd ? length : std::min<std::size_t>(count, length));
 }
 
 void ReadingWatch::NoteRecord(Source* source, const RequestFrame& request,
@@ -99,9 +137,19 @@ void ReadingWatch::NoteRecord(Source* source, const RequestFrame& request,
     in.U16();
     const std::uint16_t record = in.U16();
     const std::uint8_t offset = in.U8();
+    const std::uint8_t count = in.U8();
     // An empty log or repository has no first record.
     if (response && response->front() == kNotPresent && source->account->announced == 0u) return;
-    const std::string problem = ProblemOf(response, source->wholeAnswer);
+    if (offset == 0) {
+        if (record == 0) FinishWalk(source);
+        source->record = record;
+        source->recordLength = 0;
+        if (response && response->size() >= kRecordAt + kSdrHeaderLength) {
+            source->recordLength =
+                kSdrHeaderLength + response->at(kRecordAt + kSdrHeaderLength - 1);
+        }
+    }
+    const std::string problem = ProblemOf(response, WholeAnswer(*source, record, offset, count));
     if (!problem.empty()) {
         AddFault({source->readCommand, ipmisel::Format("%04x", record), problem, true});
         return;
@@ -110,16 +158,24 @@ void ReadingWatch::NoteRecord(Source* source, const RequestFrame& request,
     if (source->counted.empty()) source->counted.resize(0x10000);
     if (!source->counted[record]) ++source->account->read;
     source->counted[record] = true;
+    if (record == 0) source->walk.fromFirst = true;
+    ++source->walk.count;
+    // An ID with a byte of 0xFF ends the one walk or the other.
+    const bool lowEnds = !source->isLog && response->at(1) == 0xFF;
+    if (lowEnds || response->at(2) == 0xFF) source->walk.ended = true;
 }
 
 void ReadingWatch::NoteFru(const RequestFrame& request, const std::optional<Response>& response) {
     ipmisel::ByteReader in(request.data());
     const std::uint8_t device = in.U8();
     const std::uint16_t offset = in.U16();
-    if (response && response->front() == kNotPresent) return;  // absent
+    if (response && response->front() == kNotPresent && offset == 0) return;  // absent
     // A device may be smaller than what is asked for.
     if (response && response->front() == kOutOfRange && offset > 0) return;
-    const std::string problem = ProblemOf(response, kFruAnswer);
+    // The count, and as many bytes as it says.
+    const bool counts = response && response->size() >= kFruAnswer;
+    const std::size_t least = kFruAnswer + (counts ? response->at(1) : 0);
+    const std::string problem = ProblemOf(response, least);
     if (!problem.empty()) {
         AddFault({"Read FRU Data", ipmisel::Format("%04x", device), problem, false});
     }

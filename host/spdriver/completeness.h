@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <memory>
 #include <optional>
@@ -18,23 +19,38 @@ class ReadingWatch : public Transport {
 public:
     explicit ReadingWatch(std::unique_ptr<LoopGuard> guard);
     std::optional<Response> Exchange(const RequestFrame& request) override;
-    const NodeCompleteness& Account() const { return account_; }
+    const NodeCompleteness& Account();
 
 private:
     void Note(const RequestFrame& request, const std::optional<Response>& response);
+    /// One reading from the first record to the last.
+    struct Walk {
+        bool fromFirst = false;
+        bool ended = false;  ///< no next record was named
+        unsigned count = 0;
+    };
     /// An account, and which records it has counted: a record that is read again counts once.
     struct Source {
         const char* infoCommand;
         const char* readCommand;
-        std::size_t wholeAnswer;  ///< bytes of an answer that is not short
+        bool isLog;
         SourceAccount* account;
         std::vector<bool> counted;
+        Walk walk;
+        /// The record whose beginning came last, and its length; 0 when that did not come.
+        std::uint16_t record = 0;
+        std::size_t recordLength = 0;
     };
 
-    void NoteInfo(const Source& source, const std::optional<Response>& response);
+    void NoteInfo(Source* source, bool askedAgain, const std::optional<Response>& response);
+    /// Judges a walk that is over: a second one that was whole does not make up for it.
+    void FinishWalk(Source* source);
     void NoteRecord(Source* source, const RequestFrame& request,
                     const std::optional<Response>& response);
     void NoteFru(const RequestFrame& request, const std::optional<Response>& response);
+    /// Bytes that an answer must have, by what was asked and what is known of the record.
+    static std::size_t WholeAnswer(const Source& source, std::uint16_t record, std::uint8_t offset,
+                                   std::uint8_t count);
     void AddFault(ReadFault fault);
     /// What went wrong with an answer that has to have so many bytes; empty when nothing did.
     std::string ProblemOf(const std::optional<Response>& response, std::size_t least) const;
@@ -43,6 +59,7 @@ private:
     NodeCompleteness account_;
     Source log_;
     Source sensors_;
+    std::uint8_t lastCommand_ = 0;  ///< Storage command
 };
 
 }  // namespace tqrhost

@@ -103,8 +103,11 @@ std::optional<Response> LoopGuard::Read(Walk* walk, bool isEventLog, const Reque
     // The first record is asked for by 0x0000 and comes back in a circle under its own ID.
     if (record == kFirstRecord && answer.own) walk->Given(*answer.own, offset);
     // Every walk over the event log ends at a next record ID of 0xFFxx; over the repository only
-    // 0xFFFF ends them all, and the rest of the last record may still be read after it.
-    if (isEventLog ? answer.next >> 8 == 0xFF : answer.next == kNoNextRecord) walk->ended = true;
+    // 0xFFFF ends them all, and the rest of the last record may still be read after it. Walks go by
+    // what the beginning of a record says, even if the rest says something else.
+    if (offset == 0) {
+        walk->ended = isEventLog ? answer.next >> 8 == 0xFF : answer.next == kNoNextRecord;
+    }
     return response;
 }
 

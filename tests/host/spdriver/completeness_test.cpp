@@ -82,6 +82,16 @@ TEST_F(Completeness, ACircleIsAFaultAndAnAbsentDeviceIsNone) {
     EXPECT_EQ(Faults().size(), 1u);
 }
 
+TEST_F(Completeness, AWalkThatEndsEarlyIsNotMadeUpForByAnother) {
+    bmc.faults = {
+        ipmiseltest::Answer(0x43, 2, {0xFF, 0xFF, 2, 0, 2, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0})};
+    Send(0x40);
+    for (const std::uint8_t record : {0, 2}) Send(0x43, {0, 0, record, 0, 0, 0xFF});
+    ReadLog();
+    EXPECT_EQ(CompletenessOf(*Library()).log.read, 3u);
+    EXPECT_EQ(Faults(), Texts{"Get SEL Entry 0002: ended early"});
+}
+
 TEST_F(Completeness, AnEmptyLogIsWhole) {
     bmc.selEntries.clear();
     Send(0x40);
