@@ -47,6 +47,33 @@ void DumpSdr(const std::vector<s_SDR_entry>& sensors, const InfoText& info) {
     }
 }
 
+/// Whether the text of an answer holds so many bytes, each two digits and a blank.
+template <std::size_t N>
+bool Holds(const char (&field)[N], std::size_t count) {
+    return BoundedView(field, N).size() + 1 >= 3 * count;
+}
+
+/// Takes out the elements of which not everything came, so that none is made from zeros that the
+/// BMC never sent.
+template <typename Elements, typename IsWhole>
+void DropPartial(Elements* elements, IsWhole isWhole, const char* what) {
+    const std::size_t dropped =
+        std::erase_if(*elements, [&](const auto& element) { return !isWhole(element); });
+    if (dropped != 0) WriteLog(kNotice, Format("%zu %s left out: short answers.", dropped, what));
+}
+
+bool IsWholeSensor(const s_SDR_entry& sensor) {
+    constexpr std::size_t kHeaderAndUnits = 13;  // completion code, next record ID, ten bytes
+    constexpr std::size_t kNameHead = 4;         // the same, type and length of the name
+    return Holds(sensor.SDRHeaderData, kHeaderAndUnits) &&
+           Holds(sensor.SDRUnitsData, kHeaderAndUnits) && Holds(sensor.SDRStringData, kNameHead);
+}
+
+bool IsWholeRow(const s_SEL_row& row) {
+    constexpr std::size_t kRow = 19;  // completion code, next record ID, the record
+    return Holds(row.data, kRow);
+}
+
 /// Leaves a node's head entry to the cache as soon as it is in there, however the building ends.
 class HeadHandover {
 public:
@@ -76,6 +103,7 @@ void BuildSdrCache(Node& node) {
         WriteLog(kError, "Could not collect all sensor data records\n");
     }
     DumpSdr(sensors, info);
+    DropPartial(&sensors, IsWholeSensor, "sensors");
 
     const HeadHandover handover(objects);
     if (CreateSDRCache(node.context, objects.sdrHead.get(), objects.sdrCache->get(), &sensors,
@@ -95,12 +123,16 @@ unsigned ReadRecords(Node& node) {
 
     BuildSdrCache(node);
 
+    rows.resize(std::min(filled, count));
+    DropPartial(&rows, IsWholeRow, "log records");
+    filled = static_cast<unsigned>(rows.size());
+    rows.resize(std::max(count, 1U));
     objects.selEntries.assign(count, IPMISELEntry());
     if (FillSELArray(node.context, rows.data(), objects.selEntries.data(), count) != kOk) {
         WriteLog(kWarning, "Failed to fill all the entries into SEL array.\n");
     }
     WriteLog(kTrace, "num_SELentries = " + std::to_string(count));
-    return std::min(filled, count);
+    return filled;
 }
 
 /// The auxiliary log's entries, cleared: the read operation places nothing in them.
