@@ -100,17 +100,20 @@ unsigned IPMIRequestFRULocator::IPMIGetSDRHeader(NQORTQR20::TCPluginCallbacks*,
     if (ReadRecord(kGetSdrHeader, kHeaderOffset, kHeaderCount) != kOk) return trace.Fail();
     ByteReader reply = Reply();
     nextRecordId_ = ReadRecordID(&reply);
-    IPMIFRULocator found;
-    ReadLocator(&reply, &found);
+    ByteReader record = reply;
+    record.Skip(3);
+    const std::uint8_t type = record.U8();
+    record.Skip(2);
+    const std::uint8_t device = record.U8();
     // Compatibility: a locator of device 0 is passed over like any other record
     // (FruWalk.KeepsFruDeviceLocatorsAlone).
-    if (found.GetRecordType() != kFruDeviceLocator || found.GetFRUDevIDSlaveAddr() == 0) {
+    if (type != kFruDeviceLocator || device == 0) {
         WriteLog(kTrace,
                  "This is not a FRU Locator. Exiting IPMIRequestFRULocator::IPMIGetSDRHeader().");
         trace.Silence();
         return kOtherRecord;
     }
-    *locator = std::move(found);
+    ReadLocator(&reply, locator);
     return kOk;
 }
 
@@ -129,6 +132,12 @@ unsigned IPMIRequestFRULocator::IPMIGetSDRString(NQORTQR20::TCPluginCallbacks*,
     const auto end = std::find(
         text.begin(), text.begin() + std::min<std::ptrdiff_t>(std::ssize(text), typeLength), 0);
     locator->SetIDString(std::string(text.begin(), end));
+    constexpr std::uint8_t kLengthBits = 0x1F;
+    if (std::ssize(text) < (typeLength & kLengthBits)) {
+        WriteLog(kNotice,
+                 Format("The ID string of FRU device %u is cut short: %zu of %u bytes.",
+                        locator->GetFRUDevIDSlaveAddr(), text.size(), typeLength & kLengthBits));
+    }
     return kOk;
 }
 
@@ -170,6 +179,10 @@ unsigned IPMIRequestFRULocator::IPMIGetFRUData(NQORTQR20::TCPluginCallbacks*,
         constexpr std::size_t kBeforeData = 2;  // completion code, count
         const auto response = Response();
         const auto data = response.subspan(std::min(response.size(), kBeforeData));
+        if (data.size() != kChunk) {
+            WriteLog(kNotice, Format("FRU device %u answered %zu bytes at offset %u, not %u.",
+                                     device, data.size(), offset, kChunk));
+        }
         locator->SetFRUData(static_cast<int>(offset), data.data(),
                             static_cast<unsigned>(std::min<std::size_t>(data.size(), kChunk)));
     }

@@ -96,9 +96,8 @@ TEST_F(FruWalk, KeepsFruDeviceLocatorsAlone) {
 TEST_F(FruWalk, IdStringIsTheTextOfTheRecord) {
     const std::tuple<std::string, std::uint8_t, std::string> cases[] = {
         {"PSU 1", 0xC5, "PSU 1"},  // type bits count as length
-        {"PSU 1", 3, "PSU"},
-        {"PSU 1", 0x0F, "PSU 1"},  // longer than the record
-        {std::string("PS\0U", 4), 4, "PS"},
+        {"PSU 1", 3, "PSU"},      {std::string("PS\0U", 4), 4, "PS"},
+        {"PSU 1", 0x0F, "PSU 1"},  // from here on longer than the record
         {"", 0xC8, ""},
     };
     for (const auto& [text, typeLength, idString] : cases) {
@@ -106,7 +105,10 @@ TEST_F(FruWalk, IdStringIsTheTextOfTheRecord) {
         AddRecord(1, 3, text, typeLength);
         EXPECT_EQ(Walk(), kOk);
         EXPECT_THAT(Found(), ElementsAre(idString));
+        EXPECT_EQ(log.Lines(kNotice).size(), (typeLength & 0x1FU) > text.size());
     }
+    EXPECT_THAT(log.Lines(kNotice),
+                ElementsAre("The ID string of FRU device 3 is cut short: 0 of 8 bytes."));
 }
 
 TEST_F(FruWalk, OneByteOfFfGoesOn) {
@@ -173,6 +175,9 @@ TEST_F(FruData, EachAnswerFillsItsChunkAsFarAsItGoes) {
     };
     ipmisim::Bytes tooLong(400, 0xCC);
     std::iota(tooLong.begin() + 1, tooLong.begin() + 17, std::uint8_t{0xF1});
+    const auto told = [](const char* what) {
+        return std::pair<int, std::string>(kNotice, std::string("FRU device 7 answered ") + what);
+    };
     const struct {
         std::vector<ipmisim::Fault> faults;
         unsigned from, to;  // untouched
@@ -180,11 +185,11 @@ TEST_F(FruData, EachAnswerFillsItsChunkAsFarAsItGoes) {
         std::pair<int, std::string> line{};
     } cases[] = {
         {{}, 0, 0},
-        {{answer(3, {})}, 32, 48},
-        {{answer(3, {0x10})}, 32, 48},
-        {{answer(3, {0x10, 0x21})}, 33, 48},
-        {{answer(3, {0x03, 0x21, 0x22})}, 34, 48},
-        {{answer(16, tooLong)}, 0, 0},
+        {{answer(3, {})}, 32, 48, 300, told("0 bytes at offset 32, not 16.")},
+        {{answer(3, {0x10})}, 32, 48, 300, told("0 bytes at offset 32, not 16.")},
+        {{answer(3, {0x10, 0x21})}, 33, 48, 300, told("1 bytes at offset 32, not 16.")},
+        {{answer(3, {0x03, 0x21, 0x22})}, 34, 48, 300, told("2 bytes at offset 32, not 16.")},
+        {{answer(16, tooLong)}, 0, 0, 300, told("246 bytes at offset 240, not 16.")},
         {{},
          100,
          256,
@@ -208,7 +213,9 @@ TEST_F(FruData, EachAnswerFillsItsChunkAsFarAsItGoes) {
             const bool untouched = (i >= c.from && i < c.to) || i >= 256;
             EXPECT_EQ(locator.GetFRUData()[i], untouched ? 0xEE : (i + 1) & 0xFF) << i;
         }
-        if (c.to == 256) {
+        if (c.line.second.empty()) {
+            EXPECT_THAT(log.Lines(kNotice), ElementsAre());
+        } else {
             EXPECT_THAT(log.All(), Contains(c.line));
         }
     }
