@@ -36,17 +36,12 @@ std::uint16_t Crc16(Bytes bytes) {
     return static_cast<std::uint16_t>(crc);
 }
 
-bool CrcMatches(Bytes bytes, std::size_t covered) {
-    constexpr std::size_t kAt = 126;
-    return Crc16(bytes.first(covered)) == (bytes[kAt] | bytes[kAt + 1] << 8);
-}
-
 /// Bytes 126 and 127; bit 7 of byte 0 leaves the part that is programmed last out of it.
 bool Ddr3ChecksumMatches(Bytes bytes) {
-    return CrcMatches(bytes, (bytes[0] & 0x80) != 0 ? 117 : 126);
+    constexpr std::size_t kAt = 126;
+    const std::size_t covered = (bytes[0] & 0x80) != 0 ? 117 : kAt;
+    return Crc16(bytes.first(covered)) == (bytes[kAt] | bytes[kAt + 1] << 8);
 }
-
-bool Ddr4ChecksumMatches(Bytes bytes) { return CrcMatches(bytes, 126); }
 
 // ---- Sizes --------------------------------------------------------------------------------------
 
@@ -70,8 +65,8 @@ struct Layout {
     SpdKind kind;
     std::uint8_t typeCode;
     bool (*sizesFit)(Bytes bytes);
-    bool (*checksumMatches)(Bytes bytes);
-    std::size_t vendorAt = 0;  ///< 0: beyond what is read, as all of the following
+    bool (*checksumMatches)(Bytes bytes) = nullptr;  ///< null: the identity is beyond what is read
+    std::size_t vendorAt = 0;
     bool vendorInTwoBytes = false;
     std::size_t serialNumberAt = 0;
     std::size_t partNumberAt = 0;
@@ -83,7 +78,7 @@ constexpr std::size_t kPartNumberLength = 18;
 constexpr std::array<Layout, 3> kLayouts{{
     {SpdKind::kDdr2, 0x08, Ddr2SizesFit, Ddr2ChecksumMatches, 64, false, 95, 73},
     {SpdKind::kDdr3, 0x0B, Ddr3SizesFit, Ddr3ChecksumMatches, 117, true, 122, 128},
-    {SpdKind::kDdr4, 0x0C, Ddr4SizesFit, Ddr4ChecksumMatches},
+    {SpdKind::kDdr4, 0x0C, Ddr4SizesFit},
 }};
 
 /// The text, or kNotAvailable when it may not be shown.
@@ -96,6 +91,12 @@ std::string Shown(const std::string& text) {
 std::string Trimmed(Bytes field) {
     std::string text(field.begin(), std::find(field.begin(), field.end(), 0));
     return text.erase(text.find_last_not_of(' ') + 1);
+}
+
+/// Of zeros alone it has not been programmed, or not been read.
+std::string SerialNumber(Bytes field) {
+    if (std::count(field.begin(), field.end(), 0) == std::ssize(field)) return kNotAvailable;
+    return Format("%02X%02X%02X%02X", field[0], field[1], field[2], field[3]);
 }
 
 std::string Vendor(const Layout& layout, Bytes bytes) {
@@ -112,21 +113,21 @@ std::optional<SpdKind> RecogniseSpd(Bytes bytes) {
     const auto* const layout = std::find_if(kLayouts.begin(), kLayouts.end(), [&](const Layout& l) {
         return l.typeCode == bytes[kTypeAt];
     });
-    if (layout == kLayouts.end() || !layout->sizesFit(bytes) || !layout->checksumMatches(bytes)) {
-        return std::nullopt;
-    }
+    if (layout == kLayouts.end() || !layout->sizesFit(bytes)) return std::nullopt;
     return layout->kind;
 }
 
 std::optional<MemoryModule> DecodeSpd(SpdKind kind, Bytes bytes) {
     const Layout& layout = *std::find_if(kLayouts.begin(), kLayouts.end(),
                                          [&](const Layout& l) { return l.kind == kind; });
-    if (layout.vendorAt == 0 || bytes.size() < kImageLength) return std::nullopt;
-    const Bytes serialNumber = bytes.subspan(layout.serialNumberAt, kSerialNumberLength);
+    if (layout.checksumMatches == nullptr || bytes.size() < kImageLength) return std::nullopt;
+    // The identity is mostly outside what the checksum covers, so it may be right all the same.
+    if (!layout.checksumMatches(bytes)) {
+        WriteLog(kNotice, "The checksum of the memory module's data does not match.");
+    }
     return MemoryModule{
         .vendor = Vendor(layout, bytes),
-        .serialNumber = Format("%02X%02X%02X%02X", serialNumber[0], serialNumber[1],
-                               serialNumber[2], serialNumber[3]),
+        .serialNumber = SerialNumber(bytes.subspan(layout.serialNumberAt, kSerialNumberLength)),
         .partNumber = Shown(Trimmed(bytes.subspan(layout.partNumberAt, kPartNumberLength)))};
 }
 

@@ -16,8 +16,8 @@ inline constexpr const char* kNotAvailable = "Not Available";
 
 enum class SpdKind { kDdr2, kDdr3, kDdr4 };
 
-/// The kind of memory whose image the bytes begin with. Empty for everything else, also for an
-/// image whose checksum does not match.
+/// The kind of memory whose image the bytes begin with, told by type and sizes alone: an image
+/// that is damaged is no data of another kind. Empty for everything else.
 std::optional<SpdKind> RecogniseSpd(std::span<const std::uint8_t> bytes);
 
 struct MemoryModule {
@@ -26,7 +26,8 @@ struct MemoryModule {
     std::string partNumber;
 };
 
-/// What an image of that kind says of its module, kNotAvailable in place of what it does not say.
+/// What an image of that kind says of its module, kNotAvailable in place of what it does not say; a
+/// checksum that does not match is logged.
 /// Empty for DDR4, which keeps all of it beyond the first 256 bytes, and for bytes that end too
 /// early.
 std::optional<MemoryModule> DecodeSpd(SpdKind kind, std::span<const std::uint8_t> bytes);
