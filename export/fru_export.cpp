@@ -118,14 +118,17 @@ bool IsSkippedFru(std::string_view idString) {
            idString.find("Processor") != std::string_view::npos;
 }
 
-void ExportFruDeviceZero(NQORTQR20::TCPluginCallbacks* context, IPMIRequestFRULocator* request,
+bool ExportFruDeviceZero(NQORTQR20::TCPluginCallbacks* context, IPMIRequestFRULocator* request,
                          IPMIVPDEntry* collector) {
     IPMIFRULocator board;
     request->IPMIGetFRUData(context, &board, true);  // a failed read leaves no strings
+    if (collector == nullptr) return false;
     const Strings strings = StringsOf(board);
-    if (!IsAcceptable(strings)) return;
-    AddStrings(strings, collector);
-    Close(collector);
+    if (IsAcceptable(strings)) {
+        AddStrings(strings, collector);
+        Close(collector);
+    }
+    return true;
 }
 
 bool ExportLocatedFrus(const FruNode& node, IPMIRequestFRULocator* request,

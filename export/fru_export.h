@@ -27,8 +27,9 @@ struct FruNode {
 /// Whether a located device is left out, by the ID string of its locator.
 bool IsSkippedFru(std::string_view idString);
 
-/// Device 0 of the node that the request goes to.
-void ExportFruDeviceZero(NQORTQR20::TCPluginCallbacks* context, IPMIRequestFRULocator* request,
+/// Device 0 of the node that the request goes to. It is read in any case; false when there is no
+/// collector to take it.
+bool ExportFruDeviceZero(NQORTQR20::TCPluginCallbacks* context, IPMIRequestFRULocator* request,
                          IPMIVPDEntry* collector);
 
 /// The devices that the sensor repository locates; their inventory is read into `locators`. Of

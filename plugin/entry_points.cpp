@@ -71,9 +71,10 @@ TTQRStatusCode IPMISELGetDataZero(TCPluginCallbacks* context, fdriIOHandle* /*ou
                                   IPMIRequestFRULocator* request) {
     ipmisel::WriteLog(ipmisel::kTrace, "IPMISel: Entering IPMISELGetDataZero");
     try {
-        IPMIVPDEntry* const collector = Module().fIpmiVpdentryFru.get();
-        if (collector == nullptr || request == nullptr) return {kStatusFailed};
-        ipmisel::ExportFruDeviceZero(context, request, collector);
+        if (request == nullptr ||
+            !ipmisel::ExportFruDeviceZero(context, request, Module().fIpmiVpdentryFru.get())) {
+            return {kStatusFailed};
+        }
     } catch (...) {
         return {kStatusFailed};
     }

@@ -113,6 +113,7 @@ TEST_F(FruSection, DeviceZeroNeedsAPass) {
     const tqrhost::OutputHandle output(written);
     IPMIRequestFRULocator request(NQORTQR20::SPLibrary::GetSplibraryInstance(0));
     EXPECT_EQ(IPMISELGetDataZero(context.get(), output.get(), &request).code, 3);
+    EXPECT_EQ(requests.size(), 16U) << "read first";
     ipmisel::Module().fIpmiVpdentryFru = std::make_unique<IPMIVPDEntry>();
     EXPECT_EQ(IPMISELGetDataZero(context.get(), output.get(), nullptr).code, 3);
     EXPECT_EQ(IPMISELGetDataZero(context.get(), output.get(), &request).code, 0);
