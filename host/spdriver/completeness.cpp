@@ -26,6 +26,15 @@ constexpr std::size_t kSelEntryLength = 16;
 constexpr std::size_t kSdrHeaderLength = 5;
 constexpr std::uint8_t kToTheEnd = 0xFF;
 
+/// Takes off what follows the record's end: some BMCs answer a read to the end with more, left over
+/// from other records, which would lengthen the name that ends the record. A name that is longer
+/// by its own length byte than the record's length has it stays.
+void CutToRecord(std::size_t rest, Response* response) {
+    constexpr std::uint8_t kNameLength = 0x1F;
+    const std::size_t name = std::size_t{1} + (response->at(kRecordAt) & kNameLength);
+    response->resize(std::min(response->size(), kRecordAt + std::max(rest, name)));
+}
+
 const char* StopText(StopReason reason) {
     return reason == StopReason::kDeadline ? "deadline" : "interrupted";
 }
@@ -51,18 +60,19 @@ std::optional<Response> ReadingWatch::Exchange(const RequestFrame& request) {
     if (Stopped() == StopReason::kNone) response = guard_->Exchange(request);
     // Not even a completion code: nothing came.
     if (response && response->empty()) response.reset();
-    if (request.netFn() == kNetFnStorage) Note(request, response);
+    if (request.netFn() == kNetFnStorage) Note(request, &response);
     return response;
 }
 
-void ReadingWatch::Note(const RequestFrame& request, const std::optional<Response>& response) {
+void ReadingWatch::Note(const RequestFrame& request, std::optional<Response>* answer) {
+    const std::optional<Response>& response = *answer;
     const bool askedAgain = std::exchange(lastCommand_, request.command()) == request.command();
     switch (request.command()) {
         case kGetSelInfo:
             NoteInfo(&log_, askedAgain, response);
             break;
         case kGetSelEntry:
-            NoteRecord(&log_, request, response);
+            NoteRecord(&log_, request, answer);
             break;
         case kGetSdrRepositoryInfo:
             NoteInfo(&sensors_, askedAgain, response);
@@ -74,7 +84,7 @@ void ReadingWatch::Note(const RequestFrame& request, const std::optional<Respons
             }
             break;
         case kGetSdr:
-            NoteRecord(&sensors_, request, response);
+            NoteRecord(&sensors_, request, answer);
             break;
         case kReadFruData:
             NoteFru(request, response);
@@ -132,7 +142,8 @@ std::size_t ReadingWatch::WholeAnswer(const Source& source, std::uint16_t record
 }
 
 void ReadingWatch::NoteRecord(Source* source, const RequestFrame& request,
-                              const std::optional<Response>& response) {
+                              std::optional<Response>* answer) {
+    const std::optional<Response>& response = *answer;
     ipmisel::ByteReader in(request.data());
     in.U16();
     const std::uint16_t record = in.U16();
@@ -154,7 +165,12 @@ void ReadingWatch::NoteRecord(Source* source, const RequestFrame& request,
         AddFault({source->readCommand, ipmisel::Format("%04x", record), problem, true});
         return;
     }
-    if (offset != 0) return;
+    if (offset != 0) {
+        if (source->record == record && source->recordLength > offset) {
+            CutToRecord(source->recordLength - offset, &**answer);
+        }
+        return;
+    }
     if (source->counted.empty()) source->counted.resize(0x10000);
     if (!source->counted[record]) ++source->account->read;
     source->counted[record] = true;

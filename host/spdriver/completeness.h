@@ -22,7 +22,7 @@ public:
     const NodeCompleteness& Account();
 
 private:
-    void Note(const RequestFrame& request, const std::optional<Response>& response);
+    void Note(const RequestFrame& request, std::optional<Response>* answer);
     /// One reading from the first record to the last.
     struct Walk {
         bool fromFirst = false;
@@ -45,8 +45,7 @@ private:
     void NoteInfo(Source* source, bool askedAgain, const std::optional<Response>& response);
     /// Judges a walk that is over: a second one that was whole does not make up for it.
     void FinishWalk(Source* source);
-    void NoteRecord(Source* source, const RequestFrame& request,
-                    const std::optional<Response>& response);
+    void NoteRecord(Source* source, const RequestFrame& request, std::optional<Response>* answer);
     void NoteFru(const RequestFrame& request, const std::optional<Response>& response);
     /// Bytes that an answer must have, by what was asked and what is known of the record.
     static std::size_t WholeAnswer(const Source& source, std::uint16_t record, std::uint8_t offset,
