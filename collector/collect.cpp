@@ -152,6 +152,7 @@ NQORTQR20::TTQRStatusCode RunClasses(tqrhost::Plugin& plugin,
 tqrhost::Source OpenSource(const Options& options) {
     tqrhost::SourceOptions access = options.source;
     access.password = [&options] { return ReadPassword(options.passwordFile); };
+    access.kg = [&options] { return ReadKg(options.kgFile); };
     try {
         return tqrhost::OpenSources(options.sources, access);
     } catch (const tqrhost::SourceUsageError& error) {

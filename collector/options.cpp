@@ -139,6 +139,12 @@ std::optional<Options> ParseOptions(int argc, char** argv, int* exitStatus) {
         ->type_name("FILE")
         ->check(FileName());
     collect
+        ->add_option("--kg-file", options.kgFile,
+                     "File with the BMC's own key (Kg) in its first line, as text or 0x and "
+                     "hexadecimal digits; else IPMISEL_KG, else none")
+        ->type_name("FILE")
+        ->check(FileName());
+    collect
         ->add_option("--cipher-suite", options.source.cipherSuite,
                      "Cipher suite by number; 17, else 3 when left out")
         ->type_name("N")

@@ -22,6 +22,7 @@ struct Options {
     std::optional<std::string> logFile;
     std::optional<std::string> plugin;
     std::optional<std::string> passwordFile;
+    std::optional<std::string> kgFile;
     tqrhost::SourceOptions source;
     std::optional<double> deadlineSeconds;
 };

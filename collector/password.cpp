@@ -7,10 +7,12 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <charconv>
 #include <csignal>
 #include <cstdlib>
 #include <cstring>
 #include <iterator>
+#include <string_view>
 
 #include "collector/failure.h"
 
@@ -36,10 +38,10 @@ private:
 
 [[noreturn]] void Refuse(const std::string& line) { throw Failure(kExitUsage, line); }
 
-std::string FromFile(const std::string& name) {
-    const auto refuse = [&name](const char* why) {
-        Refuse("cannot read a password from " + name + ": " + why +
-               "; name a file with the password in its first line");
+std::string FromFile(const std::string& name, const std::string& what) {
+    const auto refuse = [&name, &what](const char* why) {
+        Refuse("cannot read a " + what + " from " + name + ": " + why + "; name a file with the " +
+               what + " in its first line");
     };
     const Descriptor file(open(name.c_str(), O_RDONLY | O_CLOEXEC));
     if (file.get() < 0) refuse(std::strerror(errno));
@@ -138,12 +140,38 @@ std::string FromTerminal() {
     return *password;
 }
 
+constexpr std::size_t kLongestKg = 20;  // IPMI 2.0, clause 13.33
+
+/// The bytes of an even number of hexadecimal digits; empty for anything else.
+std::vector<std::uint8_t> FromHex(std::string_view digits) {
+    std::vector<std::uint8_t> bytes(digits.size() / 2);
+    for (std::size_t i = 0; i < bytes.size(); ++i) {
+        const char* const pair = digits.data() + 2 * i;
+        if (std::from_chars(pair, pair + 2, bytes[i], 16).ptr != pair + 2) return {};
+    }
+    return digits.size() % 2 == 0 ? bytes : std::vector<std::uint8_t>();
+}
+
 }  // namespace
 
 std::string ReadPassword(const std::optional<std::string>& file) {
-    if (file) return FromFile(*file);
+    if (file) return FromFile(*file, "password");
     if (const char* given = std::getenv("IPMISEL_PASSWORD")) return given;
     return FromTerminal();
+}
+
+std::vector<std::uint8_t> ReadKg(const std::optional<std::string>& file) {
+    const char* const given = std::getenv("IPMISEL_KG");
+    if (!file && given == nullptr) return {};
+    const std::string text = file ? FromFile(*file, "key") : given;
+    const bool isHex = text.starts_with("0x");
+    auto key = isHex ? FromHex(std::string_view(text).substr(2))
+                     : std::vector<std::uint8_t>(text.begin(), text.end());
+    if (key.empty() || key.size() > kLongestKg) {
+        Refuse("the key of the BMC (Kg) from " + (file ? *file : "IPMISEL_KG") +
+               " is none; give 1 to 20 characters, or 0x and 2 to 40 hexadecimal digits");
+    }
+    return key;
 }
 
 }  // namespace ipmisel

@@ -25,7 +25,8 @@ constexpr Advice kAdvice[] = {
     {IPMI_ERR_PASSWORD_VERIFICATION_TIMEOUT,
      "the BMC fell silent when the password was checked, so it is probably wrong; check user "
      "name and password"},
-    {IPMI_ERR_K_G_INVALID, "the BMC wants a key of its own (Kg) that was not given; clear its Kg"},
+    {IPMI_ERR_K_G_INVALID,
+     "the BMC has another key of its own (Kg) than was given, or than none; check --kg-file"},
     {IPMI_ERR_PRIVILEGE_LEVEL_INSUFFICIENT,
      "the user's privilege does not suffice; ask for more with --privilege, or use another user"},
     {IPMI_ERR_PRIVILEGE_LEVEL_CANNOT_BE_OBTAINED,

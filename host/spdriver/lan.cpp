@@ -126,6 +126,7 @@ struct Session {
     Address address;
     std::optional<std::string> user;
     std::optional<std::string> password;
+    std::vector<std::uint8_t> kg;
     std::uint8_t privilege;
     unsigned timeoutMilliseconds;
     unsigned workarounds;
@@ -147,6 +148,7 @@ Session MakeSession(const std::string& place, const SourceOptions& options) {
                     ParseAddress(place),
                     options.user,
                     std::nullopt,
+                    {},
                     FindByName(kPrivileges, options.privilege, "privilege")->level,
                     0,
                     WorkaroundFlags(options.workarounds),
@@ -159,6 +161,7 @@ Session MakeSession(const std::string& place, const SourceOptions& options) {
     if (session.password && session.password->size() > IPMI_2_0_MAX_PASSWORD_LENGTH) {
         throw SourceError("the password is longer than the 20 bytes of IPMI 2.0; check it");
     }
+    if (options.kg) session.kg = options.kg();
     constexpr double kLeast = 0.1;
     constexpr double kMost = 24 * 60 * 60;
     session.timeoutMilliseconds =
@@ -176,10 +179,11 @@ int TryOpen(const Session& session, int suite, FreeIpmiContext* opened) {
     const unsigned retransmission =
         std::min(kRetransmissionMilliseconds, session.timeoutMilliseconds / 2);
     if (ipmi_ctx_open_outofband_2_0(context.get(), session.address.Text().c_str(),
-                                    text(session.user), text(session.password), nullptr, 0,
-                                    session.privilege, static_cast<std::uint8_t>(suite),
-                                    session.timeoutMilliseconds, retransmission,
-                                    session.workarounds, IPMI_FLAGS_DEFAULT) < 0) {
+                                    text(session.user), text(session.password),
+                                    session.kg.empty() ? nullptr : session.kg.data(),
+                                    static_cast<unsigned>(session.kg.size()), session.privilege,
+                                    static_cast<std::uint8_t>(suite), session.timeoutMilliseconds,
+                                    retransmission, session.workarounds, IPMI_FLAGS_DEFAULT) < 0) {
         return ipmi_ctx_errnum(context.get());
     }
     *opened = std::move(context);
@@ -231,6 +235,7 @@ std::unique_ptr<LanSession> BeginOwn(const Session& session) {
     LanSessionOptions own;
     own.credentials.user = session.user.value_or("");
     own.credentials.password = session.password.value_or("");
+    own.credentials.kg = session.kg;
     own.credentials.privilege = session.privilege;
     own.credentials.openSessionPrivilege =
         (session.workarounds & IPMI_WORKAROUND_FLAGS_OUTOFBAND_2_0_OPEN_SESSION_PRIVILEGE) != 0;

@@ -55,12 +55,13 @@ struct SourceUsageError : SourceError {
 /// What the user said about access; each kind of source takes what concerns it.
 struct SourceOptions {
     std::optional<std::string> user;
-    std::function<std::string()> password;  ///< asked for only where a password is needed
-    std::optional<int> cipherSuite;         ///< by number; else the best that the BMC has
-    std::string privilege = "admin";        ///< user, operator, admin
-    std::vector<std::string> workarounds;   ///< names of KnownWorkarounds()
-    std::optional<int> window;              ///< requests outstanding, 1 to 15
-    double timeoutSeconds = 20;             ///< how long one request may go unanswered in all
+    std::function<std::string()> password;          ///< asked for only where a password is needed
+    std::function<std::vector<std::uint8_t>()> kg;  ///< the BMC's own key; empty: it has none
+    std::optional<int> cipherSuite;                 ///< by number; else the best that the BMC has
+    std::string privilege = "admin";                ///< user, operator, admin
+    std::vector<std::string> workarounds;           ///< names of KnownWorkarounds()
+    std::optional<int> window;                      ///< requests outstanding, 1 to 15
+    double timeoutSeconds = 20;  ///< how long one request may go unanswered in all
 };
 
 /// A place where a machine is reached: its facts and one transport a BMC node.

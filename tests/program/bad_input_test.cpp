@@ -113,6 +113,12 @@ TEST_F(BadInput, SourcesThatDoNotOpen) {
     ExpectRefused(withFile, 2, "/no/such/password");
     setting.environment["IPMISEL_PASSWORD"] = "secret";
     ExpectRefused(collect("lan:no-such-host.invalid"), 3, "no-such-host.invalid");
+    std::vector<std::string> withKey = collect("lan:127.0.0.1:1");
+    withKey.insert(withKey.end(), {"--kg-file", ""});
+    for (const char* key : {"0x123", "0x12fg", "0x", "more than 20 characters"}) {
+        withKey.back() = folder.Write("kg", key);
+        ExpectRefused(withKey, 2, "Kg");
+    }
     std::vector<std::string> silent = collect("lan:127.0.0.1:1");
     silent.insert(silent.end(), {"--timeout", "1"});
     ExpectRefused(silent, 3, "127.0.0.1:1");
