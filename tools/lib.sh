@@ -32,4 +32,4 @@ install_packages() {
 }
 
 build_packages=(g++ cmake ninja-build pkg-config libfreeipmi-dev libcli11-dev nlohmann-json3-dev)
-test_packages=(ccache googletest openipmi ipmitool freeipmi-tools file python3)
+test_packages=(ccache googletest libgcrypt20-dev openipmi ipmitool freeipmi-tools file python3)

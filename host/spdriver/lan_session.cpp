@@ -38,6 +38,12 @@ bool IsBusy(std::uint8_t completionCode) {
     return completionCode == 0xC0 || completionCode == 0xC3 || completionCode == 0xCF;
 }
 
+/// Of a reservation only the last counts (IPMI 2.0, clause 33.11): an answer to an earlier try
+/// names one that a later try has cancelled.
+bool ChangesTheBmc(const Ask& ask) {
+    return ask.netFn == kNetFnStorage && ask.command == kReserveSdrRepository;
+}
+
 int PollTime(Clock::time_point until, Clock::time_point now) {
     if (until <= now) return 0;
     const auto time = std::chrono::ceil<milliseconds>(until - now);
@@ -123,9 +129,9 @@ void LanSession::BeginAttempt() {
     }
     codec_.Begin(*suite);
     rakp1Repeated_ = false;
-    sequence_ = acknowledged_ = highestReceived_ = receivedBefore_ = 0;
+    sequence_ = acknowledged_ = 0;
     outstanding_.clear();
-    ipmi_check_session_sequence_number_2_0_init(&highestReceived_, &receivedBefore_);
+    received_ = {};
     state_ =
         options_.skipCapabilities || attempts_ > 0 ? State::kOpenSession : State::kCapabilities;
     SendSetup();
@@ -231,6 +237,15 @@ void LanSession::HandleOpenSession(std::span<const std::uint8_t> packet) {
     }
 }
 
+void LanSession::FailRakp3(int error) {
+    // After a repeated RAKP 1 the two sides may hold different random numbers.
+    if (rakp1Repeated_) {
+        RestartAttempt(error);
+    } else {
+        Fail(error);
+    }
+}
+
 void LanSession::HandleSetup(std::span<const std::uint8_t> packet) {
     switch (state_) {
         case State::kCapabilities: {
@@ -272,13 +287,11 @@ void LanSession::HandleSetup(std::span<const std::uint8_t> packet) {
                     SendSetup();
                     return;
                 case rmcpplus::Check::kStatus:
+                    FailRakp3(IPMI_ERR_PASSWORD_INVALID);
+                    return;
                 case rmcpplus::Check::kForged:
-                    // After a repeated RAKP 1 the two sides may hold different random numbers.
-                    if (rakp1Repeated_) {
-                        RestartAttempt(IPMI_ERR_PASSWORD_INVALID);
-                    } else {
-                        Fail(IPMI_ERR_PASSWORD_INVALID);
-                    }
+                    // The password has passed with RAKP 2; what is new here is the BMC's key.
+                    FailRakp3(IPMI_ERR_K_G_INVALID);
                     return;
             }
             return;
@@ -290,8 +303,7 @@ void LanSession::HandleSetup(std::span<const std::uint8_t> packet) {
                 return;
             }
             acknowledged_ = 1;
-            ipmi_check_session_sequence_number_2_0(answer->sequence, &highestReceived_,
-                                                   &receivedBefore_, 0);
+            received_.IsNew(answer->sequence);
             state_ = State::kReady;
             return;
         }
@@ -413,13 +425,23 @@ std::uint8_t LanSession::Send(const Ask& ask, bool wanted) {
     return rqSeq;
 }
 
+bool LanSession::MayGuess(bool again) const {
+    // What is waited for keeps a number of its own for every try: a BMC drops the second packet of
+    // one number, although the answer to the first was lost.
+    const bool retrying = std::any_of(outstanding_.begin(), outstanding_.end(), [](const auto& e) {
+        return e.second.wanted && e.second.tries > 1;
+    });
+    const std::uint32_t kept = again || retrying ? kTriesBeforeReopening : 0;
+    return sequence_ + kept < acknowledged_ + kSequencesAhead;
+}
+
 void LanSession::FillWindow() {
     const unsigned size = window_.Size();
     if (outstanding_.size() >= size || askedAgain_ > 0) return;
     // As many as could be missing: those that are out or ready are passed over below.
     for (const Ask& ask : readAhead_.Next(size + ready_.size())) {
         if (outstanding_.size() >= size) return;
-        if (sequence_ >= acknowledged_ + kSequencesAhead) return;
+        if (!MayGuess(false)) return;
         if (ready_.size() >= kReadyAhead) return;
         if (ready_.count(ask) != 0) continue;
         const bool isOut =
@@ -430,10 +452,7 @@ void LanSession::FillWindow() {
 }
 
 void LanSession::HandleAnswer(const rmcpplus::Answer& answer) {
-    if (ipmi_check_session_sequence_number_2_0(answer.sequence, &highestReceived_, &receivedBefore_,
-                                               0) != 1) {
-        return;  // a replay
-    }
+    if (!received_.IsNew(answer.sequence)) return;  // a replay
     const auto found = outstanding_.find(answer.rqSeq);
     if (found == outstanding_.end() || found->second.ask.netFn != answer.netFn ||
         found->second.ask.command != answer.command) {
@@ -489,13 +508,22 @@ void LanSession::HandleRetries(Clock::time_point now) {
         }
         window_.Lost(request.lastSerial, serial_);
         // A guess is worth one retry; the one that is waited for, all of them.
-        if (request.tries >= (request.wanted ? kMostTries : 2)) {
+        const bool again =
+            request.wanted ? request.tries < kMostTries : request.tries < 2 && MayGuess(true);
+        if (!again) {
             rqSeqFree_[at->first] = now + kRqSeqQuarantine;
             at = request.wanted ? std::next(at) : outstanding_.erase(at);
-            continue;
+        } else if (ChangesTheBmc(request.ask) && sequence_ < acknowledged_ + kSequencesAhead) {
+            rqSeqFree_[at->first] = now + kRqSeqQuarantine;
+            Outstanding moved = std::move(request);
+            at = outstanding_.erase(at);
+            const std::uint8_t rqSeq = FreeRqSeq();
+            SendTry(rqSeq, &moved);
+            outstanding_.emplace(rqSeq, std::move(moved));
+        } else {
+            SendTry(at->first, &request);
+            ++at;
         }
-        SendTry(at->first, &request);
-        ++at;
     }
 }
 

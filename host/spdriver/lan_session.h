@@ -88,6 +88,7 @@ private:
     void SendSetup();
     void HandleSetup(std::span<const std::uint8_t> packet);
     void HandleOpenSession(std::span<const std::uint8_t> packet);
+    void FailRakp3(int error);
     void HandleSetupTimer(Clock::time_point now);
     void RestartAttempt(int otherwise);
     /// An error number of FreeIPMI, for which there is advice.
@@ -99,6 +100,8 @@ private:
     std::uint8_t FreeRqSeq();
     std::uint8_t Send(const Ask& ask, bool wanted);
     void SendTry(std::uint8_t rqSeq, Outstanding* request);
+    /// Whether the BMC's window has room for a guess, or for its second try.
+    bool MayGuess(bool again) const;
     void FillWindow();
     void Receive();
     void HandleAnswer(const rmcpplus::Answer& answer);
@@ -135,8 +138,7 @@ private:
     std::uint32_t sequence_ = 0;      ///< last session sequence number sent
     std::uint32_t acknowledged_ = 0;  ///< highest that the BMC is known to have
     std::uint64_t serial_ = 0;
-    std::uint32_t highestReceived_ = 0;
-    std::uint32_t receivedBefore_ = 0;
+    ReceivedNumbers received_;
     unsigned askedAgain_ = 0;
 };
 

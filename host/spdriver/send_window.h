@@ -41,6 +41,31 @@ private:
     std::uint64_t halvedAt_ = 0;
 };
 
+/// Session sequence numbers of packets that came: each counts once, also when later ones have
+/// overtaken it by up to 31. There is no limit ahead, as a BMC has one: however many answers were
+/// lost, the next is taken.
+class ReceivedNumbers {
+public:
+    bool IsNew(std::uint32_t number) {
+        if (number > highest_) {
+            const std::uint32_t step = number - highest_;
+            seen_ = step < kRemembered ? seen_ << step | 1 : 1;
+            highest_ = number;
+            return true;
+        }
+        const std::uint32_t behind = highest_ - number;
+        if (behind >= kRemembered || (seen_ >> behind & 1) != 0) return false;
+        seen_ |= 1U << behind;
+        return true;
+    }
+
+private:
+    static constexpr std::uint32_t kRemembered = 32;
+
+    std::uint32_t highest_ = 0;
+    std::uint32_t seen_ = 1;  ///< bit n: highest_ - n has come
+};
+
 /// Retry time from the measured round trip (RFC 6298, with a minimum of 200 ms).
 class RoundTrip {
 public:

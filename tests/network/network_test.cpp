@@ -1,0 +1,396 @@
+#include <algorithm>
+#include <chrono>
+#include <cstdlib>
+#include <filesystem>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <random>
+#include <regex>
+#include <set>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "collector/classes.h"
+#include "host/spdriver/stop.h"
+#include "simulator/server_file.h"
+#include "tests/support/ipmi_sim.h"
+#include "tests/support/machine_fixture.h"
+#include "tests/support/rmcpplus_peer.h"
+#include "tests/support/run_program.h"
+
+namespace {
+
+using ipmiseltest::Packet;
+using Packets = std::vector<Packet>;
+using ipmisim::ServerDescription;
+using Peer = ipmiseltest::RmcpPlusPeer;
+using ::testing::HasSubstr;
+
+/// What one collection brought.
+struct Collected {
+    std::vector<std::string> capture;  ///< line by line
+    std::string report;
+    bool whole = true;
+    unsigned outsideWindow = 0, sessions = 0;
+    double seconds = 0;
+};
+
+void ExpectSame(const Collected& found, const Collected& expected, const std::string& where) {
+    const auto [one, other] = std::mismatch(found.capture.begin(), found.capture.end(),
+                                            expected.capture.begin(), expected.capture.end());
+    EXPECT_EQ(one == found.capture.end() ? "" : *one, other == expected.capture.end() ? "" : *other)
+        << where;
+    EXPECT_TRUE(found.report == expected.report) << where;
+}
+
+/// A report as plain text.
+class ReportText : public tqrhost::WholeInstanceSink {
+public:
+    std::string text;
+
+protected:
+    bool Take(const tqrhost::Instance& instance) override {
+        text += instance.className + "\n";
+        for (const auto& [name, value] : instance.properties) {
+            text += "  " + name + "=";
+            if (const auto* const words = std::get_if<std::string>(&value)) text += *words;
+            if (const auto* const bytes = std::get_if<Packet>(&value)) {
+                text += ipmisel::DumpBytes(*bytes, ipmisel::Digits::kUpperHex);
+            }
+            text += "\n";
+        }
+        return true;
+    }
+};
+
+class Network : public ipmiseltest::MachineTest {
+protected:
+    ServerDescription server;
+    tqrhost::SourceOptions options;
+
+    Network() {
+        options.user = "root";
+        options.password = [] { return std::string("secret"); };
+        options.timeoutSeconds = 12;
+    }
+
+    void Describe(const std::string& file) {
+        server = ipmisim::ReadServerFile(file);
+        for (ipmisim::BmcDescription& bmc : server.bmcs) {
+            // What depends on how often something is asked is another thing with guesses.
+            std::erase_if(bmc.faults, [](const ipmisim::Fault& f) { return f.call.has_value(); });
+            if (!bmc.faults.empty()) options.timeoutSeconds = 0.5;
+        }
+    }
+    /// A machine of 40 events, 25 sensors and FRU devices.
+    void DescribeRack() { Describe(IPMISEL_EXAMPLES "/rack-server.json"); }
+
+    Collected CollectFrom(tqrhost::Source source) {
+        source.facts = {server.machineType, server.integratedBmc, server.ipmiDriver,
+                        server.ipmiLan,     server.localTime,     server.smbios};
+        const std::string file = (folder_.path() / "capture").string();
+        const auto capture = tqrhost::RecordTo(file, source);
+        ipmisel::ResetModuleState();
+        IPMISELPluginInit(context.get());
+        tqrhost::OpenMachine(std::move(source));
+        std::vector<const char*> classes;
+        const std::vector<std::string> names = ipmisel::DefaultClasses();
+        for (const std::string& name : names) classes.push_back(name.c_str());
+        ReportText report;
+        const tqrhost::OutputHandle output(report);
+        IPMISELGetData(context.get(), output.get(), classes.data(),
+                       static_cast<int>(classes.size()));
+        Collected collected;
+        for (const auto& node : tqrhost::GetCompleteness()) collected.whole &= node.Whole();
+        tqrhost::CloseMachine();
+        capture->Finish();
+        std::istringstream lines(ipmiseltest::ReadText(file));
+        for (std::string line; std::getline(lines, line);) {
+            // A reservation that was asked for twice is another one.
+            static const std::regex reservation(
+                R"re(("01200a0022.*"response": "00|"01200a002306000000)....)re");
+            collected.capture.push_back(std::regex_replace(line, reservation, "$1"));
+        }
+        collected.report = report.text;
+        return collected;
+    }
+    Collected CollectDirectly() {
+        tqrhost::Source source;
+        for (const ipmisim::BmcDescription& bmc : server.bmcs) {
+            source.nodes.push_back(
+                std::make_unique<ipmiseltest::SimulatedTransport>(bmc, &requests));
+        }
+        return CollectFrom(std::move(source));
+    }
+    /// Every node behind a peer of that character.
+    Collected CollectOver(const Peer::Character& character) {
+        std::vector<std::unique_ptr<Peer>> peers;
+        std::vector<std::string> places;
+        for (const ipmisim::BmcDescription& bmc : server.bmcs) {
+            peers.push_back(std::make_unique<Peer>(bmc, character));
+            places.push_back(peers.back()->Place());
+        }
+        const auto began = std::chrono::steady_clock::now();
+        Collected collected = CollectFrom(tqrhost::OpenSources(places, options));
+        collected.seconds =
+            std::chrono::duration<double>(std::chrono::steady_clock::now() - began).count();
+        for (const auto& peer : peers) {
+            collected.outsideWindow += peer->OutsideWindow();
+            collected.sessions += peer->SessionsOpened();
+        }
+        return collected;
+    }
+    std::string Refusal(const Peer::Character& character) {
+        const Peer peer({}, character);
+        try {
+            tqrhost::OpenSources({peer.Place()}, options);
+        } catch (const tqrhost::SourceError& error) {
+            return error.what();
+        }
+        return "";
+    }
+
+private:
+    ipmiseltest::TemporaryFolder folder_;
+};
+
+/// True so many times of a hundred, the same every time.
+std::function<bool()> Chance(unsigned percent) {
+    return [percent, random = std::mt19937(percent)]() mutable { return random() % 100 < percent; };
+}
+
+/// True for 0.7 seconds from the hundredth packet on.
+std::function<bool(unsigned)> Outage() {
+    using Clock = std::chrono::steady_clock;
+    return [end = std::optional<Clock::time_point>()](unsigned number) mutable {
+        if (number >= 100 && !end) end = Clock::now() + std::chrono::milliseconds(700);
+        return end && Clock::now() < *end;
+    };
+}
+
+Peer::Character Losing(unsigned percent) {
+    Peer::Character character;
+    character.receive = [lost = Chance(percent)](Peer&, Packets* packets) mutable {
+        std::erase_if(*packets, [&](const Packet&) { return lost(); });
+    };
+    character.send = [lost = Chance(percent + 1)](Peer&, const Packet& answer) mutable {
+        return Packets(lost() ? 0 : 1, answer);
+    };
+    return character;
+}
+
+/// A line on which something comes before, after or instead of every answer of the session.
+Peer::Character Sending(
+    std::function<Packets(Peer&, const Packet& answer, unsigned number)> change) {
+    Peer::Character character;
+    character.send = [change = std::move(change), number = 0U](
+                         Peer& peer, const Packet& answer) mutable -> Packets {
+        if (!Peer::IsOfSession(answer)) return {answer};
+        return change(peer, answer, number++);
+    };
+    return character;
+}
+
+Peer::Character Receiving(std::function<void(Peer&, Packets*, unsigned number)> change,
+                          int gatherMilliseconds = 0) {
+    Peer::Character character;
+    character.gatherMilliseconds = gatherMilliseconds;
+    character.receive = [change = std::move(change), number = 0U](Peer& peer,
+                                                                  Packets* packets) mutable {
+        number += static_cast<unsigned>(packets->size());
+        change(peer, packets, number);
+    };
+    return character;
+}
+
+Packet Changed(Packet packet, std::size_t at, std::uint8_t value) {
+    packet[at < packet.size() ? at : packet.size() - 1] = value;
+    return packet;
+}
+
+TEST_F(Network, ALineThatSpoilsPacketsCostsNothingOfTheReport) {
+    const struct {
+        const char* fault;
+        Peer::Character character;
+        unsigned sessions = 1;
+    } cases[] = {
+        {"lost", Losing(3), 0},
+        {"requests lost for a while",
+         Receiving([gone = Outage()](Peer&, Packets* packets, unsigned number) mutable {
+             if (gone(number)) packets->clear();
+         })},
+        {"answers lost for a while",
+         Sending([gone = Outage()](Peer&, const Packet& answer, unsigned number) mutable {
+             return Packets(gone(number) ? 0 : 1, answer);
+         })},
+        {"doubled",
+         Sending([](Peer&, const Packet& answer, unsigned) { return Packets(2, answer); })},
+        {"reordered", Receiving(
+                          [](Peer&, Packets* packets, unsigned number) {
+                              std::shuffle(packets->begin(), packets->end(), std::mt19937(number));
+                          },
+                          2)},
+        {"answered in reverse",
+         Receiving([](Peer&, Packets* packets,
+                      unsigned) { std::reverse(packets->begin(), packets->end()); },
+                   2)},
+        {"late", Sending([held = Packets()](Peer&, const Packet& answer, unsigned number) mutable {
+             held.push_back(answer);
+             return number % 10 == 6 ? Packets() : std::exchange(held, {});
+         })},
+        {"a bit turned over", Sending([](Peer&, const Packet& answer, unsigned number) {
+             Packet spoilt = answer;
+             spoilt[number * 7 % answer.size()] ^= static_cast<std::uint8_t>(1U << number % 8);
+             return number % 20 == 7 ? Packets{spoilt} : Packets{spoilt, answer};
+         })},
+        // The request numbers of IPMI come round after 64.
+        {"replayed",
+         Sending([sent = Packets()](Peer&, const Packet& answer, unsigned number) mutable {
+             sent.push_back(answer);
+             return Packets{sent[number < 64 ? number : number - 64], answer, sent[number / 2]};
+         })},
+        {"foreign", Sending([](Peer& peer, const Packet& answer, unsigned number) {
+             const Packet noise(number % 200, static_cast<std::uint8_t>(number));
+             const Packet presence{0x06, 0, 0xFF, 0x06, 0, 0, 0x11, 0xBE, 0x40, 0, 0, 0};
+             const Packet otherSession = peer.Signed(Changed(peer.Lie(), 6, 0x77));
+             return Packets{noise, presence, otherSession, Changed(answer, 4, 0), answer};
+         })},
+        {"wrong integrity code", Sending([](Peer& peer, const Packet& answer, unsigned number) {
+             const Packet lie = peer.Lie();
+             const std::size_t at = lie.size() - 1 - number % peer.CodeLength();
+             Packet bare = Changed(lie, 5, 0x80);  // says that it is not protected
+             bare.resize(bare.size() - peer.CodeLength() - 4);
+             return Packets{Changed(lie, at, static_cast<std::uint8_t>(lie[at] + 1)), bare, answer};
+         })},
+        {"runts of 1 to 60 bytes", Sending([](Peer& peer, const Packet& answer, unsigned number) {
+             const Packet runt(answer.begin(), answer.begin() + 1 + number % 60);
+             return Packets{runt, peer.Signed(runt), answer};
+         })},
+        {"payload longer than the packet",
+         Sending([](Peer& peer, const Packet& answer, unsigned number) {
+             const auto high = static_cast<std::uint8_t>(number % 3 == 0 ? 0xFF : 0);
+             const Packet longer = Changed(Changed(answer, 14, 0xFF), 15, high);
+             return Packets{longer, peer.Signed(longer), peer.Signed(Changed(answer, 14, 0)),
+                            answer};
+         })},
+        {"pad length past the packet",
+         Sending([](Peer& peer, const Packet& answer, unsigned number) {
+             // Before the integrity code: pad length, next header.
+             const std::size_t at = answer.size() - peer.CodeLength() - 2;
+             const auto length = static_cast<std::uint8_t>(number % 2 == 0 ? 0xFF : 40 + number);
+             return Packets{peer.Signed(Changed(answer, at, length)), answer};
+         })},
+        {"protected, but not what was encrypted",
+         Sending([](Peer& peer, const Packet& answer, unsigned number) {
+             // The last block of ciphertext: it may by chance say something, hence it comes last.
+             const std::size_t at = answer.size() - peer.CodeLength() - 5 - number % 16;
+             return Packets{answer, peer.Signed(Changed(answer, at, 1))};
+         })},
+        {"one request at a time, the others dropped",
+         Receiving([](Peer&, Packets* packets, unsigned) { packets->resize(1); }, 2)},
+        {"one request at a time, busy for the others",
+         {.gatherMilliseconds = 2, .busyBeyondFirst = true}},
+        {"session that expires",
+         Receiving([expired = false](Peer& peer, Packets*, unsigned number) mutable {
+             if (!expired && number > 100) peer.Expire();
+             expired |= number > 100;
+         }),
+         2},
+    };
+    DescribeRack();
+    const Collected expected = CollectDirectly();
+    EXPECT_TRUE(expected.whole);
+    int suite = 3;
+    for (const auto& c : cases) {
+        Peer::Character character = c.character;
+        character.cipherSuite = suite = 20 - suite;
+        const Collected found = CollectOver(character);
+        ExpectSame(found, expected, c.fault);
+        EXPECT_TRUE(found.whole) << c.fault;
+        EXPECT_EQ(found.outsideWindow, 0u) << c.fault;
+        if (c.sessions != 0) {
+            EXPECT_EQ(found.sessions, c.sessions) << c.fault;
+        }
+        EXPECT_LT(found.seconds, 20) << c.fault;
+    }
+}
+
+TEST_F(Network, ABmcThatIsGoneLeavesAPartialReport) {
+    const struct {
+        const char* fault;
+        double timeout;
+        Peer::Character character;
+    } cases[] = {
+        {"silent in the middle", 0.3, Receiving([](Peer&, Packets* packets, unsigned number) {
+             if (number > 100) packets->clear();
+         })},
+        {"session that expires again and again", 4,
+         Receiving([](Peer& peer, Packets*, unsigned number) {
+             if (number % 50 == 0) peer.Expire();
+         })},
+    };
+    DescribeRack();
+    const Collected all = CollectDirectly();
+    const std::set<std::string> known(all.capture.begin(), all.capture.end());
+    for (const auto& c : cases) {
+        options.timeoutSeconds = c.timeout;
+        tqrhost::StopAt(std::chrono::steady_clock::now() + std::chrono::seconds(7));
+        const Collected found = CollectOver(c.character);
+        tqrhost::ClearStop();
+        EXPECT_FALSE(found.whole) << c.fault;
+        EXPECT_LT(found.seconds, 10) << c.fault;
+        EXPECT_GT(found.capture.size(), 30u) << c.fault;
+        for (const std::string& line : found.capture) {
+            EXPECT_TRUE(known.count(line) == 1 || line.ends_with("\"response\": null}")) << line;
+        }
+    }
+}
+
+TEST_F(Network, EveryWindowSeesWhatOneRequestAtATimeSees) {
+    std::vector<std::filesystem::path> folders{IPMISEL_EXAMPLES};
+    // More machines than may be part of the project.
+    if (const char* const more = std::getenv("IPMISEL_MACHINES")) folders.emplace_back(more);
+    for (const auto& folder : folders) {
+        for (const auto& file : std::filesystem::directory_iterator(folder)) {
+            if (file.path().extension() != ".json") continue;
+            options.timeoutSeconds = 12;
+            Describe(file.path().string());
+            if (server.bmcs.empty()) continue;
+            const Collected expected = CollectDirectly();
+            const auto expectSame = [&](const char* way, const Peer::Character& character) {
+                ExpectSame(CollectOver(character), expected, file.path().string() + way);
+            };
+            options.window = 1;
+            expectSame(", one at a time", {});
+            options.window = 15;
+            expectSame(", window 15", {});
+            options.window.reset();
+            expectSame(", adaptive", {});
+            if (options.timeoutSeconds > 1) expectSame(", adaptive with loss", Losing(2));
+        }
+    }
+}
+
+TEST_F(Network, TheBmcsOwnKeyOpensTheSession) {
+    const struct {
+        std::string bmc;
+        const char* given;
+        const char* refusal;
+    } cases[] = {{"key of the BMC", "key of the BMC", ""},
+                 {"key of the BMC", "", "another key of its own (Kg)"},
+                 {"key of the BMC", "key of a BMC", "another key of its own (Kg)"},
+                 {"", "key of the BMC", "another key of its own (Kg)"}};
+    for (const int suite : {3, 17}) {
+        for (const auto& c : cases) {
+            const std::string given = c.given;
+            options.kg = [given] { return Packet(given.begin(), given.end()); };
+            const std::string refusal = Refusal({.cipherSuite = suite, .kg = c.bmc});
+            EXPECT_THAT(refusal, HasSubstr(c.refusal)) << c.bmc << "/" << given;
+            EXPECT_EQ(refusal.empty(), *c.refusal == 0) << refusal;
+        }
+    }
+}
+
+}  // namespace
