@@ -1,0 +1,110 @@
+// As much as a BMC can hold, as often as one likes, as slowly as it likes.
+
+#include <malloc.h>
+
+#include <chrono>
+
+#include "tests/program/program_fixture.h"
+#include "tests/support/fru_inventory.h"
+#include "tests/support/machine_fixture.h"
+
+extern "C" std::size_t __sanitizer_get_current_allocated_bytes();  // of AddressSanitizer
+
+namespace ipmiseltest {
+namespace {
+
+using ::testing::HasSubstr;
+
+#ifdef __SANITIZE_ADDRESS__
+constexpr int kRecords = 5000;  // every step costs many times as much
+std::size_t Allocated() { return __sanitizer_get_current_allocated_bytes(); }
+#else
+constexpr int kRecords = 65535;
+std::size_t Allocated() { return mallinfo2().uordblks; }
+#endif
+constexpr int kReachable = 0xFEFF;    // a next record ID of 0xFFxx ends the walk
+constexpr int kHeldByIpmiSim = 2000;  // it takes a second to read so many in, and ten for 5,000
+
+class Load : public ProgramTest {
+protected:
+    const std::vector<std::string> log_{"--class", "QORSG_IPMILogRecord", "--log-level", "error"};
+
+    /// The log's account of a report that has as many instances as it says.
+    static Json Log(const Json& report) {
+        const Json log = report["completeness"][0]["log"];
+        EXPECT_EQ(report["instances"].size(), log["exported"]);
+        EXPECT_EQ(log["read"], log["exported"]);
+        return log;
+    }
+};
+
+TEST_F(Load, AFullLogThroughEveryKindOfSource) {
+    std::vector<std::string> recorded = log_;
+    recorded.insert(recorded.end(), {"--record", InPlace("capture")});
+    Json simulated = Report(Write(Server(kRecords)), recorded);
+    EXPECT_EQ(Log(simulated)["announced"], kRecords);
+    EXPECT_EQ(Log(simulated)["read"], std::min(kRecords, kReachable));
+    Json replayed = Report("replay:" + InPlace("capture"), log_);
+    simulated.erase("source");
+    replayed.erase("source");
+    EXPECT_TRUE(simulated == replayed);
+}
+
+TEST_F(Load, ALongLogOverTheNetwork) {
+#ifndef IPMISEL_FREEIPMI
+    GTEST_SKIP() << "built without FreeIPMI";
+#endif
+    if (!IpmiSim::Missing().empty()) GTEST_SKIP() << IpmiSim::Missing();
+    std::vector<std::string> lines;
+    for (int i = 1; i <= kHeldByIpmiSim; ++i) {
+        lines.push_back(IpmiSim::SelLine(SystemEvent(static_cast<std::uint16_t>(i), 1, 0x30)));
+    }
+    const IpmiSim sim(lines, kHeldByIpmiSim);
+    setting.environment["IPMISEL_PASSWORD"] = "secret";
+    std::vector<std::string> access = log_;
+    access.insert(access.end(), {"--user", "root", "--workaround", "opensesspriv"});
+    EXPECT_EQ(Log(Report("lan:" + sim.Place(), access))["read"], kHeldByIpmiSim);
+}
+
+TEST_F(Load, TwoSecondsAnAnswerEndAtTheDeadlineAndCanBeWatched) {
+    Json server = Server(3);
+    server["bmcs"][0]["latency_us"] = 2'000'000;
+    const auto begin = std::chrono::steady_clock::now();
+    RunningProgram program(
+        folder.path().string(),
+        Command({"collect", "--from", Write(server), "--class", "QORSG_IPMILogRecord", "--format",
+                 "json", "--log-level", "trace", "--deadline", "5"}));
+    EXPECT_TRUE(Eventually(
+        [&] { return program.Errors().find("IPMIGetSELInfo() completed") != std::string::npos; }));
+    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::seconds(4));
+    const Ended ended = program.Wait();
+    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::seconds(9));
+    EXPECT_EQ(ended.exitStatus, 4);
+    EXPECT_THAT(ended.out, HasSubstr("deadline"));
+}
+
+class Memory : public MachineTest {};
+
+TEST_F(Memory, AHundredCollectionsLeaveNothingBehind) {
+    nodes[0].selEntries.assign(50, SystemEvent(1, 0x01, 0x30));
+    for (std::uint8_t i = 0; i < 50; ++i) nodes[0].selEntries[i][0] = i + 1;
+    nodes[0].sdrRecords = {FullSensor(1, 0x30, 7, 1, "Ambient"), FruLocator(2, 3, "PSU 1")};
+    nodes[0].fru = {{0, FixedLayout("Maker", "Board", "S-0")},
+                    {3, FixedLayout("Maker", "Supply", "S-3")}};
+    nodes.push_back(nodes[0]);
+    nodes[1].faults = {NoResponse(0x43, 20), CompletionCode(0x11, 5, 0xC3)};
+    std::size_t early = 0;
+    for (int pass = 1; pass <= 110; ++pass) {
+        ipmisel::Module().ipmifruonce = false;
+        EXPECT_EQ(Collect({"QORSG_IPMIFRU", "QORSG_IPMILogRecord", "QORSG_ZMCAuxDebugRecord"}), 0);
+        EXPECT_EQ(written.instances.size(), 73U);
+        written.instances = {};
+        requests = {};
+        log.Clear();
+        if (pass == 10) early = Allocated();
+    }
+    EXPECT_LT(Allocated(), early + 1000);
+}
+
+}  // namespace
+}  // namespace ipmiseltest
