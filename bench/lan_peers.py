@@ -8,6 +8,7 @@ reads the whole event log and the sensor repository anew, and prints the events 
 their sensors. Runs are interleaved; a run that did not print every record ends the comparison.
 """
 import argparse
+import contextlib
 import os
 import pathlib
 import shutil
@@ -24,6 +25,10 @@ import make_log  # noqa: E402
 
 SENSOR_NAMES = [row[0] for row in make_log.FULL + make_log.COMPACT]
 USER, PASSWORD = "root", "secret"
+
+
+class RunFailed(Exception):
+    """A contender did not print everything."""
 
 
 def free_udp_port():
@@ -50,7 +55,7 @@ def wait_for_bmc(port, process):
 
 
 def run(command, environment, output):
-    """Wall, user and system seconds of one run; the output goes to a file."""
+    """Wall, user and system seconds of one run; the output goes to a file. May raise RunFailed."""
     with open(output, "wb") as out, open(f"{output}.err", "wb") as err:
         start = time.monotonic()
         process = subprocess.Popen(command, stdout=out, stderr=err,
@@ -60,53 +65,63 @@ def run(command, environment, output):
         process.returncode = os.waitstatus_to_exitcode(status)
     if process.returncode != 0:
         message = pathlib.Path(f"{output}.err").read_text(errors="replace")
-        sys.exit(f"{command[0]} ended with {process.returncode}: {message}")
+        raise RunFailed(f"{command[0]} ended with {process.returncode}: {message}")
     return wall, usage.ru_utime, usage.ru_stime
 
 
 def check(name, output, records):
-    """Every record was printed, and with the name of its sensor."""
+    """Every record was printed, and with the name of its sensor; else RunFailed."""
     lines = pathlib.Path(output).read_text(errors="replace").splitlines()
-    if name == "ipmi-sel":
+    if name.startswith("ipmi-sel"):
         lines = lines[1:]  # the heading
     named = sum(any(f"{word} " in line for word in SENSOR_NAMES) for line in lines)
     if len(lines) != records or named != records:
-        sys.exit(f"{name}: {len(lines)} records, {named} with a sensor's name, not {records}")
+        raise RunFailed(f"{name}: {len(lines)} records, {named} with a sensor's name, "
+                        f"not {records}")
 
 
-def main():
-    parser = argparse.ArgumentParser(description=__doc__.splitlines()[0])
-    parser.add_argument("--runs", type=int, default=7)
-    parser.add_argument("--records", type=int, default=1000)
-    parser.add_argument("--sensors", type=int, default=100)
+def arguments(doc, runs, records, sensors):
+    """The options that every comparison has; the programs are all there."""
+    parser = argparse.ArgumentParser(description=doc.splitlines()[0])
+    parser.add_argument("--runs", type=int, default=runs)
+    parser.add_argument("--records", type=int, default=records)
+    parser.add_argument("--sensors", type=int, default=sensors)
     parser.add_argument("--program", default=str(HERE.parent / "build/release/bin/ipmisel"))
-    options = parser.parse_args()
+    return parser
+
+
+def require_programs(options):
     needed = {options.program: "run tools/demo first", "ipmi_sim": "package openipmi",
               "ipmitool": "package ipmitool", "ipmi-sel": "package freeipmi-tools"}
     for program, hint in needed.items():
         if shutil.which(program) is None:
             sys.exit(f"{program} is missing: {hint}")
 
+
+@contextlib.contextmanager
+def simulated_bmc(records, sensors):
+    """A folder to work in, and the port of an ipmi_sim that lives as long."""
     with tempfile.TemporaryDirectory() as name:
         folder = pathlib.Path(name)
         (folder / "state").mkdir()
         port = free_udp_port()
-        make_log.write_ipmi_sim(options.records, options.sensors, port, name)
+        make_log.write_ipmi_sim(records, sensors, port, name)
         with open(folder / "ipmi_sim.log", "wb") as log:
             bmc = subprocess.Popen(["ipmi_sim", "-c", name + "/lan.conf", "-f", name + "/bmc.emu",
                                     "-s", name + "/state", "-n"],
                                    stdin=subprocess.DEVNULL, stdout=log, stderr=log)
         try:
             wait_for_bmc(port, bmc)
-            compare(options, folder, port)
+            yield folder, port
         finally:
             bmc.kill()
             bmc.wait()
 
 
-def compare(options, folder, port):
-    contenders = {
-        "ipmisel": [options.program, "collect", "--from", f"lan:127.0.0.1:{port}",
+def commands(program, port):
+    """The contenders. CACHE stands for the folder of ipmi-sel's cache of sensors."""
+    return {
+        "ipmisel": [program, "collect", "--from", f"lan:127.0.0.1:{port}",
                     "--user", USER, "--cipher-suite", "3", "--workaround", "opensesspriv",
                     "--class", "QORSG_IPMILogRecord", "--format", "ndjson"],
         "ipmitool": ["ipmitool", "-I", "lanplus", "-C", "3", "-H", "127.0.0.1", "-p", str(port),
@@ -115,17 +130,37 @@ def compare(options, folder, port):
                      "-h", f"127.0.0.1:{port}", "-u", USER, "-p", PASSWORD,
                      "--quiet-cache", "--sdr-cache-directory", "CACHE"],
     }
-    environment = {"IPMISEL_PASSWORD": PASSWORD, "IPMI_PASSWORD": PASSWORD}
+
+
+ENVIRONMENT = {"IPMISEL_PASSWORD": PASSWORD, "IPMI_PASSWORD": PASSWORD}
+
+
+def with_cache(command, cache):
+    """The command with a folder for its cache, which is made if it is not there."""
+    cache.mkdir(exist_ok=True)
+    return [str(cache) if word == "CACHE" else word for word in command]
+
+
+def main():
+    options = arguments(__doc__, 7, 1000, 100).parse_args()
+    require_programs(options)
+    with simulated_bmc(options.records, options.sensors) as (folder, port):
+        compare(options, folder, port)
+
+
+def compare(options, folder, port):
+    contenders = commands(options.program, port)
     times = {name: [] for name in contenders}
     for number in range(options.runs):
         for name, command in contenders.items():
             # A cache of its own for every run, empty: each contender reads the sensors.
-            cache = folder / f"cache-{number}"
-            cache.mkdir(exist_ok=True)
+            command = with_cache(command, folder / f"cache-{number}")
             output = str(folder / name)
-            times[name].append(run([str(cache) if word == "CACHE" else word for word in command],
-                                   environment, output))
-            check(name, output, options.records)
+            try:
+                times[name].append(run(command, ENVIRONMENT, output))
+                check(name, output, options.records)
+            except RunFailed as failure:
+                sys.exit(str(failure))
 
     medians = {name: [statistics.median(column) for column in zip(*rows)]
                for name, rows in times.items()}
