@@ -12,8 +12,7 @@ namespace {
 
 using namespace NQORTQR20;
 using ::testing::ElementsAre;
-using tqrhost::AddLogConsumer;
-using tqrhost::RemoveLogConsumer;
+using namespace tqrhost;
 
 TEST(Log, EachConsumerReadsUpToItsSeverity) {
     std::vector<std::string> warnings;

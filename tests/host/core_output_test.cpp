@@ -9,10 +9,9 @@
 namespace {
 
 using namespace NQORTQR20;
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-using tqrhost::ObjectPath;
-using tqrhost::PropertyValue;
+using namespace ::testing;
+using namespace tqrhost;
+using Bytes = std::vector<std::uint8_t>;
 
 class Recorder : public tqrhost::WholeInstanceSink {
 public:
@@ -45,14 +44,15 @@ TEST_F(Output, PropertiesStandInTheOrderWritten) {
     TCIMReference* reference = nullptr;
     ASSERT_EQ(fdrNewCIMValueArray(&array).code, 0);
     ASSERT_EQ(fdrNewCIMReference(&reference, output).code, 0);
-    EXPECT_EQ(fdrGetInstance(output, "Class").code, 0);
-    EXPECT_EQ(fdrAddProperty(output, "B", "text").code, 0);
-    for (const unsigned char byte : {0, 255}) EXPECT_EQ(fdrArrayAddUint8(array, byte).code, 0);
-    EXPECT_EQ(fdrAddArrayProperty(output, "A", array).code, 0);
-    EXPECT_EQ(fdrSetReferenceClassName(reference, "Other").code, 0);
-    EXPECT_EQ(fdrReferenceAddString(reference, "Key", "1").code, 0);
-    EXPECT_EQ(fdrReferenceAddString(reference, "Also", "2").code, 0);
-    EXPECT_EQ(fdrAddReferenceProperty(output, "R", reference).code, 0);
+    for (const TTQRStatusCode answer :
+         {fdrGetInstance(output, "Class"), fdrAddProperty(output, "B", "text"),
+          fdrArrayAddUint8(array, 0), fdrArrayAddUint8(array, 255),
+          fdrAddArrayProperty(output, "A", array), fdrSetReferenceClassName(reference, "Other"),
+          fdrReferenceAddString(reference, "Key", "1"),
+          fdrReferenceAddString(reference, "Also", "2"),
+          fdrAddReferenceProperty(output, "R", reference)}) {
+        EXPECT_EQ(answer.code, 0);
+    }
     EXPECT_THAT(sink.instances, IsEmpty());  // nothing counts before it is closed
     EXPECT_EQ(fdrAddInstance(output).code, 0);
     EXPECT_EQ(fdrDeleteCIMValueArray(array).code, 0);
@@ -61,14 +61,11 @@ TEST_F(Output, PropertiesStandInTheOrderWritten) {
     ASSERT_EQ(sink.instances.size(), 1U);
     EXPECT_EQ(sink.instances[0].className, "Class");
     const auto& properties = sink.instances[0].properties;
-    ASSERT_EQ(properties.size(), 3U);
-    EXPECT_EQ(properties[0].first, "B");
-    EXPECT_EQ(std::get<std::string>(properties[0].second), "text");
-    EXPECT_EQ(std::get<std::vector<std::uint8_t>>(properties[1].second),
-              (std::vector<std::uint8_t>{0, 255}));
+    ASSERT_THAT(properties, ElementsAre(Pair("B", VariantWith<std::string>("text")),
+                                        Pair("A", VariantWith<Bytes>(Bytes{0, 255})), Key("R")));
     const auto& path = std::get<ObjectPath>(properties[2].second);
     EXPECT_EQ(path.className, "Other");
-    EXPECT_THAT(path.keys, ElementsAre(std::pair("Key", "1"), std::pair("Also", "2")));
+    EXPECT_THAT(path.keys, ElementsAre(Pair("Key", "1"), Pair("Also", "2")));
 }
 
 TEST_F(Output, AbandonedInstanceIsDropped) {
@@ -112,26 +109,21 @@ TEST_F(Output, MisuseIsAnsweredWithThree) {
                   {fdrAddProperty(output, "A", "1"), fdrAddArrayProperty(output, "A", array),
                    fdrAddReferenceProperty(output, "A", reference), fdrAddInstance(output)});
     ASSERT_EQ(fdrGetInstance(output, "Class").code, 0);
-    expectRefused("no handle", {fdrGetInstance(nullptr, "Class"),
-                                fdrAddProperty(nullptr, "A", "1"),
-                                fdrAddInstance(nullptr),
-                                fdrNewCIMValueArray(nullptr),
-                                fdrArrayAddUint8(nullptr, 1),
-                                fdrAddArrayProperty(nullptr, "A", array),
-                                fdrAddArrayProperty(output, "A", nullptr),
-                                fdrDeleteCIMValueArray(nullptr),
-                                fdrNewCIMReference(nullptr, output),
-                                fdrNewCIMReference(&none, nullptr),
-                                fdrSetReferenceClassName(nullptr, "Class"),
-                                fdrReferenceAddString(nullptr, "Key", "1"),
-                                fdrAddReferenceProperty(nullptr, "A", reference),
-                                fdrAddReferenceProperty(output, "A", nullptr),
-                                fdrDeleteCIMReference(nullptr),
-                                fdrGetHandle(nullptr, &provider),
-                                fdrGetHandle(context.get(), nullptr),
-                                fdrGetPluginPath(nullptr, &path),
-                                fdrGetPluginPath(context.get(), nullptr),
-                                fdrShowNotice(nullptr, "text", nullptr)});
+    expectRefused(
+        "no output",
+        {fdrGetInstance(nullptr, "Class"), fdrAddInstance(nullptr),
+         fdrAddProperty(nullptr, "A", "1"), fdrAddArrayProperty(nullptr, "A", array),
+         fdrAddReferenceProperty(nullptr, "A", reference), fdrNewCIMReference(&none, nullptr)});
+    expectRefused("no value",
+                  {fdrNewCIMValueArray(nullptr), fdrArrayAddUint8(nullptr, 1),
+                   fdrAddArrayProperty(output, "A", nullptr), fdrDeleteCIMValueArray(nullptr),
+                   fdrNewCIMReference(nullptr, output), fdrSetReferenceClassName(nullptr, "Class"),
+                   fdrReferenceAddString(nullptr, "Key", "1"),
+                   fdrAddReferenceProperty(output, "A", nullptr), fdrDeleteCIMReference(nullptr)});
+    expectRefused("no context",
+                  {fdrGetHandle(nullptr, &provider), fdrGetHandle(context.get(), nullptr),
+                   fdrGetPluginPath(nullptr, &path), fdrGetPluginPath(context.get(), nullptr),
+                   fdrShowNotice(nullptr, "text", nullptr), fdrRegisterPlugin(nullptr, nullptr)});
     EXPECT_EQ(none, nullptr);
     expectRefused(
         "no text",

@@ -3,19 +3,15 @@
 
 #include <cstdlib>
 #include <filesystem>
-#include <fstream>
 
 #include "host/core/host.h"
+#include "tests/support/temporary_folder.h"
 #include "tqr/log.h"
 
 namespace {
 
 using namespace NQORTQR20;
-using ::testing::AllOf;
-using ::testing::Contains;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::Not;
+using namespace ::testing;
 
 class ClassNames : public tqrhost::WholeInstanceSink {
 public:
@@ -95,24 +91,14 @@ TEST_F(PluginLoading, ExceptionsOfThePluginAreFailures) {
                                  HasSubstr("thrown"), HasSubstr("thrown")));
 }
 
-TEST_F(PluginLoading, RegistrationIsRefusedAtAnyOtherTime) {
-    fdrPluginCallbacks record{};
-    record.size = sizeof record;
-    TCPluginCallbacks* context = nullptr;
-    EXPECT_EQ(fdrRegisterPlugin(&record, &context).code, kStatusFailed);
-    EXPECT_EQ(fdrRegisterPlugin(nullptr, nullptr).code, kStatusFailed);
-    EXPECT_EQ(context, nullptr);
-}
-
 TEST_F(PluginLoading, FailureSaysInOneLineWhatAndWhatToDo) {
-    const auto noLibrary = std::filesystem::temp_directory_path() / "ipmisel_no_library.pi";
-    std::ofstream(noLibrary) << "text";
+    const ipmiseltest::TemporaryFolder folder;
     const struct {
         const char* fault;
         std::string file;
         const char* why;
     } cases[] = {{"", "/nonexistent/x.pi", "No such file"},
-                 {"", noLibrary.string(), "no library"},
+                 {"", folder.Write("text.pi", "text"), "no library"},
                  {"silent", TEST_PLUGIN, "not register"},
                  {"size", TEST_PLUGIN, "not register"},
                  {"callback", TEST_PLUGIN, "not register"},
@@ -124,7 +110,6 @@ TEST_F(PluginLoading, FailureSaysInOneLineWhatAndWhatToDo) {
                                            Not(HasSubstr("\n"))))
             << c.fault;
     }
-    std::filesystem::remove(noLibrary);
     EXPECT_THAT(log, Not(Contains("de-initialised")));  // what did not start is not stopped
     unsetenv("TEST_PLUGIN_FAULT");
     EXPECT_EQ(Failure(TEST_PLUGIN), "loaded");

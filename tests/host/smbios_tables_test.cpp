@@ -2,7 +2,7 @@
 
 #include <gtest/gtest.h>
 
-#include <fstream>
+#include "tests/support/temporary_folder.h"
 
 namespace {
 
@@ -115,25 +115,14 @@ TEST(SmbiosEntryPoint, BothFormsAreReadAndDamageIsSeen) {
     EXPECT_TRUE(ReadSmbiosEntryPoint(old));
 }
 
-class SystemSmbios : public ::testing::Test {
-protected:
-    void SetUp() override {
-        std::string name = (std::filesystem::temp_directory_path() / "smbiosXXXXXX").string();
-        ASSERT_NE(mkdtemp(name.data()), nullptr);
-        folder = name;
-    }
-    void TearDown() override { std::filesystem::remove_all(folder); }
-    void Write(const char* file, const Bytes& bytes) const {
-        std::ofstream(folder / file, std::ios::binary)
-            .write(reinterpret_cast<const char*>(bytes.data()),
-                   static_cast<std::streamsize>(bytes.size()));
-    }
-    std::filesystem::path folder;
-};
-
-TEST_F(SystemSmbios, SmallerBoundHolds) {
+TEST(SystemSmbios, SmallerBoundHolds) {
+    const ipmiseltest::TemporaryFolder place;
+    const auto& folder = place.path();
+    const auto write = [&](const char* file, const Bytes& bytes) {
+        place.Write(file, {bytes.begin(), bytes.end()});
+    };
     EXPECT_EQ(ReadSystemSmbios(folder), SmbiosStructures());
-    Write("DMI", Join({kSystem, kBare, kBare, kEnd}));
+    write("DMI", Join({kSystem, kBare, kBare, kEnd}));
     EXPECT_EQ(ReadSystemSmbios(folder), SmbiosStructures());
     const auto systemOnly = static_cast<std::uint8_t>(kSystem.size());
     const struct {
@@ -147,7 +136,7 @@ TEST_F(SystemSmbios, SmallerBoundHolds) {
                  {EntryPoint2(systemOnly, 9), {kSystem}},
                  {Bytes(0x18, 0), {}}};
     for (const auto& c : cases) {
-        Write("smbios_entry_point", c.entryPoint);
+        write("smbios_entry_point", c.entryPoint);
         EXPECT_EQ(ReadSystemSmbios(folder), c.structures);
     }
 }

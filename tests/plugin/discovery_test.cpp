@@ -7,8 +7,7 @@
 namespace ipmiseltest {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::Pair;
+using namespace ::testing;
 
 class Discovery : public MachineTest {};
 

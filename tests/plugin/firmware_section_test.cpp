@@ -4,8 +4,7 @@
 namespace ipmiseltest {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
+using namespace ::testing;
 using Bytes = ipmisim::Bytes;
 using Lines = std::vector<std::string>;
 

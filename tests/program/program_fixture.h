@@ -59,20 +59,15 @@ protected:
                 {"smbios", {"26123000012020ffa30c0000000000000105 0000"}},
                 {"bmcs",
                  {{{"sel", {{"entries", log}, {"time", 1709640000}}},
-                   {"sdr", {{"records", {SensorRecord("CPU1 Temp")}}}}}}}};
+                   {"sdr", {{"records", {kSensorRecord}}}}}}}};
     }
     std::string Write(const Json& server) {
         return "sim:" + folder.Write("server.json", server.dump());
     }
-    /// A full sensor record: sensor 0x30 of processor 1, degrees C as they are read.
-    static std::string SensorRecord(const std::string& name) {
-        std::string record = ipmisel::Format("0100 51 01 %02x", static_cast<int>(43 + name.size()));
-        record += "200030 0301 7f68 0101 ffffffffffff 80010000 010000000000";
-        record += std::string(34, '0');
-        record += ipmisel::Format("%02x", static_cast<int>(0xC0 | name.size()));
-        for (const char c : name) record += ipmisel::Format("%02x", static_cast<unsigned char>(c));
-        return record;
-    }
+    /// A full sensor record: sensor 0x30 of processor 1, "CPU1 Temp", degrees C as they are read.
+    static constexpr const char* kSensorRecord =
+        "0100 51 01 34 200030 0301 7f68 0101 ffffffffffff 80010000 010000000000"
+        "0000000000000000000000000000000000 c9 435055312054656d70";
 
     std::string InPlace(const std::string& name) const { return (place.path() / name).string(); }
     /// The names of what the program left behind.

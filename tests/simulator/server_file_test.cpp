@@ -9,8 +9,7 @@
 namespace ipmisim {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::StartsWith;
+using namespace ::testing;
 
 constexpr const char* kWhole = R"({
   // a server with everything

@@ -2,17 +2,12 @@
 
 #include <gtest/gtest.h>
 
-#include <memory>
-#include <utility>
-#include <vector>
-
 #include "tests/host/spdriver/requests.h"
 #include "tests/support/bmc_fixture.h"
+#include "tests/support/wire.h"
 
+namespace ipmiseltest {
 namespace {
-
-using ipmiseltest::ReadRequest;
-using ipmiseltest::StorageRequest;
 
 constexpr std::uint8_t kSel = 0x43, kSdr = 0x23;
 
@@ -26,14 +21,12 @@ protected:
     void Records(const std::vector<std::uint16_t>& ids, std::vector<ipmisim::Fault> faults = {}) {
         ipmisim::BmcDescription bmc;
         for (const std::uint16_t id : ids) {
-            const auto low = static_cast<std::uint8_t>(id),
-                       high = static_cast<std::uint8_t>(id >> 8);
-            bmc.selEntries.push_back({low, high});
-            bmc.sdrRecords.push_back({low, high, 0x51, 0x01, 0x00});
+            bmc.selEntries.push_back({Low(id), High(id)});
+            bmc.sdrRecords.push_back({Low(id), High(id), 0x51, 0x01, 0x00});
         }
         bmc.faults = std::move(faults);
-        guard = std::make_unique<tqrhost::LoopGuard>(
-            std::make_unique<ipmiseltest::SimulatedTransport>(bmc, &asked));
+        guard =
+            std::make_unique<tqrhost::LoopGuard>(std::make_unique<SimulatedTransport>(bmc, &asked));
     }
     bool Read(std::uint16_t id, std::uint8_t command = GetParam()) {
         const auto answer = guard->Exchange(ReadRequest(command, id));
@@ -121,3 +114,4 @@ TEST_P(Guard, OnlyTheEventLogEndsAtAHighByteFf) {
 }
 
 }  // namespace
+}  // namespace ipmiseltest

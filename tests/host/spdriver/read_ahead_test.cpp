@@ -3,42 +3,27 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <algorithm>
-#include <cstdint>
-#include <utility>
-#include <vector>
-
 #include "host/spdriver/send_window.h"
+#include "tests/support/wire.h"
 
 namespace {
 
+using ipmiseltest::High;
+using ipmiseltest::Low;
 using ::testing::IsEmpty;
-using tqrhost::Ask;
-using tqrhost::ReadAhead;
-using tqrhost::Response;
-using tqrhost::RoundTrip;
-using tqrhost::SendWindow;
+using namespace tqrhost;
 
 Ask SelAsk(std::uint16_t record) {
-    return {
-        0x0A,
-        0,
-        0x43,
-        {0, 0, static_cast<std::uint8_t>(record), static_cast<std::uint8_t>(record >> 8), 0, 0xFF}};
+    return {0x0A, 0, 0x43, {0, 0, Low(record), High(record), 0, 0xFF}};
 }
 
 Ask SdrAsk(std::uint16_t record, std::uint8_t offset, std::uint8_t count,
            std::uint8_t reservation = 7) {
-    return {0x0A,
-            0,
-            0x23,
-            {reservation, 0, static_cast<std::uint8_t>(record),
-             static_cast<std::uint8_t>(record >> 8), offset, count}};
+    return {0x0A, 0, 0x23, {reservation, 0, Low(record), High(record), offset, count}};
 }
 
 Response Next(std::uint16_t record, std::vector<std::uint8_t> rest = {}) {
-    rest.insert(rest.begin(),
-                {0, static_cast<std::uint8_t>(record), static_cast<std::uint8_t>(record >> 8)});
+    rest.insert(rest.begin(), {0, Low(record), High(record)});
     return rest;
 }
 

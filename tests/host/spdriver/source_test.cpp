@@ -1,10 +1,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <unistd.h>
 
 #include <fstream>
-#include <string>
-#include <vector>
 
 #include "host/spdriver/kinds.h"
 #include "host/spdriver/transport.h"
@@ -15,16 +12,8 @@ namespace {
 
 using ipmiseltest::ReadRequest;
 using ipmiseltest::StorageRequest;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::Not;
-using ::testing::Optional;
-using ::testing::SizeIs;
-using ::testing::StartsWith;
-using tqrhost::OpenSources;
-using tqrhost::Response;
-using tqrhost::Source;
-using tqrhost::SourceError;
+using namespace ::testing;
+using namespace tqrhost;
 
 constexpr std::uint8_t kGetSelInfo = 0x40, kGetSelEntry = 0x43, kGetSelTime = 0x48;
 
@@ -110,7 +99,6 @@ TEST(Capture, WhatCannotBeWrittenIsTold) {
     for (const char* file : {"/nonexistent/capture", "/dev/full", "/"}) {
         Source source;
         EXPECT_THROW(tqrhost::RecordTo(file, source), SourceError) << file;
-        EXPECT_NE(access("/dev/full", F_OK), -1);
     }
 }
 
@@ -129,8 +117,6 @@ TEST(Capture, ABadFileIsRefusedByLineKeyAndReason) {
         {exchange("1, \"request\": \"\", \"response\": null}"),
          ":2: node: the first line announces"},
         {exchange("0, \"request\": \"01200a0040010000\", \"response\": null}"),
-         ":2: request: is no request frame"},
-        {exchange("0, \"request\": \"01200a004001000000\", \"response\": null}"),
          ":2: request: is no request frame"},
         {exchange("0, \"request\": \"01200a004000000000\", \"response\": \"\"}"),
          ":2: response: begins with a completion code"},

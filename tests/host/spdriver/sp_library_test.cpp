@@ -3,18 +3,14 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <algorithm>
-#include <memory>
 #include <stdexcept>
-#include <vector>
 
 #include "host/spdriver/transport.h"
 
 namespace {
 
 using NQORTQR20::SPLibrary;
-using tqrhost::RequestFrame;
-using tqrhost::Response;
+using namespace tqrhost;
 
 /// Answers what it is told to and keeps the last request.
 struct Script {
@@ -91,16 +87,17 @@ TEST_F(Send, MisuseIsRefusedBeforeAnythingIsSent) {
     script.response = Response{0x00};
     auto buffer = Buffer(15);
     int length = 256;
+    const auto send = [&](int size) {
+        return library.sendIPMICommand(buffer.data(), &length, size, true);
+    };
     EXPECT_FALSE(library.sendIPMICommand(nullptr, &length, 15, true));
     EXPECT_FALSE(library.sendIPMICommand(buffer.data(), nullptr, 15, true));
-    for (const int size : {-1, 0, 8}) {
-        EXPECT_FALSE(library.sendIPMICommand(buffer.data(), &length, size, true)) << size;
-    }
+    for (const int size : {-1, 0, 8}) EXPECT_FALSE(send(size)) << size;
     buffer[5] = 7;  // data bytes up to position 15 of 0 to 14
-    EXPECT_FALSE(library.sendIPMICommand(buffer.data(), &length, 15, true));
+    EXPECT_FALSE(send(15));
     buffer[5] = 0;
     buffer[8] = 0xFF;
-    EXPECT_FALSE(library.sendIPMICommand(buffer.data(), &length, 15, true));
+    EXPECT_FALSE(send(15));
     EXPECT_FALSE(script.asked);
     EXPECT_FALSE(SPLibrary(nullptr).sendIPMICommand(Buffer(15).data(), &length, 15, true));
 }
