@@ -2,9 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <initializer_list>
-#include <string>
-
 #include "base/bytes.h"
 #include "simulator/server_file.h"
 
@@ -126,26 +123,6 @@ TEST(SimulatedBmc, FaultsStrikeTheCallTheyName) {
                  {"0a 48", "00 11 22 33 44"},
                  {"0a 48", "00 11 22 33 44"},
                  {"0a 40", "none"}});
-}
-
-TEST(SimulatedBmc, TheLargestLogIsReadToItsEnd) {
-    BmcDescription description;
-    for (unsigned id = 1; id <= 0xFFFE; ++id) {
-        description.selEntries.push_back(
-            {static_cast<std::uint8_t>(id), static_cast<std::uint8_t>(id >> 8)});
-    }
-    SimulatedBmc bmc(description);
-    Expect(bmc,
-           {{"0a 43 0 0 ff 7f 0 2", "00 00 80 ff 7f"}, {"0a 43 0 0 ff ff 0 2", "00 ff ff fe ff"}});
-    Bytes request(6, 0x00);
-    unsigned reads = 0;
-    for (; request[2] != 0xFF || request[3] != 0xFF; ++reads) {
-        const auto answer = bmc.Execute(0x0A, 0, 0x43, request);
-        ASSERT_TRUE(answer && answer->size() == 3) << reads;
-        request[2] = (*answer)[1];
-        request[3] = (*answer)[2];
-    }
-    EXPECT_EQ(reads, 0xFFFEu);
 }
 
 }  // namespace

@@ -44,22 +44,10 @@ inline std::vector<std::uint8_t> Runs(std::initializer_list<std::string_view> st
 /// A FRU device locator (IPMI 2.0, table 43-7).
 inline std::vector<std::uint8_t> FruLocator(std::uint16_t id, std::uint8_t device,
                                             std::string_view idString) {
-    std::vector<std::uint8_t> record{Low(id),
-                                     High(id),
-                                     0x51,
-                                     0x11,
-                                     static_cast<std::uint8_t>(11 + idString.size()),
-                                     0x20,
-                                     device,
-                                     0x80,
-                                     0x00,
-                                     0x00,
-                                     0x10,
-                                     0x00,
-                                     0x0A,
-                                     0x01,
-                                     0x00,
-                                     static_cast<std::uint8_t>(0xC0 | idString.size())};
+    const auto length = static_cast<std::uint8_t>(11 + idString.size());
+    const auto code = static_cast<std::uint8_t>(0xC0 | idString.size());
+    std::vector<std::uint8_t> record{Low(id), High(id), 0x51, 0x11, length, 0x20, device, 0x80,
+                                     0x00,    0x00,     0x10, 0x00, 0x0A,   0x01, 0x00,   code};
     record.insert(record.end(), idString.begin(), idString.end());
     return record;
 }

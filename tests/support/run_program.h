@@ -40,7 +40,6 @@ inline std::string ReadText(const std::string& file) {
 /// How a program is run.
 struct Setting {
     std::map<std::string, std::string> environment{};  ///< beside what is there
-    std::string output{};                     ///< standard output goes to this file instead
     bool onTerminal = false;                  ///< with a terminal of its own, which Terminal() is
     unsigned long fileLimit = RLIM_INFINITY;  ///< largest file that it may write
 };
@@ -50,10 +49,9 @@ class RunningProgram {
 public:
     RunningProgram(const std::string& folder, std::vector<std::string> command,
                    const Setting& setting = {})
-        : out_(setting.output.empty() ? folder + "/stdout" : setting.output),
-          err_(folder + "/stderr") {
+        : out_(folder + "/stdout"), err_(folder + "/stderr") {
         // So that nobody takes what another run wrote for its own.
-        unlink((folder + "/stdout").c_str());
+        unlink(out_.c_str());
         unlink(err_.c_str());
         int master = -1;
         process_ = setting.onTerminal ? forkpty(&master, nullptr, nullptr, nullptr) : fork();
