@@ -89,7 +89,6 @@ void ReadAhead::Asked(const Ask& ask) {
     if (record == kFirstRecord && OffsetOf(ask) == 0) {
         sensorRepository_.Restart();
         kinds_.clear();
-        lastKind_ = {kFullSensor, 0};
     }
     sensorRepository_.Passed(record);
     kinds_.erase(kinds_.begin(), kinds_.lower_bound(record));
@@ -113,7 +112,6 @@ void ReadAhead::Answered(const Ask& ask, const Response& response) {
         RecordKind kind{response[3 + 3], 0};
         if (response.size() > 3 + 6) kind.deviceId = response[3 + 6];
         kinds_[record] = kind;
-        lastKind_ = kind;
     }
 }
 
@@ -126,8 +124,11 @@ Ask ReadAhead::SdrAsk(std::uint16_t record, std::uint8_t offset, std::uint8_t co
 
 void ReadAhead::AppendRestOfRecord(std::uint16_t record, std::uint8_t afterOffset,
                                    std::vector<Ask>* asks) const {
+    // Which parts there are, the header says; until it is there, later headers are worth more than
+    // a try.
     const auto known = kinds_.find(record);
-    const RecordKind kind = known != kinds_.end() ? known->second : lastKind_;
+    if (known == kinds_.end()) return;
+    const RecordKind kind = known->second;
     if (reader_.headerLength == kLocatorHeaderLength) {
         if (afterOffset == 0 && kind.type == kFruDeviceLocator && kind.deviceId != 0) {
             asks->push_back(SdrAsk(record, kLocatorStringOffset, kToTheEnd));

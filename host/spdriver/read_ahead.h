@@ -72,7 +72,6 @@ private:
     Chain sensorRepository_;
     RecordReader reader_;
     std::map<std::uint16_t, RecordKind> kinds_;
-    RecordKind lastKind_{1, 0};
     std::uint8_t reservationLow_ = 0;
     std::uint8_t reservationHigh_ = 0;
 };
