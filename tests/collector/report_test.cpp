@@ -1,9 +1,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <string>
-#include <vector>
-
 #include "collector/failure.h"
 #include "collector/report.h"
 
@@ -35,14 +32,14 @@ protected:
     }
     static Instance Record(const std::string& message) {
         return {"QORSG_IPMILogRecord",
-                {{"RecordID", std::string("1")},
-                 {"MessageTimestamp", std::string("20240305120000.000000+060")},
-                 {"Source", std::string("16 (address). LUN 0. Channel 0. ")},
-                 {"SensorType", std::string("Temperature")},
-                 {"EventType", std::string("Assertion, Threshold.")},
+                {{"RecordID", "1"},
+                 {"MessageTimestamp", "20240305120000.000000+060"},
+                 {"Source", "16 (address). LUN 0. Channel 0. "},
+                 {"SensorType", "Temperature"},
+                 {"EventType", "Assertion, Threshold."},
                  {"Message", message},
-                 {"AuxLog", std::string("No Extended Data")},
-                 {"SourceNode", std::string("1")}}};
+                 {"AuxLog", "No Extended Data"},
+                 {"SourceNode", "1"}}};
     }
     static void Set(Instance* record, const std::string& name, const std::string& value) {
         for (auto& [property, old] : record->properties) {
@@ -51,11 +48,10 @@ protected:
     }
 };
 
-constexpr const char* kHead =
+const std::string kHead =
     "\nQORSG_IPMILogRecord\n"
-    "Record Time                Source       Sensor type    Direction   Message\n"
-    "----------------------------------------------------------------------------------------------"
-    "------\n";
+    "Record Time                Source       Sensor type    Direction   Message\n" +
+    std::string(100, '-') + "\n";
 
 TEST_F(Table, ARecordIsOneRowOfColumnsThatWrap) {
     Instance noTime = Record("Unknown log type. Raw Data:\n00 01");
@@ -67,25 +63,21 @@ TEST_F(Table, ARecordIsOneRowOfColumnsThatWrap) {
     Set(&auxiliary, "EventType", "Deassertion, Sensor-specific.");
     Set(&auxiliary, "Source", "System management software. Channel 7.");
     Set(&auxiliary, "AuxLog", "Type: Debug Code");
+    const Instance wrapped = Record(
+        "Processor 1 (Temperature - CPU1 Temp): Assertion: Rose above the upper limit. \n     "
+        "Trigger reading: 80 degrees C.");
     EXPECT_EQ(
-        Print({Record("Processor 1 (Temperature - CPU1 Temp): Assertion: Rose above the upper "
-                      "limit. \n     Trigger reading: 80 degrees C."),
-               noTime, auxiliary}),
-        std::string(kHead) +
-            "1      2024-03-05 12:00:00 16 (address) Temperature    Assertion   Processor 1 (CPU1 "
-            "Temp): Rose\n"
-            "                                                                   above the upper "
-            "limit. Trigger\n"
-            "                                                                   reading: 80 "
-            "degrees "
-            "C.\n"
-            "65535  -                   -                           -           Unknown log type. "
-            "Raw Data: 00 01\n"
-            "1      2024-03-05 12:00:00 System       Memory         Deassertion Uncorrectable "
-            "Type: Debug Code\n"
-            "                           management\n"
-            "                           software.\n"
-            "                           Channel 7\n");
+        Print({wrapped, noTime, auxiliary}),
+        kHead +
+            R"(1      2024-03-05 12:00:00 16 (address) Temperature    Assertion   Processor 1 (CPU1 Temp): Rose
+                                                                   above the upper limit. Trigger
+                                                                   reading: 80 degrees C.
+65535  -                   -                           -           Unknown log type. Raw Data: 00 01
+1      2024-03-05 12:00:00 System       Memory         Deassertion Uncorrectable Type: Debug Code
+                           management
+                           software.
+                           Channel 7
+)");
 }
 
 TEST_F(Table, NodesAreNamedWhereThereAreSeveral) {
@@ -125,6 +117,7 @@ TEST(Outcome, SaysHowItWentAndWhatIsMissing) {
     part.faults = {{"Read FRU Data", "0001", "no response", false},
                    {"Get SEL Entry", "0004", "short answer", true},
                    {"Get SDR", "0001", "no response", true}};
+    const std::string partly = "collected in part: ";
     const std::string missing =
         "2 of 5 log records not read, 1 of 7 sensor records not read, Get SEL Entry 0004: short "
         "answer";
@@ -137,24 +130,15 @@ TEST(Outcome, SaysHowItWentAndWhatIsMissing) {
         std::string problem;
     } cases[] = {
         {0, true, StopReason::kNone, {whole, fru}, 0, ""},
-        {0, true, StopReason::kNone, {part}, 4, "collected in part: " + missing},
-        {0, true, StopReason::kNone, {whole, part}, 4, "collected in part: node 2: " + missing},
-        {0, true, StopReason::kDeadline, {fru}, 4, "collected in part: the deadline has passed"},
-        {3,
-         true,
-         StopReason::kInterrupted,
-         {part},
-         4,
-         "collected in part: interrupted; " + missing},
+        {0, true, StopReason::kNone, {part}, 4, partly + missing},
+        {0, true, StopReason::kNone, {whole, part}, 4, partly + "node 2: " + missing},
+        {0, true, StopReason::kDeadline, {fru}, 4, partly + "the deadline has passed"},
+        {3, true, StopReason::kInterrupted, {part}, 4, partly + "interrupted; " + missing},
         {4, true, StopReason::kNone, {whole}, 1, "the pass ended with status 4 (Out of memory)"},
         {0, false, StopReason::kNone, {}, 3, "no BMC: the machine has no management controller"},
     };
     for (const auto& c : cases) {
-        ReportEnd end;
-        end.status.code = c.status;
-        end.hasBmc = c.hasBmc;
-        end.stopped = c.stopped;
-        end.completeness = c.nodes;
+        const ReportEnd end{{c.status}, c.hasBmc, c.stopped, {}, c.nodes, {}};
         const ipmisel::Outcome outcome = OutcomeOf(end);
         EXPECT_EQ(outcome.exitStatus, c.exitStatus) << c.problem;
         EXPECT_EQ(outcome.problem, c.problem);

@@ -145,22 +145,4 @@ TEST_F(Output, MisuseIsAnsweredWithThree) {
     expectRefused("no class", {fdrGetInstance(output, nullptr)});
 }
 
-TEST(Context, LeadsToPathProviderAndNotices) {
-    tqrhost::PluginContext context("/plugins");
-    const char* path = nullptr;
-    const TPluginManagerProvider* provider = nullptr;
-    EXPECT_EQ(fdrGetPluginPath(context.get(), &path).code, 0);
-    EXPECT_STREQ(path, "/plugins/ipmisel");
-    EXPECT_EQ(fdrGetHandle(context.get(), &provider).code, 0);
-    EXPECT_NE(provider, nullptr);
-    fdrShowNotice(context.get(), "plain\ntext", nullptr);
-    fdrShowNotice(context.get(), "plain", "<a>");
-    const auto notices = tqrhost::TakeNotices();
-    ASSERT_EQ(notices.size(), 2U);
-    EXPECT_EQ(notices[0].plainText, "plain\ntext");
-    EXPECT_EQ(notices[0].markupText, "");
-    EXPECT_EQ(notices[1].markupText, "<a>");
-    EXPECT_THAT(tqrhost::TakeNotices(), IsEmpty());
-}
-
 }  // namespace

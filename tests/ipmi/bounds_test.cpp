@@ -90,14 +90,7 @@ TEST(Bounds, ClaimedLengthsAreBelievedAsFarAsTheBufferReaches) {
 TEST(Bounds, RoomThatIsToldTheTransport) {
     NQORTQR20::SPLibrary library(nullptr);
     gReply = {0};
-    gLength = 312;
-    IPMIRequestFRULocator fru(&library);
-    IPMIFRULocator locator;
-    fru.IPMIReserveSDR(nullptr);
-    EXPECT_EQ(gToldLength, 312);
-    fru.IPMIGetSDRString(nullptr, &locator);
-    EXPECT_EQ(gToldLength, 312);
-    fru.IPMIGetFRUData(nullptr, &locator, true);
+    IPMIRequestFRULocator(&library).IPMIReserveSDR(nullptr);
     EXPECT_EQ(gToldLength, 312);
     IPMIRequestSDR(&library).IPMIReserveSDR(nullptr);
     EXPECT_EQ(gToldLength, 256);

@@ -191,19 +191,6 @@ TEST_F(Pass, WalkThatEndsEarlyExportsWhatWasRead) {
     }
 }
 
-TEST_F(Pass, EmptyLogWritesNothing) {
-    nodes[0].selEntries.clear();
-    EXPECT_EQ(Collect({kLog}), 0);
-    EXPECT_THAT(written.instances, IsEmpty());
-    EXPECT_TRUE(Logged(4, "Completed all collecting and exporting of SEL/SDR."));
-
-    // Counted none, and then had one all the same.
-    nodes[0].faults = {Answer(kGetSelEntry, 1,
-                              {0xFF, 0xFF, 1, 0, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15})};
-    EXPECT_EQ(Collect({kLog}), 0);
-    EXPECT_THAT(written.instances, IsEmpty());
-}
-
 TEST_F(Pass, RunsEverySectionForEveryNode) {
     nodes.push_back(nodes[0]);
     nodes[1].selEntries.resize(1);

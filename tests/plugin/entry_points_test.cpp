@@ -46,17 +46,6 @@ TEST_F(EntryPoints, AreAllThatTheLibraryExports) {
                                      "IPMISELGetDataZero", "ExportMessageLog", "ExportReferences"));
 }
 
-TEST_F(EntryPoints, InfoIsTheSameForEveryContext) {
-    for (auto* const given : {context.get(), static_cast<decltype(context.get())>(nullptr)}) {
-        const NQORTQR20::fdrPluginInfo info = IPMISELGetInfo(given);
-        EXPECT_STREQ(info.name, "IPMISEL");
-        EXPECT_STREQ(info.version, "1.0");
-        EXPECT_STREQ(info.interfaceVersion, "1.0");
-        EXPECT_EQ(info.reserved1, 0U);
-        EXPECT_EQ(info.reserved2, 0U);
-    }
-}
-
 TEST_F(EntryPoints, RefusedRegistrationIsOneErrorLine) {
     IPMISELPluginInit(context.get());
     IPMISELInit();  // the host loads no plug-in now

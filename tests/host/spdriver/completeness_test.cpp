@@ -1,6 +1,5 @@
 #include <array>
 
-#include "host/spdriver/stop.h"
 #include "host/spdriver/transport.h"
 #include "tests/support/bmc_fixture.h"
 
@@ -11,7 +10,6 @@ protected:
     Completeness() {
         for (std::uint8_t i = 1; i <= 3; ++i) bmc.selEntries.push_back({i, 0, 2});
     }
-    ~Completeness() override { tqrhost::ClearStop(); }
 
     void Send(std::uint8_t command, const std::vector<std::uint8_t>& data = {}) {
         std::array<unsigned char, 256> buffer{0x01, 0x20, 0x0A, 0x00, command};
@@ -91,18 +89,6 @@ TEST_F(Completeness, AnInventoryFaultLeavesLogAndSensorsWhole) {
     Send(0x11, {0, 16, 0, 16});  // past the end: the device is smaller
     EXPECT_EQ(Faults(), Texts{"Read FRU Data 0000: completion code c0"});
     EXPECT_TRUE(Account().Whole());
-}
-
-TEST_F(Completeness, AfterADeadlineNothingIsSentAndTheReportSaysWhy) {
-    Send(0x40);
-    tqrhost::StopAt(std::chrono::steady_clock::now());
-    const std::size_t before = requests.size();
-    Send(0x43, {0, 0, 0, 0, 0, 0xFF});
-    EXPECT_EQ(requests.size(), before);
-    EXPECT_EQ(Faults(), Texts{"Get SEL Entry 0000: deadline"});
-    tqrhost::StopNow();
-    Send(0x43, {0, 0, 2, 0, 0, 0xFF});
-    EXPECT_EQ(Faults().back(), "Get SEL Entry 0002: interrupted");
 }
 
 }  // namespace

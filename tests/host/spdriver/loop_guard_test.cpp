@@ -97,15 +97,6 @@ TEST_P(Guard, OtherPartsOfTheLastRecordAreGivenAfterIt) {
     EXPECT_FALSE(guard->Exchange(part(2)));
 }
 
-TEST_P(Guard, WhatIsNoReadOfARecordGoesThrough) {
-    Records({1, 2});
-    for (int i = 0; i < 3; ++i) {
-        EXPECT_TRUE(guard->Exchange(StorageRequest(0x11, {0, 0, 0, 16})));
-        EXPECT_TRUE(guard->Exchange(StorageRequest(GetParam(), {0, 0, 0})));
-    }
-    EXPECT_EQ(asked.size(), 6u);
-}
-
 // A walk over the event log ends at any next record ID of 0xFFxx; the locator walk goes on.
 TEST_P(Guard, OnlyTheEventLogEndsAtAHighByteFf) {
     Records({1, 0xFF10, 2});
