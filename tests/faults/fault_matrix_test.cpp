@@ -91,27 +91,32 @@ struct Pass {
     }
 };
 
-class FaultMatrix : public ::testing::Test {
+class FaultMatrix : public MachineTest {
 protected:
     FaultMatrix() {
-        bmc_.selEntries = {SystemEvent(1, 0x01, 0x30), SystemEvent(2, 0x07, 0x31, 0x6F, 0x01),
-                           OtherRecord(3, 0xDD), OtherRecord(4, 0xE1), SystemEvent(5, 0x01, 0x00)};
-        bmc_.sdrRecords = {FullSensor(1, 0x30, 0x07, 1, "Ambient"),
-                           FullSensor(2, 0x31, 0x03, 2, "CPU 2"), FruLocator(3, 3, "PSU 1")};
-        bmc_.fru = {{0, FixedLayout("Maker", "Board", "S-0")},
-                    {3, FixedLayout("Maker", "Supply", "S-3")}};
-        bmc_.auxLogCount = 0;
-        bmc_.deviceId = {0x20, 1, 2, 5, 2, 0xBF, 0xD9, 0x7E, 0, 0x34, 0x12, 0x11, 0x22, 0x33, 0x44};
-        bmc_.replies = {{0x3A, 0x91, {0x00}, {0, 1, 7}},
-                        {0x3A, 0x92, {0x00}, {0, 0x2C}},
-                        {0x3A, 0x93, {0x00}, {0, 1, 4, 2}},
-                        {0x3A, 0x93, {0x01}, {0, 1, 4, 3}}};
+        facts.machineType = "SIM-1";
+        facts.integratedBmc = true;
+        facts.localTime = "20240305120000.000000+060";
+        facts.smbios.push_back(OemStrings({"CPLD 2"}));
+        ipmisim::BmcDescription& bmc = nodes[0];
+        bmc.selEntries = {SystemEvent(1, 0x01, 0x30), SystemEvent(2, 0x07, 0x31, 0x6F, 0x01),
+                          OtherRecord(3, 0xDD), OtherRecord(4, 0xE1), SystemEvent(5, 0x01, 0x00)};
+        bmc.sdrRecords = {FullSensor(1, 0x30, 0x07, 1, "Ambient"),
+                          FullSensor(2, 0x31, 0x03, 2, "CPU 2"), FruLocator(3, 3, "PSU 1")};
+        bmc.fru = {{0, FixedLayout("Maker", "Board", "S-0")},
+                   {3, FixedLayout("Maker", "Supply", "S-3")}};
+        bmc.auxLogCount = 0;
+        bmc.deviceId = {0x20, 1, 2, 5, 2, 0xBF, 0xD9, 0x7E, 0, 0x34, 0x12, 0x11, 0x22, 0x33, 0x44};
+        bmc.replies = {{0x3A, 0x91, {0x00}, {0, 1, 7}},
+                       {0x3A, 0x92, {0x00}, {0, 0x2C}},
+                       {0x3A, 0x93, {0x00}, {0, 1, 4, 2}},
+                       {0x3A, 0x93, {0x01}, {0, 1, 4, 3}}};
         // Healthy BMCs, also those that lack something.
         for (const int missing : {0x00, 0x01, 0x11, 0x20, 0x22, 0x5A, 0x91}) {
             const Pass healthy = Run([&](std::size_t, const Step& step) {
                 return step.request.command() == missing ? Response{0xC1} : step.answer;
             });
-            if (missing == 0) clean_ = healthy;
+            if (missing == 0) clean = healthy;
             for (const tqrhost::Instance& instance : healthy.instances) {
                 for (const auto& [name, value] : instance.properties) {
                     healthyValues_.insert({name, Shown(value)});
@@ -119,23 +124,17 @@ protected:
             }
         }
     }
-    ~FaultMatrix() override {
-        tqrhost::RemoveLogConsumer(consumer_);
-        ipmisel::ResetModuleState();
-    }
-
     Pass Run(Spoil spoil) {
         ipmisel::ResetModuleState();
-        IPMISELPluginInit(context_.get());
+        IPMISELPluginInit(context.get());
+        log.Clear();
+        written.instances.clear();
         tqrhost::Source source;
-        source.facts.machineType = "SIM-1";
-        source.facts.integratedBmc = true;
-        source.facts.localTime = "20240305120000.000000+060";
-        source.facts.smbios = {IpmiDeviceStructure(), OemStrings({"CPLD 2"})};
+        source.facts = facts;
         Pass pass;
-        source.nodes.push_back(std::make_unique<SpoiledBmc>(bmc_, std::move(spoil), &pass.steps));
+        source.nodes.push_back(
+            std::make_unique<SpoiledBmc>(nodes[0], std::move(spoil), &pass.steps));
         tqrhost::OpenMachine(std::move(source));
-        InstanceRecorder written;
         const tqrhost::OutputHandle output(written);
         const char* classes[] = {ipmisel::kBmcFirmwareClass,
                                  ipmisel::kCpldFirmwareClass,
@@ -144,28 +143,27 @@ protected:
                                  "QORSG_IPMIFRU",
                                  "QORSG_IPMILogRecord",
                                  "QORSG_ZMCAuxDebugRecord"};
-        pass.status =
-            IPMISELGetData(context_.get(), output.get(), classes, std::size(classes)).code;
+        pass.status = IPMISELGetData(context.get(), output.get(), classes, std::size(classes)).code;
         pass.account = tqrhost::GetCompleteness().front();
         tqrhost::CloseMachine();
-        pass.instances = std::move(written.instances);
+        pass.instances = written.instances;
         return pass;
     }
     /// Runs a pass and looks at everything that must hold, whatever its BMC did: it ends, makes
     /// nothing up, and tells of what it lacks.
     void Expect(Spoil spoil, const std::string& what) {
         const Pass pass = Run(std::move(spoil));
-        EXPECT_LE(pass.steps.size(), 3 * clean_.steps.size()) << what;
+        EXPECT_LE(pass.steps.size(), 3 * clean.steps.size()) << what;
         EXPECT_THAT(pass.status, ::testing::AnyOf(0, 3)) << what;
         ExpectNothingMadeUp(pass, what);
-        if (pass.status == 0 && pass.Texts(false) != clean_.Texts(false)) {
+        if (pass.status == 0 && pass.Texts(false) != clean.Texts(false)) {
             EXPECT_FALSE(pass.account.Whole()) << what;
         }
-        if (pass.Texts(true) != clean_.Texts(true) && !pass.DeviceEnds()) {
+        if (pass.Texts(true) != clean.Texts(true) && !pass.DeviceEnds()) {
             EXPECT_FALSE(pass.account.faults.empty()) << what;
         }
     }
-    const std::vector<Step>& CleanSteps() const { return clean_.steps; }
+    Pass clean;
 
 private:
     /// Every log record came whole, and no instance holds a text that was not sent in this pass
@@ -212,12 +210,6 @@ private:
         });
     }
 
-    ipmisim::BmcDescription bmc_;
-    tqrhost::PluginContext context_{IPMISEL_TEXTS};
-    /// Somebody reads every line, so that every line is built.
-    int consumer_ = tqrhost::AddLogConsumer(
-        NQORTQR20::ILogger::kTrace, [](NQORTQR20::ILogger::ETQRLogSeverity, std::string_view) {});
-    Pass clean_;
     std::set<std::pair<std::string, std::string>> healthyValues_;
 };
 
@@ -279,7 +271,6 @@ struct LastingFault {
 };
 const LastingFault kLastingFaults[] = {
     {"silent", [](const Step&, const Step&) { return Answer(); }},
-    {"busy", [](const Step&, const Step&) { return Answer(Response{0xC0}); }},
     {"nothing but a completion code", [](const Step&, const Step&) { return Answer(Response{0}); }},
     {"half of every answer",
      [](const Step&, const Step& step) {
@@ -306,8 +297,9 @@ const LastingFault kLastingFaults[] = {
 };
 
 TEST_F(FaultMatrix, EveryRequestOnce) {
-    for (std::size_t at = 0; at < CleanSteps().size(); ++at) {
-        const Step& hit = CleanSteps()[at];
+    EXPECT_EQ(clean.instances.size(), 12U);
+    for (std::size_t at = 0; at < clean.steps.size(); ++at) {
+        const Step& hit = clean.steps[at];
         for (const FaultClass& fault : kFaultClasses) {
             const Answers answers = fault.instead(hit);
             for (std::size_t i = 0; i < answers.size(); ++i) {
@@ -321,11 +313,11 @@ TEST_F(FaultMatrix, EveryRequestOnce) {
 }
 
 TEST_F(FaultMatrix, FromEveryRequestOn) {
-    for (std::size_t at = 0; at < CleanSteps().size(); ++at) {
+    for (std::size_t at = 0; at < clean.steps.size(); ++at) {
         for (const LastingFault& fault : kLastingFaults) {
             Expect(
                 [&](std::size_t position, const Step& step) {
-                    return position < at ? step.answer : fault.answer(CleanSteps()[at], step);
+                    return position < at ? step.answer : fault.answer(clean.steps[at], step);
                 },
                 ipmisel::Format("from request %zu on, %s", at, fault.name));
         }

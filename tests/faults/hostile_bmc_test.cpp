@@ -68,18 +68,14 @@ TEST_F(HostileBmc, RecordLengthsThatLie) {
     const auto cut = [&](std::size_t length) {
         return Bytes(honest.begin(), honest.begin() + static_cast<std::ptrdiff_t>(length));
     };
-    Bytes huge = FullSensor(1, 0x30, 7, 1, std::string(31, 'A'));
-    huge.resize(255, 'B');
     const struct {
         const char* what;
         Bytes record;
         std::string name;
     } cases[] = {
         {"31 characters", FullSensor(1, 0x30, 7, 1, std::string(31, 'A')), std::string(16, 'A')},
-        {"as long as a record can be", huge, std::string(16, 'A')},
         {"length below the header's", with(4, 0), "Ambient"},
         {"length beyond the record", with(4, 0xFF), "Ambient"},
-        {"a name of no characters", with(47, 0xC0), "Ambient"},
         {"a name longer than the record", with(47, 0xDF), "Ambient"},
         {"the header alone", cut(5), ""},
         {"nothing after the sensor's number", cut(10), ""},

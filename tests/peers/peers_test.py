@@ -22,7 +22,6 @@ import guest  # noqa: E402
 
 SENSOR_SPECIFIC, THRESHOLD, DEASSERTION = 0x6F, 0x01, 0x80
 GENERIC_SENSOR_TYPE = 0x17  # one without offsets of its own
-UNKNOWN = (0xFF, 0xFF)      # event data 2 and 3
 # Sensor type, signedness, unit, M, B, exponents of B and R; name. IPMI 2.0, clause 36.3.
 ANALOG = [
     (0x01, 0x80, 1, 1, 0, 0, 0, "Signed"), (0x01, 0x40, 1, 1, 0, 0, 0, "Ones complement"),
@@ -60,7 +59,7 @@ def make_log() -> tuple[list[tuple], list[bytes]]:
     kinds += [(GENERIC_SENSOR_TYPE, event, f"Generic {event:02x}") for event in range(0x02, 0x0D)]
     for kind, event, name in kinds:
         sensors.append(sensor(len(sensors) + 1, kind, event, name))
-        events += [(kind, len(sensors), event, offset, *UNKNOWN) for offset in range(15)]
+        events += [(kind, len(sensors), event, offset, 0xFF, 0xFF) for offset in range(15)]
     for kind, sign, unit, m, b, b_exponent, r_exponent, name in ANALOG:
         sensors.append(sensor(len(sensors) + 1, kind, THRESHOLD, name,
                               (sign, unit, m, b, b_exponent, r_exponent)))
