@@ -1,9 +1,8 @@
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <stdexcept>
 
-#include "host/core/host.h"
+#include "tests/support/bmc_fixture.h"
 #include "tqr/plugin.h"
 
 namespace {
@@ -13,22 +12,19 @@ using namespace ::testing;
 using namespace tqrhost;
 using Bytes = std::vector<std::uint8_t>;
 
-class Recorder : public tqrhost::WholeInstanceSink {
+class Recorder : public ipmiseltest::InstanceRecorder {
 public:
-    std::vector<tqrhost::Instance> instances;
     bool full = false;
     bool broken = false;
 
     bool AddProperty(std::string_view name, const PropertyValue& value) override {
         if (broken) throw std::runtime_error("broken");
-        return !full && WholeInstanceSink::AddProperty(name, value);
+        return !full && InstanceRecorder::AddProperty(name, value);
     }
 
 protected:
     bool Take(const tqrhost::Instance& instance) override {
-        if (full) return false;
-        instances.push_back(instance);
-        return true;
+        return !full && InstanceRecorder::Take(instance);
     }
 };
 

@@ -1,39 +1,22 @@
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <cstdlib>
 #include <filesystem>
 
 #include "host/core/host.h"
+#include "tests/support/bmc_fixture.h"
 #include "tests/support/temporary_folder.h"
 #include "tqr/log.h"
 
 namespace {
 
 using namespace NQORTQR20;
+using tqrhost::Instance;
 using namespace ::testing;
-
-class ClassNames : public tqrhost::WholeInstanceSink {
-public:
-    std::vector<std::string> names;
-
-protected:
-    bool Take(const tqrhost::Instance& instance) override {
-        names.push_back(instance.className);
-        return true;
-    }
-};
 
 class PluginLoading : public ::testing::Test {
 protected:
-    void SetUp() override {
-        consumer_ = tqrhost::AddLogConsumer(
-            ILogger::kInfo, [this](auto, std::string_view text) { log.emplace_back(text); });
-    }
-    void TearDown() override {
-        unsetenv("TEST_PLUGIN_FAULT");
-        tqrhost::RemoveLogConsumer(consumer_);
-    }
+    ~PluginLoading() override { unsetenv("TEST_PLUGIN_FAULT"); }
     /// The line for the user when the file cannot be loaded.
     static std::string Failure(const std::filesystem::path& file) {
         try {
@@ -43,15 +26,12 @@ protected:
         }
         return "loaded";
     }
-    std::vector<std::string> log;
-
-private:
-    int consumer_ = 0;
+    ipmiseltest::LogRecorder log;
+    ipmiseltest::InstanceRecorder sink;
 };
 
 TEST_F(PluginLoading, DrivesAPlugin) {
     for (int round = 0; round < 2; ++round) {
-        ClassNames sink;
         {
             tqrhost::Plugin plugin(TEST_PLUGIN);
             EXPECT_EQ(plugin.Info().name, "TEST");
@@ -62,10 +42,13 @@ TEST_F(PluginLoading, DrivesAPlugin) {
             EXPECT_EQ(plugin.RunExporter("NoExporter", sink), std::nullopt);
         }
         const auto folder = std::filesystem::canonical(TEST_PLUGIN).parent_path();
-        EXPECT_THAT(sink.names, ElementsAre("B", "A", (folder / "ipmisel").string()));
+        EXPECT_THAT(std::exchange(sink.instances, {}),
+                    ElementsAre(Field(&Instance::className, "B"), Field(&Instance::className, "A"),
+                                Field(&Instance::className, (folder / "ipmisel").string())));
         // Loaded anew, it registers anew: once, and with a copy of its record.
-        EXPECT_THAT(log, ElementsAre("registered 0, again 3", "de-initialised"));
-        log.clear();
+        EXPECT_THAT(log.Lines(ILogger::kInfo),
+                    ElementsAre("registered 0, again 3", "de-initialised"));
+        log.Clear();
     }
 }
 
@@ -76,19 +59,19 @@ TEST_F(PluginLoading, PluginThatCannotBeUnloadedIsLoadedAgain) {
         // While it is in use, its one registration belongs to the first.
         EXPECT_THAT(Failure(TEST_PLUGIN_RESIDENT), HasSubstr("not register"));
     }
-    EXPECT_THAT(log, ElementsAre("registered 0, again 3", "de-initialised", "de-initialised"));
+    EXPECT_THAT(log.Lines(ILogger::kInfo),
+                ElementsAre("registered 0, again 3", "de-initialised", "de-initialised"));
 }
 
 TEST_F(PluginLoading, ExceptionsOfThePluginAreFailures) {
     setenv("TEST_PLUGIN_FAULT", "throw", 1);
     {
         tqrhost::Plugin plugin(TEST_PLUGIN);
-        ClassNames sink;
         EXPECT_EQ(plugin.Collect({"A"}, sink).code, kStatusFailed);
         EXPECT_EQ(plugin.Info().name, "");
     }
-    EXPECT_THAT(log, ElementsAre("registered 0, again 3", HasSubstr("thrown by the plug-in"),
-                                 HasSubstr("thrown"), HasSubstr("thrown")));
+    EXPECT_THAT(log.Lines(ILogger::kError), ElementsAre(HasSubstr("thrown by the plug-in"),
+                                                        HasSubstr("thrown"), HasSubstr("thrown")));
 }
 
 TEST_F(PluginLoading, FailureSaysInOneLineWhatAndWhatToDo) {
@@ -110,7 +93,8 @@ TEST_F(PluginLoading, FailureSaysInOneLineWhatAndWhatToDo) {
                                            Not(HasSubstr("\n"))))
             << c.fault;
     }
-    EXPECT_THAT(log, Not(Contains("de-initialised")));  // what did not start is not stopped
+    EXPECT_THAT(log.Lines(ILogger::kInfo),
+                Not(Contains("de-initialised")));  // what did not start is not stopped
     unsetenv("TEST_PLUGIN_FAULT");
     EXPECT_EQ(Failure(TEST_PLUGIN), "loaded");
 }

@@ -159,35 +159,31 @@ TEST_F(Pass, SelInfoIsAskedForTwice) {
     EXPECT_EQ(written.instances.size(), 3U);
 }
 
-TEST_F(Pass, SensorsReadBeforeAFailureAreUsed) {
-    const std::tuple<ipmisim::Fault, std::vector<std::string>> cases[] = {
-        {NoResponse(kGetSdrInfo, 1), {"", "", ""}},
-        {CompletionCode(kGetSdr, 4, 0xC5), {"Ambient", "", "Ambient"}},  // header of the second
-        {CompletionCode(kGetSdr, 5, 0xC5), {"Ambient", "", "Ambient"}},  // and its units
+TEST_F(Pass, WhatIsReadBeforeAFailureIsUsed) {
+    const std::string sensors = "Could not collect all sensor data records\n";
+    const std::string records = "Failed to fill all the entries into SEL array.\n";
+    const std::tuple<ipmisim::Fault, int, std::string, std::vector<std::string>> cases[] = {
+        {NoResponse(kGetSdrInfo, 1), 0, sensors, {"", "", ""}},
+        {CompletionCode(kGetSdr, 4, 0xC5),
+         0,
+         sensors,
+         {"Ambient", "", "Ambient"}},  // header of the second
+        {CompletionCode(kGetSdr, 5, 0xC5),
+         0,
+         sensors,
+         {"Ambient", "", "Ambient"}},  // and its units
+        {NoResponse(kGetSelEntry, 1), 1, records, {}},
+        {NoResponse(kGetSelEntry, 3), 1, records, {"Ambient", "CPU 2"}},
+        {CompletionCode(kGetSelEntry, 2, 0xCB), 1, records, {"Ambient"}},
     };
-    for (const auto& [fault, names] : cases) {
+    for (const auto& [fault, severity, line, names] : cases) {
         written.instances.clear();
         nodes[0].faults = {fault};
         EXPECT_EQ(Collect({kLog}), 0);
-        EXPECT_TRUE(Logged(0, "Could not collect all sensor data records\n"));
-        EXPECT_EQ(Logged(1, "No SDR data obtained.\n"), names[0].empty());
-        EXPECT_EQ(Written("SensorInformation"), names);
-    }
-}
-
-TEST_F(Pass, WalkThatEndsEarlyExportsWhatWasRead) {
-    const std::tuple<ipmisim::Fault, std::size_t> cases[] = {
-        {NoResponse(kGetSelEntry, 1), 0},
-        {NoResponse(kGetSelEntry, 3), 2},
-        {CompletionCode(kGetSelEntry, 2, 0xCB), 1},
-    };
-    for (const auto& [fault, exported] : cases) {
-        written.instances.clear();
-        nodes[0].faults = {fault};
-        EXPECT_EQ(Collect({kLog}), 0);
-        EXPECT_EQ(written.instances.size(), exported);
-        EXPECT_TRUE(Logged(1, "Failed to fill all the entries into SEL array.\n"));
+        EXPECT_TRUE(Logged(severity, line));
+        EXPECT_EQ(Logged(1, "No SDR data obtained.\n"), fault.command == kGetSdrInfo);
         EXPECT_TRUE(Logged(4, "num_SELentries = 3"));
+        EXPECT_EQ(Written("SensorInformation"), names);
     }
 }
 

@@ -1,8 +1,5 @@
 #include "plugin/entry_points.h"
 
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
 #include <array>
 #include <cstdio>
 #include <memory>

@@ -1,7 +1,6 @@
 #include "simulator/server_file.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <cstring>
 #include <string>

@@ -1,7 +1,5 @@
 #include "host/spdriver/loop_guard.h"
 
-#include <gtest/gtest.h>
-
 #include "tests/host/spdriver/requests.h"
 #include "tests/support/bmc_fixture.h"
 #include "tests/support/wire.h"

@@ -1,7 +1,6 @@
 #include "tqr/splibrary.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <stdexcept>
 
