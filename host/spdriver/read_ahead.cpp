@@ -39,6 +39,17 @@ bool IsRecordRead(const Ask& ask) {
 std::uint16_t RecordOf(const Ask& ask) { return Word(ask.data[2], ask.data[3]); }
 std::uint8_t OffsetOf(const Ask& ask) { return ask.data[4]; }
 
+/// With it a walk through the event log begins.
+bool IsSelInfo(const Ask& ask) {
+    return ask.netFn == kNetFnStorage && ask.command == kGetSelInfo && ask.data.empty();
+}
+Ask FirstSelEntry() {
+    return {kNetFnStorage,
+            0,
+            kGetSelEntry,
+            {0, 0, Low(kFirstRecord), High(kFirstRecord), 0, kToTheEnd}};
+}
+
 bool IsFruChunk(const Ask& ask) {
     return ask.netFn == kNetFnStorage && ask.command == kReadFruData && ask.data.size() == 4 &&
            ask.data[2] == 0 && ask.data[3] == kFruChunk;
@@ -78,11 +89,13 @@ void ReadAhead::Chain::Passed(std::uint16_t record) {
 }
 
 void ReadAhead::Asked(const Ask& ask) {
+    const bool walkHasBegun = now_ && IsSelInfo(*now_);
     now_ = ask;
+    if (IsSelInfo(ask)) eventLog_.Restart();
     if (!IsRecordRead(ask)) return;
     const std::uint16_t record = RecordOf(ask);
     if (ask.command == kGetSelEntry) {
-        if (record == kFirstRecord) eventLog_.Restart();
+        if (record == kFirstRecord && !walkHasBegun) eventLog_.Restart();
         eventLog_.Passed(record);
         return;
     }
@@ -155,6 +168,7 @@ std::vector<Ask> ReadAhead::Next(std::size_t count) const {
         }
         return asks;
     }
+    if (IsSelInfo(*now_) && count > 0) asks.push_back(FirstSelEntry());
     if (!IsRecordRead(*now_)) return asks;
 
     std::uint16_t record = RecordOf(*now_);

@@ -26,7 +26,8 @@ struct Ask {
 ///
 /// Three walks are known, and nothing but their read-only commands is ever guessed: the event log
 /// by record ID (Get SEL Entry), the sensor repository by record ID with the parts of a record that
-/// the reader takes (Get SDR), and the sixteen-byte chunks of a FRU device (Read FRU Data). Where
+/// the reader takes (Get SDR), and the sixteen-byte chunks of a FRU device (Read FRU Data). The
+/// first of the events is expected after Get SEL Info. Where
 /// an answer has named the next record, that is taken; beyond it the stride of the last two record
 /// IDs is tried. A wrong guess costs one answer that nobody asks for.
 class ReadAhead {

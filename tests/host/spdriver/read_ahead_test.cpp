@@ -34,6 +34,11 @@ Response Header(std::uint16_t record, std::uint16_t next, std::uint8_t type) {
 
 TEST(ReadAhead, TakesTheNextEventFromTheAnswersAndBeyondThemByTheStride) {
     ReadAhead ahead;
+    ahead.Asked({0x0A, 0, 0x40, {}});
+    EXPECT_EQ(ahead.Next(2), std::vector<Ask>{SelAsk(0)});
+    ahead.Answered(SelAsk(0), Next(5));
+    ahead.Asked(SelAsk(0));
+    EXPECT_EQ(ahead.Next(1), std::vector<Ask>{SelAsk(5)});
     ahead.Asked(SelAsk(0));
     EXPECT_EQ(ahead.Next(2), (std::vector<Ask>{SelAsk(1), SelAsk(2)}));
     ahead.Answered(SelAsk(0), Next(0x10));
@@ -50,6 +55,7 @@ TEST(ReadAhead, TakesTheNextEventFromTheAnswersAndBeyondThemByTheStride) {
 TEST(ReadAhead, FollowsTheSensorWalkThroughTheParts) {
     ReadAhead ahead;
     ahead.Asked(SdrAsk(0, 0, 10));
+    EXPECT_EQ(ahead.Next(2), (std::vector<Ask>{SdrAsk(1, 0, 10), SdrAsk(2, 0, 10)}));
     ahead.Answered(SdrAsk(0, 0, 10), Header(1, 2, 0x01));
     EXPECT_EQ(ahead.Next(3),
               (std::vector<Ask>{SdrAsk(0, 20, 10), SdrAsk(0, 47, 0xFF), SdrAsk(2, 0, 10)}));
@@ -75,7 +81,7 @@ TEST(ReadAhead, FollowsTheLocatorWalkAndTheInventory) {
 }
 
 TEST(ReadAhead, GuessesNothingButTheReadsOfTheThreeWalks) {
-    for (const Ask& ask : {Ask{0x0A, 0, 0x40, {}}, Ask{0x0A, 0, 0x22, {}}, Ask{0x0A, 0, 0x43, {1}},
+    for (const Ask& ask : {Ask{0x0A, 0, 0x41, {}}, Ask{0x0A, 0, 0x22, {}}, Ask{0x0A, 0, 0x43, {1}},
                            Ask{0x06, 0, 0x43, {0, 0, 0, 0, 0, 0xFF}},
                            Ask{0x0A, 0, 0x11, {3, 0, 0, 8}}, SdrAsk(1, 3, 4)}) {
         ReadAhead ahead;
