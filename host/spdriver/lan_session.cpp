@@ -465,11 +465,12 @@ void LanSession::HandleAnswer(const rmcpplus::Answer& answer) {
     if (request.tries == 1) {
         roundTrip_.Measured(
             std::chrono::duration_cast<RoundTrip::Duration>(now - request.firstSent));
+        // Of several tries nobody knows which was answered, nor what that has overtaken.
+        for (auto& [rqSeq, other] : outstanding_) {
+            if (other.lastSerial < request.lastSerial) ++other.overtaken;
+        }
     } else {
         rqSeqFree_[answer.rqSeq] = now + kRqSeqQuarantine;
-    }
-    for (auto& [rqSeq, other] : outstanding_) {
-        if (other.lastSerial < request.lastSerial) ++other.overtaken;
     }
     const std::uint8_t code = answer.response[0];
     if (IsBusy(code)) {
