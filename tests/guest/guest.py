@@ -3,9 +3,11 @@
 The guest is a Debian kernel with an initramfs of busybox and the built program. What it prints
 between two marks on its serial console is what the program printed.
 """
+import base64
 import contextlib
 import os
 import pathlib
+import re
 import shutil
 import socket
 import struct
@@ -52,22 +54,15 @@ def _cpio(entries: list[tuple[str, int, bytes]]) -> bytes:
     for number, (name, mode, contents) in enumerate(entries + [("TRAILER!!!", 0, b"")], 1):
         fields = (number, mode, 0, 0, 1, 0, len(contents), 0, 0, 0, 0, len(name) + 1, 0)
         archive += b"070701" + b"".join(b"%08X" % field for field in fields)
-        archive += name.encode() + b"\0"
-        archive += b"\0" * (-len(archive) % 4)
-        archive += contents
-        archive += b"\0" * (-len(archive) % 4)
+        for part in (name.encode() + b"\0", contents):
+            archive += part
+            archive += b"\0" * (-len(archive) % 4)
     return bytes(archive)
 
 
 def _libraries(binary: pathlib.Path) -> set[str]:
     lines = subprocess.run(["ldd", binary], capture_output=True, text=True, check=True).stdout
-    found = set()
-    for line in lines.splitlines():
-        parts = line.split()
-        path = parts[2] if "=>" in parts and len(parts) > 2 else parts[0]
-        if path.startswith("/"):
-            found.add(path)
-    return found
+    return set(re.findall(r"(?:=> |^\s*)(/\S+)", lines, re.MULTILINE))
 
 
 def initramfs(build: pathlib.Path, modules: list[pathlib.Path], script: str) -> bytes:
@@ -115,18 +110,12 @@ class Run:
     """What the program did in the guest."""
 
     def __init__(self, console: str):
-        import base64
-        self.console = console
-        parts = {}
-        for part in ("status", "err", "out"):
-            begin, end = f"@@@ begin {part}", f"@@@ end {part}"
-            if begin not in console or end not in console:
-                raise AssertionError("the guest did not come to its end:\n" + console[-3000:])
-            text = console.split(begin, 1)[1].split(end, 1)[0]
-            parts[part] = base64.b64decode("".join(text.split())).decode(errors="replace")
+        parts = {name: base64.b64decode("".join(text.split())).decode(errors="replace")
+                 for name, text in re.findall(r"@@@ begin (\w+)(.*?)@@@ end \1", console, re.DOTALL)}
+        if len(parts) != 3:
+            raise AssertionError("the guest did not come to its end:\n" + console[-3000:])
         self.status = int(parts["status"].split()[1])
-        self.err = parts["err"]
-        self.out = parts["out"]
+        self.err, self.out = parts["err"], parts["out"]
 
 
 def run_guest(build, cache, arguments: str, devices: list[str], load_driver: bool = True) -> Run:
@@ -161,19 +150,13 @@ def ipmi_sim(sel: list[bytes], sdrs: list[bytes]):
     if not program:
         raise Missing("no ipmi_sim (package openipmi)")
     udp, tcp = free_port(socket.SOCK_DGRAM), free_port()
-    levels = "\n".join(f"    allowed_auths_{level} none md2 md5 straight"
+    levels = "\n".join(f"allowed_auths_{level} none md2 md5 straight"
                        for level in ("callback", "user", "operator", "admin"))
-    lan = f"""name "guest"
-set_working_mc 0x20
-  startlan 1
-    addr 127.0.0.1 {udp}
-    priv_limit admin
-{levels}
-    guid a123456789abcdefa123456789abcdef
-  endlan
-  serial 15 127.0.0.1 {tcp} codec VM
-  user 2 true "root" "secret" admin 10 none md2 md5 straight
-"""
+    lan = (f'name "guest"\nset_working_mc 0x20\n'
+           f"startlan 1\naddr 127.0.0.1 {udp}\npriv_limit admin\n{levels}\n"
+           f"guid a123456789abcdefa123456789abcdef\nendlan\n"
+           f"serial 15 127.0.0.1 {tcp} codec VM\n"
+           f'user 2 true "root" "secret" admin 10 none md2 md5 straight\n')
     def hexes(data):
         return " ".join(f"0x{byte:02x}" for byte in data)
 
