@@ -2,7 +2,10 @@
 
 #include <gtest/gtest.h>
 
+#include <numeric>
+
 #include "tests/support/temporary_folder.h"
+#include "tests/support/wire.h"
 
 namespace {
 
@@ -23,18 +26,41 @@ Bytes Join(std::initializer_list<Bytes> parts) {
 /// Makes `bytes` add up to 0 by the byte at `at`.
 void SetChecksum(std::span<std::uint8_t> bytes, std::size_t at) {
     bytes[at] = 0;
-    unsigned sum = 0;
-    for (const std::uint8_t byte : bytes) sum += byte;
-    bytes[at] = static_cast<std::uint8_t>(0x100 - sum % 0x100);
+    bytes[at] = static_cast<std::uint8_t>(-std::accumulate(bytes.begin(), bytes.end(), 0));
 }
 
 Bytes EntryPoint2(std::uint16_t length, std::uint8_t count) {
-    Bytes bytes{'_', 'S', 'M', '_', 0, 0x1F, 2, 8, 0, 1, 0, 0, 0, 0, 0, 0, '_', 'D', 'M', 'I', '_'};
-    const auto low = static_cast<std::uint8_t>(length);
-    const auto high = static_cast<std::uint8_t>(length >> 8);
-    for (const int byte : {0, int{low}, int{high}, 0, 0, 0x0F, 0, int{count}, 0, 0x28}) {
-        bytes.push_back(static_cast<std::uint8_t>(byte));
-    }
+    Bytes bytes{'_',
+                'S',
+                'M',
+                '_',
+                0,
+                0x1F,
+                2,
+                8,
+                0,
+                1,
+                0,
+                0,
+                0,
+                0,
+                0,
+                0,
+                '_',
+                'D',
+                'M',
+                'I',
+                '_',
+                0,
+                ipmiseltest::Low(length),
+                ipmiseltest::High(length),
+                0,
+                0,
+                0x0F,
+                0,
+                count,
+                0,
+                0x28};
     SetChecksum(std::span(bytes).subspan(0x10), 5);
     SetChecksum(bytes, 4);
     return bytes;

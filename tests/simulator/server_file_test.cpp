@@ -10,26 +10,21 @@ namespace {
 
 using namespace ::testing;
 
-constexpr const char* kWhole = R"({
-  // a server with everything
+constexpr const char* kWhole = R"({  // a server with everything
   "machine_type": "SIM-1", "integrated_bmc": true, "ipmi_driver": false, "ipmi_lan": true,
   "local_time": "20240305120000.000000+060",
   "smbios": ["26 12 0030", ""],
   "bmcs": [{}, {
-    "device_id": "20 01",
-    "latency_us": 4294967295,
+    "device_id": "20 01", "latency_us": 4294967295,
     "sel": {"version": "02", "entries": ["0100 02 b0e5e665 2000 04 01 30 01 59 50 45"],
             "time": 1709640000},
     "sdr": {"version": "15", "records": ["0A0b0C"]}, /* short */
-    "fru": {"0": "01", "255": "0203"},
-    "aux_log": {"count": 7},
+    "fru": {"0": "01", "255": "0203"}, "aux_log": {"count": 7},
     "replies": [{"netfn": "0a", "command": "5b", "request": "01", "response": "001234"}],
-    "faults": [
-      {"netfn": "0a", "command": "40", "call": 1, "no_response": true},
+    "faults": [{"netfn": "0a", "command": "40", "call": 1, "no_response": true},
       {"netfn": "0a", "command": "43", "completion_code": "cb"},
       {"netfn": "0a", "command": "23", "truncate": 4},
-      {"netfn": "3f", "command": "43", "data": "00 ff"}
-    ]
+      {"netfn": "3f", "command": "43", "data": "00 ff"}]
   }]
 })";
 
@@ -60,33 +55,33 @@ TEST(ServerFile, TheMachineIsRead) {
 TEST(ServerFile, RefusalNamesLineKeyAndReason) {
     // Each is the good file with one thing replaced.
     const std::tuple<const char*, const char*, const char*> cases[] = {
-        {"_type", "", "3: machine: no such key here"},
-        {"\"SIM-1\"", "5", "3: machine_type: must be a text, not number"},
-        {"true, \"ipmi_d", "1, \"ipmi_d", "3: integrated_bmc: must be true or false, not number"},
-        {"+060", "", "4: local_time: must be a time as in 20240305120000.000000+060"},
-        {"0030", "030", "5: smbios[0]: a byte is two hexadecimal digits; their number here is odd"},
-        {"20 01", "20 0x", "7: bmcs[1].device_id: character 5 is no hexadecimal digit"},
-        {"7295", "7296", "8: bmcs[1].latency_us: must be 0 to 4294967295, not 4294967296"},
-        {"4294967295", "-1", "8: bmcs[1].latency_us: must be 0 to 4294967295, not -1"},
+        {"_type", "", "2: machine: no such key here"},
+        {"\"SIM-1\"", "5", "2: machine_type: must be a text, not number"},
+        {"true, \"ipmi_d", "1, \"ipmi_d", "2: integrated_bmc: must be true or false, not number"},
+        {"+060", "", "3: local_time: must be a time as in 20240305120000.000000+060"},
+        {"0030", "030", "4: smbios[0]: a byte is two hexadecimal digits; their number here is odd"},
+        {"20 01", "20 0x", "6: bmcs[1].device_id: character 5 is no hexadecimal digit"},
+        {"7295", "7296", "6: bmcs[1].latency_us: must be 0 to 4294967295, not 4294967296"},
+        {"4294967295", "-1", "6: bmcs[1].latency_us: must be 0 to 4294967295, not -1"},
         {"7295", ".0",
-         "8: bmcs[1].latency_us: must be a whole number, 0 to 4294967295, not number"},
+         "6: bmcs[1].latency_us: must be a whole number, 0 to 4294967295, not number"},
         {"\"02\"", "\"0002\"",
-         "9: bmcs[1].sel.version: must be one byte in hexadecimal digits, not 2"},
-        {" 50 45", " 50", "9: bmcs[1].sel.entries[0]: an entry has 16 bytes, not 15"},
-        {"[\"0A0b0C\"]", "{}", "11: bmcs[1].sdr.records: must be a list, not object"},
-        {"\"255\"", "\"256\"", "12: bmcs[1].fru.256: a FRU device ID is a number from 0 to 255"},
-        {"\"command\": \"5b\", ", "", "14: bmcs[1].replies[0].command: is missing"},
+         "7: bmcs[1].sel.version: must be one byte in hexadecimal digits, not 2"},
+        {" 50 45", " 50", "7: bmcs[1].sel.entries[0]: an entry has 16 bytes, not 15"},
+        {"[\"0A0b0C\"]", "{}", "9: bmcs[1].sdr.records: must be a list, not object"},
+        {"\"255\"", "\"256\"", "10: bmcs[1].fru.256: a FRU device ID is a number from 0 to 255"},
+        {"\"command\": \"5b\", ", "", "11: bmcs[1].replies[0].command: is missing"},
         {"\"call\": 1", "\"call\": 0",
-         "16: bmcs[1].faults[0].call: must be 1 to 4294967295, not 0"},
+         "12: bmcs[1].faults[0].call: must be 1 to 4294967295, not 0"},
         {"nse\": true", "nse\": false",
-         "16: bmcs[1].faults[0].no_response: can only be true; leave the key out"},
+         "12: bmcs[1].faults[0].no_response: can only be true; leave the key out"},
         {", \"completion_code\": \"cb\"", "",
-         "17: bmcs[1].faults[1]: a fault is one of no_response, completion_code, truncate and "
+         "13: bmcs[1].faults[1]: a fault is one of no_response, completion_code, truncate and "
          "data, not 0 of them"},
         {": 4}", ": 4, \"data\": \"\"}",
-         "18: bmcs[1].faults[2]: a fault is one of no_response, completion_code, truncate and "
+         "14: bmcs[1].faults[2]: a fault is one of no_response, completion_code, truncate and "
          "data, not 2 of them"},
-        {"\"3f\"", "\"40\"", "19: bmcs[1].faults[3].netfn: a NetFn has six bits, 00 to 3f"},
+        {"\"3f\"", "\"40\"", "15: bmcs[1].faults[3].netfn: a NetFn has six bits, 00 to 3f"},
     };
     for (const auto& [from, to, message] : cases) {
         std::string text = kWhole;

@@ -72,8 +72,10 @@ TEST_F(Completeness, ACircleIsAFaultAndAnAbsentDeviceIsNone) {
 }
 
 TEST_F(Completeness, AWalkThatEndsEarlyIsNotMadeUpForByAnother) {
-    bmc.faults = {
-        ipmiseltest::Answer(0x43, 2, {0xFF, 0xFF, 2, 0, 2, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0})};
+    ipmisim::Bytes last(18, 0xFF);  // by its next record ID
+    last[2] = last[4] = 2;
+    last[3] = 0;
+    bmc.faults = {ipmiseltest::Answer(0x43, 2, last)};
     Send(0x40);
     for (const std::uint8_t record : {0, 2}) Send(0x43, {0, 0, record, 0, 0, 0xFF});
     ReadLog();

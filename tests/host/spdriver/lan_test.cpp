@@ -39,6 +39,18 @@ protected:
         }
         return "";
     }
+    struct Change {
+        std::function<void(SourceOptions*)> change;
+        const char* reason;
+    };
+    void ExpectRefusals(const std::string& place, const std::vector<Change>& cases) {
+        const SourceOptions good = options;
+        for (const Change& c : cases) {
+            c.change(&options);
+            EXPECT_THAT(Refusal(place), HasSubstr(c.reason));
+            options = good;
+        }
+    }
 };
 
 TEST_F(Lan, APlaceThatCannotBeIsRefusedAtOnce) {
@@ -59,26 +71,14 @@ TEST_F(Lan, APlaceThatCannotBeIsRefusedAtOnce) {
 }
 
 TEST_F(Lan, AccessThatCannotBeIsRefusedAtOnce) {
-    const struct {
-        std::function<void(SourceOptions*)> change;
-        const char* reason;
-    } cases[] = {
-        {[](auto* o) { o->privilege = "king"; }, "\"king\"; use one of user, operator, admin"},
-        {[](auto* o) {
-             o->workarounds = {"authcap", "magic"};
-         },
-         "\"magic\"; use one of authcap,"},
-        {[](auto* o) { o->cipherSuite = 4; }, "cipher suite 4 is not supported"},
-        {[](auto* o) { o->user = std::string(17, 'u'); }, "user name is longer than the 16 bytes"},
-        {[](auto* o) { o->password = [] { return std::string(21, 'p'); }; },
-         "password is longer than the 20 bytes"},
-    };
-    const SourceOptions good = options;
-    for (const auto& c : cases) {
-        options = good;
-        c.change(&options);
-        EXPECT_THAT(Refusal("127.0.0.1"), HasSubstr(c.reason));
-    }
+    ExpectRefusals(
+        "127.0.0.1",
+        {{[](auto* o) { o->privilege = "king"; }, "\"king\"; use one of user, operator, admin"},
+         {[](auto* o) { o->workarounds.push_back("magic"); }, "\"magic\"; use one of authcap,"},
+         {[](auto* o) { o->cipherSuite = 4; }, "cipher suite 4 is not supported"},
+         {[](auto* o) { o->user = std::string(17, 'u'); }, "user name is longer than the 16 bytes"},
+         {[](auto* o) { o->password = [] { return std::string(21, 'p'); }; },
+          "password is longer than the 20 bytes"}});
 }
 
 TEST_F(Lan, ANameThatDoesNotResolveAndSilenceAreTold) {
@@ -93,22 +93,12 @@ TEST_F(Lan, ANameThatDoesNotResolveAndSilenceAreTold) {
 
 TEST_F(Lan, WhatFailsAtTheLogInIsToldApart) {
     if (!IpmiSim::Missing().empty()) GTEST_SKIP() << IpmiSim::Missing();
-    const struct {
-        std::function<void(SourceOptions*)> change;
-        const char* reason;
-    } cases[] = {
-        {[](auto* o) { o->password = [] { return std::string("wrong"); }; }, "wrong password"},
-        {[](auto* o) { o->user = "nobody"; }, "does not know the user name"},
-        {[](auto* o) { o->cipherSuite = 17; }, "the BMC"},
-    };
     IpmiSim sim({});
-    const SourceOptions good = options;
-    for (const auto& c : cases) {
-        options = good;
-        c.change(&options);
-        EXPECT_THAT(Refusal(sim.Place()), HasSubstr(c.reason));
-    }
-    options = good;
+    ExpectRefusals(
+        sim.Place(),
+        {{[](auto* o) { o->password = [] { return std::string("wrong"); }; }, "wrong password"},
+         {[](auto* o) { o->user = "nobody"; }, "does not know the user name"},
+         {[](auto* o) { o->cipherSuite = 17; }, "the BMC"}});
     options.cipherSuite = 3;
     options.workarounds.clear();  // the privilege is named in Open Session, so it is granted there
     passwordsAsked = 0;
