@@ -12,15 +12,13 @@ using tqrhost::StopReason;
 
 class Table : public testing::Test {
 protected:
-    std::size_t nodes = 1;
-
     /// The table of these instances, without its first line and the last.
     std::string Print(const std::vector<Instance>& instances) {
         testing::internal::CaptureStdout();
         {
             ipmisel::OutputFile out(std::nullopt);
             const auto report =
-                ipmisel::MakeTableReport(out, {"sim:x", {"IPMISEL", "1.0", "1.0"}, "SIM-1", nodes});
+                ipmisel::MakeTableReport(out, {"sim:x", {"IPMISEL", "1.0", "1.0"}, "SIM-1", 1});
             for (const Instance& instance : instances) report->Add(instance);
             report->Finish({});
             out.Commit();
@@ -77,16 +75,6 @@ TEST_F(Table, ARecordIsOneRowOfColumnsThatWrap) {
                            software.
                            Channel 7
 )");
-}
-
-TEST_F(Table, NodesAreNamedWhereThereAreSeveral) {
-    Instance second = Record("x");
-    Set(&second, "SourceNode", "2");
-    EXPECT_THAT(Print({Record("x")}), testing::StartsWith(kHead));
-    nodes = 2;
-    EXPECT_THAT(Print({Record("x"), second}),
-                testing::AllOf(testing::StartsWith("\nQORSG_IPMILogRecord, node 1\nRecord "),
-                               testing::HasSubstr("\n\nQORSG_IPMILogRecord, node 2\nRecord ")));
 }
 
 TEST_F(Table, AnyOtherClassIsReadableToo) {

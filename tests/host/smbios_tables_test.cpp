@@ -30,37 +30,13 @@ void SetChecksum(std::span<std::uint8_t> bytes, std::size_t at) {
 }
 
 Bytes EntryPoint2(std::uint16_t length, std::uint8_t count) {
-    Bytes bytes{'_',
-                'S',
-                'M',
-                '_',
-                0,
-                0x1F,
-                2,
-                8,
-                0,
-                1,
-                0,
-                0,
-                0,
-                0,
-                0,
-                0,
-                '_',
-                'D',
-                'M',
-                'I',
-                '_',
-                0,
-                ipmiseltest::Low(length),
-                ipmiseltest::High(length),
-                0,
-                0,
-                0x0F,
-                0,
-                count,
-                0,
-                0x28};
+    Bytes bytes(0x1F);
+    std::copy_n("_SM_", 4, bytes.begin());
+    std::copy_n("_DMI_", 5, bytes.begin() + 0x10);
+    bytes[0x05] = 0x1F;
+    bytes[0x16] = ipmiseltest::Low(length);
+    bytes[0x17] = ipmiseltest::High(length);
+    bytes[0x1C] = count;
     SetChecksum(std::span(bytes).subspan(0x10), 5);
     SetChecksum(bytes, 4);
     return bytes;

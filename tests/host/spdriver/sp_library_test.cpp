@@ -101,35 +101,18 @@ TEST_F(Send, MisuseIsRefusedBeforeAnythingIsSent) {
     EXPECT_FALSE(SPLibrary(nullptr).sendIPMICommand(Buffer(15).data(), &length, 15, true));
 }
 
-TEST_F(Send, TheFrameIsReadAsItIsLaidOut) {
-    script.response = Response{0x00};
-    std::vector<unsigned char> buffer{0x01, 0x20, 0x0B, 0x02, 0x43, 2, 0, 0,
-                                      0,    0xD1, 0xD2, 0,    0,    0, 0, 9};
-    int length = 256;
-    ASSERT_TRUE(library.sendIPMICommand(buffer.data(), &length, 16, true));
-    EXPECT_EQ(script.asked->netFn(), 0x0B);
-    EXPECT_EQ(script.asked->lun(), 0x02);
-    EXPECT_EQ(script.asked->command(), 0x43);
-    EXPECT_THAT(script.asked->data(), ::testing::ElementsAre(0xD1, 0xD2));
-    EXPECT_EQ(script.asked->bytes().size(), 15u);
-}
-
-TEST(Machine, ItsNodesAndFactsLastUntilItIsClosed) {
+TEST(Machine, ItsNodesLastUntilItIsClosed) {
     Script script;
     tqrhost::Source source;
-    source.facts.integratedBmc = true;
-    source.facts.ipmiDriver = false;
     for (int i = 0; i < 2; ++i)
         source.nodes.push_back(std::make_unique<ScriptedTransport>(&script));
     tqrhost::OpenMachine(std::move(source));
     ASSERT_EQ(SPLibrary::GetNumberBMCNode(), 2);
-    EXPECT_TRUE(SPLibrary::GetSplibraryInstance(1)->IsiBMCMachine());
+    EXPECT_NE(SPLibrary::GetSplibraryInstance(1), nullptr);
     EXPECT_EQ(SPLibrary::GetSplibraryInstance(2), nullptr);
     EXPECT_EQ(SPLibrary::GetSplibraryInstance(-1), nullptr);
-    EXPECT_FALSE(SPLibrary::IsIPMIDriversPresent());
     tqrhost::CloseMachine();
     EXPECT_EQ(SPLibrary::GetSplibraryInstance(0), nullptr);
-    EXPECT_TRUE(SPLibrary::IsIPMIDriversPresent());
 }
 
 }  // namespace
