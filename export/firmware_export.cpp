@@ -1,5 +1,7 @@
 #include "export/firmware_export.h"
 
+#include <cstdint>
+#include <optional>
 #include <utility>
 
 #include "base/text.h"
@@ -7,8 +9,15 @@
 namespace ipmisel {
 namespace {
 
-/// A manufacturer ID that names nobody.
+// IDs that name nobody and nothing (IPMI 2.0, table 20-2).
 constexpr std::uint32_t kUnspecified = 0;
+constexpr std::uint32_t kReservedManufacturer = 0x0FFFFF;
+constexpr std::uint32_t kReservedProduct = 0xFFFF;
+
+template <typename Id>
+bool Names(const std::optional<Id>& id, std::uint32_t reserved) {
+    return id && *id != kUnspecified && *id != reserved;
+}
 
 }  // namespace
 
@@ -20,8 +29,10 @@ FirmwareElement BmcElement(const DeviceID& device, const std::string& build) {
     element.version = element.majorVersion + "." + element.minorVersion;
     element.revision = build;
     element.identifyingNumber = Format("Device ID 0x%02X", device.deviceId);
-    if (device.product) element.identifyingNumber += Format(", Product ID 0x%04X", *device.product);
-    if (device.manufacturer && *device.manufacturer != kUnspecified) {
+    if (Names(device.product, kReservedProduct)) {
+        element.identifyingNumber += Format(", Product ID 0x%04X", *device.product);
+    }
+    if (Names(device.manufacturer, kReservedManufacturer)) {
         element.manufacturer = std::to_string(*device.manufacturer);
     }
     return element;

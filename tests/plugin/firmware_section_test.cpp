@@ -110,10 +110,12 @@ TEST_F(FirmwareSection, BuildOfTheBmcMayComeFromSmbios) {
         EXPECT_EQ(Story(kBmc), c.story) << c.answered;
         EXPECT_EQ(Written("Revision"), c.revision) << c.answered;
     }
-    nodes[0].deviceId = Bytes{0x20, 0, 0x02, 0x05, 0, 0, 0, 0, 0};  // names no manufacturer
-    Story(kBmc);
-    EXPECT_THAT(Written("Manufacturer"), ElementsAre("(none)"));
-    EXPECT_THAT(Written("IdentifyingNumber"), ElementsAre("Device ID 0x20"));
+    for (const std::uint8_t id : {0x00, 0xFF}) {  // unspecified, and reserved
+        nodes[0].deviceId = Bytes{0x20, 0, 0x02, 0x05, 0, 0, id, id, id, id, id};
+        Story(kBmc);
+        EXPECT_THAT(Written("Manufacturer"), ElementsAre("(none)"));
+        EXPECT_THAT(Written("IdentifyingNumber"), ElementsAre("Device ID 0x20"));
+    }
 }
 
 TEST_F(FirmwareSection, VersionsThatCannotBeHadAreNotMadeUp) {
