@@ -116,8 +116,6 @@ constexpr std::array<MachineFamily, 3> kFamilies{{
 
 }  // namespace
 
-std::span<const MachineFamily> MachineFamilies() { return kFamilies; }
-
 const MachineFamily* FindMachineFamily(string_view machineType, int* index) {
     const auto* const found =
         std::find_if(kFamilies.begin(), kFamilies.end(), [&](const MachineFamily& family) {

@@ -74,7 +74,5 @@ struct MachineFamily {
 /// The family of a machine type, compared as a whole; null when there is none. `index`, when given,
 /// becomes the family's place in the table; it is left alone when there is none.
 const MachineFamily* FindMachineFamily(std::string_view machineType, int* index = nullptr);
-/// Every family, in table order.
-std::span<const MachineFamily> MachineFamilies();
 
 }  // namespace ipmisel
