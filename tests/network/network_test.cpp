@@ -14,18 +14,18 @@
 
 #include "collector/classes.h"
 #include "host/spdriver/stop.h"
+#include "simulator/network_bmc.h"
 #include "simulator/server_file.h"
 #include "tests/support/ipmi_sim.h"
 #include "tests/support/machine_fixture.h"
-#include "tests/support/rmcpplus_peer.h"
 #include "tests/support/run_program.h"
 
 namespace {
 
-using ipmiseltest::Packet;
+using ipmisim::Packet;
 using Packets = std::vector<Packet>;
 using ipmisim::ServerDescription;
-using Peer = ipmiseltest::RmcpPlusPeer;
+using Peer = ipmisim::NetworkBmc;
 using ::testing::HasSubstr;
 
 /// What one collection brought.

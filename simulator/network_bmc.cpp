@@ -1,4 +1,4 @@
-#include "tests/support/rmcpplus_peer.h"
+#include "simulator/network_bmc.h"
 
 #include <arpa/inet.h>
 #include <gcrypt.h>
@@ -11,7 +11,7 @@
 #include <initializer_list>
 #include <stdexcept>
 
-namespace ipmiseltest {
+namespace ipmisim {
 namespace {
 
 constexpr std::size_t kHeader = 16;  // RMCP header and session header
@@ -73,7 +73,7 @@ Packet Setup(std::uint8_t payloadType, const Packet& payload) {
 
 }  // namespace
 
-RmcpPlusPeer::RmcpPlusPeer(ipmisim::BmcDescription bmc, Character character)
+NetworkBmc::NetworkBmc(BmcDescription bmc, Character character)
     : bmc_(std::move(bmc)), character_(std::move(character)) {
     gcry_check_version(nullptr);
     socket_ = socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
@@ -89,13 +89,13 @@ RmcpPlusPeer::RmcpPlusPeer(ipmisim::BmcDescription bmc, Character character)
     thread_ = std::thread([this] { Serve(); });
 }
 
-RmcpPlusPeer::~RmcpPlusPeer() {
+NetworkBmc::~NetworkBmc() {
     ended_ = true;
     thread_.join();
     close(socket_);
 }
 
-void RmcpPlusPeer::Serve() {
+void NetworkBmc::Serve() {
     while (!ended_) {
         pollfd wait{socket_, POLLIN, 0};
         if (poll(&wait, 1, 20) < 1) continue;
@@ -115,7 +115,7 @@ void RmcpPlusPeer::Serve() {
     }
 }
 
-void RmcpPlusPeer::Answer(const Packet& packet, bool busy) {
+void NetworkBmc::Answer(const Packet& packet, bool busy) {
     if (packet.size() < kHeader || packet[3] != 0x07) return;
     const Packet payload = Cut(packet, kHeader, packet[14] | packet[15] << 8);
     Packet answer;
@@ -140,7 +140,7 @@ void RmcpPlusPeer::Answer(const Packet& packet, bool busy) {
 }
 
 /// In a packet of IPMI 1.5, which wants no session.
-Packet RmcpPlusPeer::Capabilities(const Packet& packet) const {
+Packet NetworkBmc::Capabilities(const Packet& packet) const {
     const Packet message = Cut(packet, 14);
     if (message.size() < 9 || message[5] != 0x38) return {};
     const std::uint8_t status = character_.kg.empty() ? 0x04 : 0x24;
@@ -148,7 +148,7 @@ Packet RmcpPlusPeer::Capabilities(const Packet& packet) const {
     return Join({Cut(packet, 0, 13), Number(static_cast<std::uint32_t>(reply.size()), 1), reply});
 }
 
-Packet RmcpPlusPeer::OpenSession(const Packet& payload) {
+Packet NetworkBmc::OpenSession(const Packet& payload) {
     const Algorithms ours = AlgorithmsOf(character_.cipherSuite);
     const Packet tag = Cut(payload, 0, 1);
     if (payload[12] != ours.authentication || payload[20] != ours.integrity ||
@@ -162,7 +162,7 @@ Packet RmcpPlusPeer::OpenSession(const Packet& payload) {
         0x11, Join({tag, {0, 4, 0}, session_.consoleId, session_.managedId, Cut(payload, 8, 24)}));
 }
 
-Packet RmcpPlusPeer::Rakp2(const Packet& payload) {
+Packet NetworkBmc::Rakp2(const Packet& payload) {
     Session& s = session_;
     if (Cut(payload, 4, 4) != s.managedId) return {};
     s.consoleRandom = Cut(payload, 8, 16);
@@ -183,7 +183,7 @@ Packet RmcpPlusPeer::Rakp2(const Packet& payload) {
                                                   s.bmcRandom, kGuid, s.who}))}));
 }
 
-Packet RmcpPlusPeer::Rakp4(const Packet& payload) {
+Packet NetworkBmc::Rakp4(const Packet& payload) {
     const Session& s = session_;
     const Packet password(std::begin(kPassword), std::end(kPassword));
     if (Cut(payload, 4, 4) != s.managedId ||
@@ -195,7 +195,7 @@ Packet RmcpPlusPeer::Rakp4(const Packet& payload) {
                  Join({Cut(payload, 0, 1), {0, 0, 0}, s.consoleId, Cut(code, 0, CodeLength())}));
 }
 
-Packet RmcpPlusPeer::Execute(const Packet& packet, bool busy) {
+Packet NetworkBmc::Execute(const Packet& packet, bool busy) {
     const std::size_t payloadLength = packet[14] | packet[15] << 8;
     if (Cut(packet, 6, 4) != session_.managedId || packet != Signed(packet)) return {};
     const std::uint32_t sequence = NumberAt(packet, 10);
@@ -214,20 +214,20 @@ Packet RmcpPlusPeer::Execute(const Packet& packet, bool busy) {
     return response ? Answered(message, *response) : Packet();
 }
 
-Packet RmcpPlusPeer::Answered(const Packet& message, const Packet& data) {
+Packet NetworkBmc::Answered(const Packet& message, const Packet& data) {
     ++session_.sent;
     lastReply_ = Reply(message, data);
     return Sealed(lastReply_);
 }
 
-Packet RmcpPlusPeer::Lie() const {
+Packet NetworkBmc::Lie() const {
     Packet message = lastReply_;
     message.pop_back();
     for (std::size_t i = 7; i < message.size(); ++i) message[i] ^= 0x11;
     return Sealed(Join({Cut(message, 0, 3), WithChecksum(Cut(message, 3))}));
 }
 
-Packet RmcpPlusPeer::Sealed(const Packet& message) const {
+Packet NetworkBmc::Sealed(const Packet& message) const {
     Packet plain = message;
     const std::size_t padding = kBlock - 1 - message.size() % kBlock;
     for (std::size_t i = 1; i <= padding; ++i) plain.push_back(static_cast<std::uint8_t>(i));
@@ -245,11 +245,11 @@ Packet RmcpPlusPeer::Sealed(const Packet& message) const {
     return Signed(whole);
 }
 
-std::size_t RmcpPlusPeer::CodeLength() const {
+std::size_t NetworkBmc::CodeLength() const {
     return AlgorithmsOf(character_.cipherSuite).codeLength;
 }
 
-Packet RmcpPlusPeer::Signed(Packet packet) const {
+Packet NetworkBmc::Signed(Packet packet) const {
     const std::size_t length = CodeLength();
     if (packet.size() < kHeader + length) return packet;
     const std::size_t end = packet.size() - length;
@@ -258,7 +258,7 @@ Packet RmcpPlusPeer::Signed(Packet packet) const {
     return packet;
 }
 
-Packet RmcpPlusPeer::Hmac(const Packet& key, const Packet& data) const {
+Packet NetworkBmc::Hmac(const Packet& key, const Packet& data) const {
     const int digest = AlgorithmsOf(character_.cipherSuite).digest;
     gcry_md_hd_t handle = nullptr;
     if (gcry_md_open(&handle, digest, GCRY_MD_FLAG_HMAC) != 0 ||
@@ -267,12 +267,12 @@ Packet RmcpPlusPeer::Hmac(const Packet& key, const Packet& data) const {
     }
     gcry_md_write(handle, data.data(), data.size());
     const std::uint8_t* const code = gcry_md_read(handle, digest);
-    const Packet result(code, code + gcry_md_get_algo_dlen(digest));
+    Packet result(code, code + gcry_md_get_algo_dlen(digest));
     gcry_md_close(handle);
     return result;
 }
 
-Packet RmcpPlusPeer::Aes(const Packet& initial, const Packet& data, bool encrypt) const {
+Packet NetworkBmc::Aes(const Packet& initial, const Packet& data, bool encrypt) const {
     Packet result(data.size());
     gcry_cipher_hd_t handle = nullptr;
     const Packet& key = session_.confidentialityKey;
@@ -287,4 +287,4 @@ Packet RmcpPlusPeer::Aes(const Packet& initial, const Packet& data, bool encrypt
     return result;
 }
 
-}  // namespace ipmiseltest
+}  // namespace ipmisim

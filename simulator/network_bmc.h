@@ -12,14 +12,14 @@
 
 #include "simulator/simulated_bmc.h"
 
-namespace ipmiseltest {
+namespace ipmisim {
 
 using Packet = std::vector<std::uint8_t>;
 
 /// A BMC over RMCP+ (IPMI 2.0, chapter 13) on a loopback port, with the user "root" and the
 /// password "secret", that answers from a simulated BMC and misbehaves as it is told. Keys and
 /// packets are its own work, not that of the code under test.
-class RmcpPlusPeer {
+class NetworkBmc {
 public:
     struct Character {
         int cipherSuite = 17;  ///< or 3
@@ -28,15 +28,15 @@ public:
         bool busyBeyondFirst = false;  ///< of requests that come together it takes one
         // Both are called by the peer's own thread.
         /// What has come together, before it is read: to be dropped and reordered.
-        std::function<void(RmcpPlusPeer&, std::vector<Packet>*)> receive{};
+        std::function<void(NetworkBmc&, std::vector<Packet>*)> receive{};
         /// What goes out instead of an answer.
-        std::function<std::vector<Packet>(RmcpPlusPeer&, const Packet&)> send{};
+        std::function<std::vector<Packet>(NetworkBmc&, const Packet&)> send{};
     };
 
-    RmcpPlusPeer(ipmisim::BmcDescription bmc, Character character);
-    ~RmcpPlusPeer();
-    RmcpPlusPeer(const RmcpPlusPeer&) = delete;
-    RmcpPlusPeer& operator=(const RmcpPlusPeer&) = delete;
+    NetworkBmc(BmcDescription bmc, Character character);
+    ~NetworkBmc();
+    NetworkBmc(const NetworkBmc&) = delete;
+    NetworkBmc& operator=(const NetworkBmc&) = delete;
 
     /// "lan:HOST:PORT"
     std::string Place() const { return "lan:127.0.0.1:" + std::to_string(port_); }
@@ -74,7 +74,7 @@ private:
     Packet Hmac(const Packet& key, const Packet& data) const;
     Packet Aes(const Packet& initial, const Packet& data, bool encrypt) const;
 
-    ipmisim::SimulatedBmc bmc_;
+    SimulatedBmc bmc_;
     Character character_;
     Session session_;
     Packet lastReply_;
@@ -86,4 +86,4 @@ private:
     std::thread thread_;
 };
 
-}  // namespace ipmiseltest
+}  // namespace ipmisim
