@@ -244,10 +244,10 @@ TEST_F(Slow, AnInterruptionLeavesAReportOfWhatWasRead) {
     ASSERT_TRUE(IsReading(program));
     program.Signal(SIGINT);
     EXPECT_EQ(program.Wait().exitStatus, 4);
-    const Json report = Json::parse(ReadText(InPlace("report")), nullptr, false);
+    Json report = Json::parse(ReadText(InPlace("report")), nullptr, false);
     ASSERT_FALSE(report.is_discarded());
-    EXPECT_EQ(report["completeness"][0]["log"]["announced"], 200);
-    EXPECT_EQ(report["completeness"][0]["faults"][0]["problem"], "interrupted");
+    EXPECT_THAT(report["completeness"].dump(),
+                AllOf(HasSubstr(R"("announced":200)"), HasSubstr(R"("problem":"interrupted")")));
     EXPECT_THAT(Left(), ElementsAre("report"));
 }
 
