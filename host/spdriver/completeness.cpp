@@ -31,6 +31,7 @@ constexpr std::uint8_t kToTheEnd = 0xFF;
 /// by its own length byte than the record's length has it stays.
 void CutToRecord(std::size_t rest, Response* response) {
     constexpr std::uint8_t kNameLength = 0x1F;
+    if (response->size() <= kRecordAt) return;
     const std::size_t name = std::size_t{1} + (response->at(kRecordAt) & kNameLength);
     response->resize(std::min(response->size(), kRecordAt + std::max(rest, name)));
 }
