@@ -26,8 +26,9 @@ if(IPMISEL_FUZZ)
   target_link_options(ipmisel_flags INTERFACE -fsanitize=address,undefined)
 endif()
 
-# ipmisel_plugin_part(NAME sources... ): a static part of the plug-in. Nothing of it is exported.
-function(ipmisel_plugin_part name)
+# ipmisel_part(NAME sources... ): a static part of a plug-in, a library or the program. Nothing of it is
+# exported.
+function(ipmisel_part name)
   add_library(${name} STATIC ${ARGN})
   target_link_libraries(${name} PUBLIC ipmisel_flags)
   set_target_properties(${name} PROPERTIES CXX_VISIBILITY_PRESET hidden

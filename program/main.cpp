@@ -1,3 +1,3 @@
-#include "collector/collect.h"
+#include "program/commands/collect.h"
 
 int main(int argc, char** argv) { return ipmisel::RunProgram(argc, argv); }

@@ -5,7 +5,7 @@
 #include <limits>
 #include <string_view>
 
-#include "base/strict_json.h"
+#include "simulator/strict_json.h"
 
 namespace ipmisim {
 namespace {

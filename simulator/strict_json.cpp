@@ -1,4 +1,4 @@
-#include "base/strict_json.h"
+#include "simulator/strict_json.h"
 
 #include <algorithm>
 #include <cerrno>

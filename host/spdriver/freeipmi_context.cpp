@@ -7,8 +7,8 @@
 #include <iterator>
 #include <vector>
 
-#include "base/log.h"
 #include "base/text.h"
+#include "tqr/log.h"
 
 namespace tqrhost {
 namespace {
@@ -77,10 +77,12 @@ std::string ErrorAdvice(const std::string& place, int error) {
 }
 
 void LogNoResponse(const RequestFrame& request, const char* why) {
-    if (!ipmisel::LogEnabled(ipmisel::kNotice)) return;
-    ipmisel::WriteLog(ipmisel::kNotice,
-                      ipmisel::Format("No response to NetFn 0x%02x command 0x%02x: %s.",
-                                      request.netFn(), request.command(), why));
+    using NQORTQR20::ILogger;
+    if (!NQORTQR20::fdrLogEnabled(ILogger::kNotice)) return;
+    NQORTQR20::fdrWriteLog(ILogger::kNotice,
+                           ipmisel::Format("No response to NetFn 0x%02x command 0x%02x: %s.",
+                                           request.netFn(), request.command(), why)
+                               .c_str());
 }
 
 std::optional<Response> FreeIpmiTransport::Exchange(const RequestFrame& request) {

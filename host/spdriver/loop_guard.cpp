@@ -3,9 +3,9 @@
 #include <utility>
 
 #include "base/bytes.h"
-#include "base/log.h"
 #include "base/text.h"
 #include "host/spdriver/commands.h"
+#include "tqr/log.h"
 
 namespace tqrhost {
 namespace {
@@ -81,10 +81,12 @@ std::optional<Response> LoopGuard::Read(Walk* walk, bool isEventLog, const Reque
 
     if (walk->ended && record == kFirstRecord && offset == 0) walk->Restart();
     if (walk->WasGiven(record, offset)) {
-        ipmisel::WriteLog(ipmisel::kNotice,
-                          ipmisel::Format("The BMC leads the walk over its %s in a circle: "
-                                          "record 0x%04x was read before.",
-                                          isEventLog ? "event log" : "sensor repository", record));
+        NQORTQR20::fdrWriteLog(
+            NQORTQR20::ILogger::kNotice,
+            ipmisel::Format("The BMC leads the walk over its %s in a circle: "
+                            "record 0x%04x was read before.",
+                            isEventLog ? "event log" : "sensor repository", record)
+                .c_str());
         walk->Restart();
         endedCircle_ = true;
         return std::nullopt;

@@ -10,9 +10,9 @@
 #include <utility>
 #include <vector>
 
-#include "base/strict_json.h"
 #include "host/spdriver/kinds.h"
 #include "host/spdriver/transport.h"
+#include "simulator/strict_json.h"
 
 // A capture: one JSON object a line. The first holds the facts of the machine, every other one
 // exchange: {"node": 0, "request": "0120...", "response": "00..." or null}.

@@ -3,7 +3,7 @@
 #include <string>
 #include <string_view>
 
-#include "base/result.h"
+#include "plugins/ipmisel/result.h"
 #include "tqr/log.h"
 
 namespace ipmisel {

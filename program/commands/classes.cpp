@@ -1,4 +1,4 @@
-#include "collector/classes.h"
+#include "program/commands/classes.h"
 
 namespace ipmisel {
 namespace {

@@ -1,4 +1,4 @@
-#include "collector/collect.h"
+#include "program/commands/collect.h"
 
 #include <unistd.h>
 
@@ -16,17 +16,17 @@
 #include <variant>
 #include <vector>
 
-#include "collector/classes.h"
-#include "collector/failure.h"
-#include "collector/log_lines.h"
-#include "collector/output_file.h"
-#include "collector/password.h"
-#include "collector/report.h"
-#include "collector/stop_signals.h"
-#include "collector/terminal_text.h"
 #include "host/core/host.h"
 #include "host/spdriver/stop.h"
 #include "host/spdriver/transport.h"
+#include "program/commands/classes.h"
+#include "program/commands/failure.h"
+#include "program/commands/log_lines.h"
+#include "program/commands/password.h"
+#include "program/commands/stop_signals.h"
+#include "program/reports/output_file.h"
+#include "program/reports/report.h"
+#include "program/reports/terminal_text.h"
 #include "tqr/splibrary.h"
 
 namespace ipmisel {

@@ -1,6 +1,6 @@
 #pragma once
 
-#include "collector/options.h"
+#include "program/commands/options.h"
 
 namespace ipmisel {
 

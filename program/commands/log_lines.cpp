@@ -1,12 +1,12 @@
-#include "collector/log_lines.h"
+#include "program/commands/log_lines.h"
 
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
 
-#include "collector/failure.h"
-#include "collector/json_text.h"
-#include "collector/terminal_text.h"
+#include "program/commands/failure.h"
+#include "program/reports/json_text.h"
+#include "program/reports/terminal_text.h"
 
 namespace ipmisel {
 namespace {

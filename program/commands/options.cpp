@@ -1,4 +1,4 @@
-#include "collector/options.h"
+#include "program/commands/options.h"
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
@@ -6,9 +6,9 @@
 #include <string_view>
 
 #include "base/text.h"
-#include "collector/classes.h"
-#include "collector/failure.h"
-#include "collector/report.h"
+#include "program/commands/classes.h"
+#include "program/commands/failure.h"
+#include "program/reports/report.h"
 
 namespace ipmisel {
 namespace {

@@ -1,4 +1,4 @@
-#include "collector/password.h"
+#include "program/commands/password.h"
 
 #include <fcntl.h>
 #include <poll.h>
@@ -14,7 +14,7 @@
 #include <iterator>
 #include <string_view>
 
-#include "collector/failure.h"
+#include "program/commands/failure.h"
 
 namespace ipmisel {
 namespace {

@@ -1,4 +1,4 @@
-#include "collector/stop_signals.h"
+#include "program/commands/stop_signals.h"
 
 #include <unistd.h>
 

@@ -11,9 +11,9 @@
 #include <nlohmann/json.hpp>
 #include <system_error>
 
-#include "collector/failure.h"
-#include "collector/json_text.h"
-#include "collector/report.h"
+#include "program/commands/failure.h"
+#include "program/reports/json_text.h"
+#include "program/reports/report.h"
 
 namespace ipmisel {
 namespace {

@@ -1,11 +1,11 @@
-#include "collector/json_text.h"
+#include "program/reports/json_text.h"
 
 #include <algorithm>
 #include <type_traits>
 #include <variant>
 
 #include "base/text.h"
-#include "collector/terminal_text.h"
+#include "program/reports/terminal_text.h"
 
 namespace ipmisel {
 namespace {

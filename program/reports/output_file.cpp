@@ -1,4 +1,4 @@
-#include "collector/output_file.h"
+#include "program/reports/output_file.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -10,8 +10,8 @@
 #include <cstring>
 #include <filesystem>
 
-#include "collector/failure.h"
-#include "collector/stop_signals.h"
+#include "program/commands/failure.h"
+#include "program/commands/stop_signals.h"
 
 namespace ipmisel {
 namespace {

@@ -1,6 +1,6 @@
-#include "collector/report.h"
+#include "program/reports/report.h"
 
-#include "collector/failure.h"
+#include "program/commands/failure.h"
 
 namespace ipmisel {
 namespace {

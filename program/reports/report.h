@@ -6,11 +6,11 @@
 #include <string_view>
 #include <vector>
 
-#include "collector/output_file.h"
 #include "host/core/host.h"
 #include "host/core/sink.h"
 #include "host/spdriver/stop.h"
 #include "host/spdriver/transport.h"
+#include "program/reports/output_file.h"
 #include "tqr/status.h"
 
 namespace ipmisel {

@@ -3,8 +3,8 @@
 #include <map>
 
 #include "base/text.h"
-#include "collector/report.h"
-#include "collector/terminal_text.h"
+#include "program/reports/report.h"
+#include "program/reports/terminal_text.h"
 
 namespace ipmisel {
 namespace {

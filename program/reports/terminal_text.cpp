@@ -1,4 +1,4 @@
-#include "collector/terminal_text.h"
+#include "program/reports/terminal_text.h"
 
 #include <algorithm>
 #include <cstdint>

@@ -4,7 +4,7 @@
 #include <set>
 
 #include "base/text.h"
-#include "plugin/sections.h"
+#include "plugins/ipmisel/pass/sections.h"
 #include "tests/support/fru_inventory.h"
 #include "tests/support/machine_fixture.h"
 

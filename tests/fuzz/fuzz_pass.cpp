@@ -15,8 +15,8 @@
 #include "host/core/host.h"
 #include "host/smbios/smbios_tables.h"
 #include "host/spdriver/transport.h"
-#include "plugin/entry_points.h"
-#include "plugin/state.h"
+#include "plugins/ipmisel/pass/entry_points.h"
+#include "plugins/ipmisel/pass/state.h"
 
 namespace {
 

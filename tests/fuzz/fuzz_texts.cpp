@@ -6,7 +6,7 @@
 #include <string_view>
 
 #include "base/text.h"
-#include "mapping/numbered_texts.h"
+#include "plugins/ipmisel/texts/numbered_texts.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     const std::string contents(data, data + size);

@@ -12,8 +12,8 @@
 #include <string>
 #include <vector>
 
-#include "collector/classes.h"
 #include "host/spdriver/stop.h"
+#include "program/commands/classes.h"
 #include "simulator/network_bmc.h"
 #include "simulator/server_file.h"
 #include "tests/support/ipmi_sim.h"

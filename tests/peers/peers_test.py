@@ -70,7 +70,7 @@ def make_log() -> tuple[list[tuple], list[bytes]]:
 
 
 def texts() -> dict[str, str]:
-    lines = (SOURCE / "mapping/ipmisel.INI").read_text().splitlines()
+    lines = (SOURCE / "plugins/ipmisel/texts/ipmisel.INI").read_text().splitlines()
     return dict(line.split("=", 1) for line in lines if re.match(r"\d+=", line))
 
 

@@ -9,8 +9,8 @@
 
 #include "host/core/host.h"
 #include "host/spdriver/transport.h"
-#include "plugin/entry_points.h"
-#include "plugin/state.h"
+#include "plugins/ipmisel/pass/entry_points.h"
+#include "plugins/ipmisel/pass/state.h"
 #include "simulator/simulated_bmc.h"
 #include "tests/support/bmc_fixture.h"
 #include "tests/support/wire.h"

@@ -1,4 +1,4 @@
-#include "export/aux_debug_export.h"
+#include "plugins/ipmisel/export/aux_debug_export.h"
 
 #include <algorithm>
 #include <array>
@@ -6,9 +6,9 @@
 #include <span>
 #include <string>
 
-#include "export/clock_difference.h"
-#include "export/copied_text.h"
-#include "export/value_array.h"
+#include "plugins/ipmisel/export/clock_difference.h"
+#include "plugins/ipmisel/export/copied_text.h"
+#include "plugins/ipmisel/export/value_array.h"
 
 using NQORTQR20::fdriIOHandle;
 using NQORTQR20::kStatusFailed;

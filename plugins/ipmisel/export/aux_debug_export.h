@@ -1,8 +1,8 @@
 #pragma once
 
-#include "mapping/ipmi_mapping.h"
-#include "records/rows.h"
-#include "records/sel_entry.h"
+#include "plugins/ipmisel/records/rows.h"
+#include "plugins/ipmisel/records/sel_entry.h"
+#include "plugins/ipmisel/texts/ipmi_mapping.h"
 #include "tqr/plugin.h"
 #include "tqr/splibrary.h"
 

@@ -1,10 +1,10 @@
-#include "export/clock_difference.h"
+#include "plugins/ipmisel/export/clock_difference.h"
 
 #include <exception>
 #include <string>
 
-#include "base/log.h"
-#include "ipmi/diff_time.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/requests/diff_time.h"
 
 namespace ipmisel {
 

@@ -4,8 +4,8 @@
 #include <cstddef>
 #include <string>
 
-#include "base/log.h"
 #include "base/text.h"
+#include "plugins/ipmisel/log.h"
 #include "tqr/status.h"
 
 namespace ipmisel {

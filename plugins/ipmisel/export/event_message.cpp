@@ -1,4 +1,4 @@
-#include "export/event_message.h"
+#include "plugins/ipmisel/export/event_message.h"
 
 #include <string_view>
 

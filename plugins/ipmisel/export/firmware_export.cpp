@@ -1,4 +1,4 @@
-#include "export/firmware_export.h"
+#include "plugins/ipmisel/export/firmware_export.h"
 
 #include <cstdint>
 #include <optional>

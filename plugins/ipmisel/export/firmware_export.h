@@ -2,8 +2,8 @@
 
 #include <string>
 
-#include "inventory/vpd_entry.h"
-#include "ipmi/request_vpd.h"
+#include "plugins/ipmisel/inventory/vpd_entry.h"
+#include "plugins/ipmisel/requests/request_vpd.h"
 
 // Firmware as instances; the properties are named as those of CIM_SoftwareIdentity are.
 

@@ -1,12 +1,12 @@
-#include "export/fru_export.h"
+#include "plugins/ipmisel/export/fru_export.h"
 
 #include <algorithm>
 #include <array>
 #include <utility>
 
-#include "base/log.h"
 #include "base/text.h"
-#include "inventory/spd.h"
+#include "plugins/ipmisel/inventory/spd.h"
+#include "plugins/ipmisel/log.h"
 
 namespace ipmisel {
 namespace {

@@ -4,11 +4,11 @@
 #include <string_view>
 #include <vector>
 
-#include "inventory/vpd_entry.h"
-#include "ipmi/request_fru_locator.h"
-#include "ipmi/request_vpd.h"
-#include "mapping/machine_families.h"
-#include "records/fru_locator.h"
+#include "plugins/ipmisel/inventory/vpd_entry.h"
+#include "plugins/ipmisel/records/fru_locator.h"
+#include "plugins/ipmisel/requests/request_fru_locator.h"
+#include "plugins/ipmisel/requests/request_vpd.h"
+#include "plugins/ipmisel/texts/machine_families.h"
 #include "tqr/plugin.h"
 
 // The FRU inventory as instances of QORSG_IPMIFRU. A device yields one when its data has four

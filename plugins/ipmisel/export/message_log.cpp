@@ -1,4 +1,4 @@
-#include "export/message_log.h"
+#include "plugins/ipmisel/export/message_log.h"
 
 #include <initializer_list>
 

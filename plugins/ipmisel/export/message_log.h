@@ -1,6 +1,6 @@
 #pragma once
 
-#include "base/exported.h"
+#include "plugins/ipmisel/exported.h"
 #include "tqr/plugin.h"
 
 // The event log as a CIM message log, for a host that wants it in addition to the records. No pass

@@ -1,17 +1,17 @@
-#include "export/sel_export.h"
+#include "plugins/ipmisel/export/sel_export.h"
 
 #include <algorithm>
 #include <array>
 #include <cstdlib>
 #include <string>
 
-#include "base/log.h"
 #include "base/text.h"
-#include "export/clock_difference.h"
-#include "export/copied_text.h"
-#include "export/event_message.h"
-#include "export/value_array.h"
-#include "mapping/entity_names.h"
+#include "plugins/ipmisel/export/clock_difference.h"
+#include "plugins/ipmisel/export/copied_text.h"
+#include "plugins/ipmisel/export/event_message.h"
+#include "plugins/ipmisel/export/value_array.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/texts/entity_names.h"
 
 using NQORTQR20::fdriIOHandle;
 using NQORTQR20::kStatusFailed;

@@ -3,10 +3,10 @@
 #include <cstdio>
 #include <vector>
 
-#include "mapping/ipmi_mapping.h"
-#include "records/extended_log.h"
-#include "records/sdr_entry.h"
-#include "records/sel_entry.h"
+#include "plugins/ipmisel/records/extended_log.h"
+#include "plugins/ipmisel/records/sdr_entry.h"
+#include "plugins/ipmisel/records/sel_entry.h"
+#include "plugins/ipmisel/texts/ipmi_mapping.h"
 #include "tqr/plugin.h"
 #include "tqr/splibrary.h"
 

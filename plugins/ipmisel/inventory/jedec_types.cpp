@@ -1,5 +1,5 @@
 // Made by make_jedec_types.py from jep106.csv; edit those.
-#include "inventory/jedec_types.h"
+#include "plugins/ipmisel/inventory/jedec_types.h"
 
 const char* const JEDEC_Types[kJedecBanks * kJedecCodes] = {
     // bank 1

@@ -1,7 +1,7 @@
 #!/usr/bin/env python3
 """Writes jedec_types.cpp from jep106.csv, the names of JEDEC standard JEP106, banks 1 to 7.
 
-usage: inventory/make_jedec_types.py  (from anywhere; both files stand beside this script)
+usage: plugins/ipmisel/inventory/make_jedec_types.py  (from anywhere; both files stand beside this script)
 """
 import csv
 import pathlib
@@ -19,7 +19,7 @@ if set(names) != wanted:
 
 lines = [
     "// Made by make_jedec_types.py from jep106.csv; edit those.",
-    '#include "inventory/jedec_types.h"',
+    '#include "plugins/ipmisel/inventory/jedec_types.h"',
     "",
     "const char* const JEDEC_Types[kJedecBanks * kJedecCodes] = {",
 ]

@@ -1,13 +1,13 @@
-#include "inventory/spd.h"
+#include "plugins/ipmisel/inventory/spd.h"
 
 #include <algorithm>
 #include <array>
 #include <numeric>
 #include <vector>
 
-#include "base/log.h"
 #include "base/text.h"
-#include "inventory/vpd_entry.h"
+#include "plugins/ipmisel/inventory/vpd_entry.h"
+#include "plugins/ipmisel/log.h"
 
 namespace ipmisel {
 namespace {

@@ -1,7 +1,7 @@
-#include "inventory/vpd_entry.h"
+#include "plugins/ipmisel/inventory/vpd_entry.h"
 
-#include "base/log.h"
-#include "inventory/jedec_types.h"
+#include "plugins/ipmisel/inventory/jedec_types.h"
+#include "plugins/ipmisel/log.h"
 
 using NQORTQR20::fdriIOHandle;
 using NQORTQR20::kStatusFailed;

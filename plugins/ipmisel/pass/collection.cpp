@@ -1,4 +1,4 @@
-#include "plugin/collection.h"
+#include "plugins/ipmisel/pass/collection.h"
 
 #include <algorithm>
 #include <memory>
@@ -6,11 +6,11 @@
 #include <string>
 #include <utility>
 
-#include "base/log.h"
-#include "plugin/discovery.h"
-#include "plugin/driver_notice.h"
-#include "plugin/sections.h"
-#include "plugin/state.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/pass/discovery.h"
+#include "plugins/ipmisel/pass/driver_notice.h"
+#include "plugins/ipmisel/pass/sections.h"
+#include "plugins/ipmisel/pass/state.h"
 #include "tqr/log.h"
 
 using NQORTQR20::fdriIOHandle;

@@ -1,4 +1,4 @@
-#include "plugin/discovery.h"
+#include "plugins/ipmisel/pass/discovery.h"
 
 #include <dlfcn.h>
 
@@ -8,9 +8,9 @@
 #include <string_view>
 #include <vector>
 
-#include "base/log.h"
 #include "base/text.h"
-#include "plugin/state.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/pass/state.h"
 #include "tqr/datetime.h"
 #include "tqr/log.h"
 #include "tqr/smbios.h"

@@ -1,10 +1,10 @@
-#include "plugin/driver_notice.h"
+#include "plugins/ipmisel/pass/driver_notice.h"
 
 #include <algorithm>
 #include <array>
 #include <cstdlib>
 
-#include "plugin/discovery.h"
+#include "plugins/ipmisel/pass/discovery.h"
 
 namespace ipmisel {
 namespace {

@@ -1,13 +1,13 @@
-#include "plugin/entry_points.h"
+#include "plugins/ipmisel/pass/entry_points.h"
 
 #include <cstddef>
 #include <span>
 
-#include "base/log.h"
-#include "export/fru_export.h"
-#include "plugin/collection.h"
-#include "plugin/sections.h"
-#include "plugin/state.h"
+#include "plugins/ipmisel/export/fru_export.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/pass/collection.h"
+#include "plugins/ipmisel/pass/sections.h"
+#include "plugins/ipmisel/pass/state.h"
 
 using ipmisel::Module;
 using NQORTQR20::fdriIOHandle;

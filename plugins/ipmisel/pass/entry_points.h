@@ -1,6 +1,6 @@
 #pragma once
 
-#include "base/exported.h"
+#include "plugins/ipmisel/exported.h"
 #include "tqr/plugin.h"
 
 class IPMIRequestFRULocator;

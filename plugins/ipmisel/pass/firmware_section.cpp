@@ -1,12 +1,12 @@
 #include <string>
 #include <vector>
 
-#include "base/log.h"
 #include "base/text.h"
-#include "export/firmware_export.h"
-#include "plugin/discovery.h"
-#include "plugin/sections.h"
-#include "plugin/state.h"
+#include "plugins/ipmisel/export/firmware_export.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/pass/discovery.h"
+#include "plugins/ipmisel/pass/sections.h"
+#include "plugins/ipmisel/pass/state.h"
 
 // Firmware versions are read in-band only. Where they stand, a machine's family says; of a machine
 // of no family none is guessed.

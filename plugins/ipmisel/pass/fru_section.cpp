@@ -1,11 +1,11 @@
 #include <cstdint>
 #include <vector>
 
-#include "base/log.h"
-#include "export/fru_export.h"
-#include "plugin/entry_points.h"
-#include "plugin/sections.h"
-#include "plugin/state.h"
+#include "plugins/ipmisel/export/fru_export.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/pass/entry_points.h"
+#include "plugins/ipmisel/pass/sections.h"
+#include "plugins/ipmisel/pass/state.h"
 
 namespace ipmisel {
 namespace {

@@ -4,12 +4,12 @@
 #include <string>
 #include <vector>
 
-#include "base/log.h"
 #include "base/text.h"
-#include "export/aux_debug_export.h"
-#include "export/sel_export.h"
-#include "plugin/sections.h"
-#include "records/rows.h"
+#include "plugins/ipmisel/export/aux_debug_export.h"
+#include "plugins/ipmisel/export/sel_export.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/pass/sections.h"
+#include "plugins/ipmisel/records/rows.h"
 
 // The event log of one node: rows of text from the BMC, decoded into records with the help of the
 // sensor cache, exported with what the auxiliary log says of them.

@@ -1,4 +1,4 @@
-#include "plugin/entry_points.h"
+#include "plugins/ipmisel/pass/entry_points.h"
 
 // Only in the shared library, so that programs that link its parts do not register.
 

@@ -6,15 +6,15 @@
 #include <string_view>
 #include <vector>
 
-#include "inventory/vpd_entry.h"
-#include "ipmi/request_aux_log.h"
-#include "ipmi/request_sdr.h"
-#include "ipmi/request_sel.h"
-#include "ipmi/request_vpd.h"
-#include "mapping/ipmi_mapping.h"
-#include "mapping/machine_families.h"
-#include "records/sdr_entry.h"
-#include "records/sel_entry.h"
+#include "plugins/ipmisel/inventory/vpd_entry.h"
+#include "plugins/ipmisel/records/sdr_entry.h"
+#include "plugins/ipmisel/records/sel_entry.h"
+#include "plugins/ipmisel/requests/request_aux_log.h"
+#include "plugins/ipmisel/requests/request_sdr.h"
+#include "plugins/ipmisel/requests/request_sel.h"
+#include "plugins/ipmisel/requests/request_vpd.h"
+#include "plugins/ipmisel/texts/ipmi_mapping.h"
+#include "plugins/ipmisel/texts/machine_families.h"
 #include "tqr/plugin.h"
 #include "tqr/splibrary.h"
 

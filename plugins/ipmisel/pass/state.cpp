@@ -1,4 +1,4 @@
-#include "plugin/state.h"
+#include "plugins/ipmisel/pass/state.h"
 
 namespace ipmisel {
 

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "inventory/vpd_entry.h"
+#include "plugins/ipmisel/inventory/vpd_entry.h"
 #include "tqr/plugin.h"
 
 namespace ipmisel {

@@ -1,8 +1,8 @@
-#include "records/calendar_time.h"
+#include "plugins/ipmisel/records/calendar_time.h"
 
 #include <ctime>
 
-#include "base/log.h"
+#include "plugins/ipmisel/log.h"
 #include "tqr/status.h"
 
 namespace ipmisel {

@@ -1,12 +1,12 @@
-#include "records/extended_log.h"
+#include "plugins/ipmisel/records/extended_log.h"
 
 #include <algorithm>
 #include <span>
 #include <string_view>
 
 #include "base/bytes.h"
-#include "base/log.h"
 #include "base/text.h"
+#include "plugins/ipmisel/log.h"
 
 using namespace ipmisel;
 

@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "records/rows.h"
+#include "plugins/ipmisel/records/rows.h"
 
 /// One decoded auxiliary log entry: firmware status codes (UEFI Platform Initialization status
 /// codes) and the SEL record that they belong to.

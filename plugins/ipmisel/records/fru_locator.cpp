@@ -1,4 +1,4 @@
-#include "records/fru_locator.h"
+#include "plugins/ipmisel/records/fru_locator.h"
 
 #include <algorithm>
 #include <string_view>

@@ -2,9 +2,9 @@
 #include <cstdio>
 #include <memory>
 
-#include "base/log.h"
-#include "records/sdr_entry.h"
-#include "records/sdr_text.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/records/sdr_entry.h"
+#include "plugins/ipmisel/records/sdr_text.h"
 
 using namespace ipmisel;
 using NQORTQR20::TCPluginCallbacks;

@@ -1,4 +1,4 @@
-#include "records/sdr_entry.h"
+#include "plugins/ipmisel/records/sdr_entry.h"
 
 #include <algorithm>
 #include <cstring>
@@ -7,11 +7,11 @@
 #include <string_view>
 
 #include "base/bytes.h"
-#include "base/log.h"
 #include "base/text.h"
-#include "mapping/entity_names.h"
-#include "mapping/numbered_texts.h"
-#include "records/sdr_text.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/records/sdr_text.h"
+#include "plugins/ipmisel/texts/entity_names.h"
+#include "plugins/ipmisel/texts/numbered_texts.h"
 
 using namespace ipmisel;
 using NQORTQR20::TCPluginCallbacks;

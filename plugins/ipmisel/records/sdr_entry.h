@@ -6,8 +6,8 @@
 #include <memory>
 #include <vector>
 
-#include "mapping/ipmi_mapping.h"
-#include "records/rows.h"
+#include "plugins/ipmisel/records/rows.h"
+#include "plugins/ipmisel/texts/ipmi_mapping.h"
 #include "tqr/plugin.h"
 
 /// One sensor record of the Sensor Data Repository: identity, entity, units, conversion factors and

@@ -2,7 +2,7 @@
 
 #include <string>
 
-#include "records/sdr_entry.h"
+#include "plugins/ipmisel/records/sdr_entry.h"
 
 namespace ipmisel {
 

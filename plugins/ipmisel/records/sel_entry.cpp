@@ -1,4 +1,4 @@
-#include "records/sel_entry.h"
+#include "plugins/ipmisel/records/sel_entry.h"
 
 #include <algorithm>
 #include <cstring>
@@ -9,9 +9,9 @@
 #include <vector>
 
 #include "base/bytes.h"
-#include "base/log.h"
 #include "base/text.h"
-#include "records/sel_texts.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/records/sel_texts.h"
 
 using namespace ipmisel;
 using NQORTQR20::TCPluginCallbacks;

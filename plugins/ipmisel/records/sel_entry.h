@@ -4,8 +4,8 @@
 #include <cstdint>
 #include <cstdio>
 
-#include "mapping/ipmi_mapping.h"
-#include "records/rows.h"
+#include "plugins/ipmisel/records/rows.h"
+#include "plugins/ipmisel/texts/ipmi_mapping.h"
 #include "tqr/datetime.h"
 #include "tqr/plugin.h"
 

@@ -1,10 +1,10 @@
-#include "records/sel_texts.h"
+#include "plugins/ipmisel/records/sel_texts.h"
 
 #include <array>
 #include <string_view>
 
 #include "base/text.h"
-#include "mapping/numbered_texts.h"
+#include "plugins/ipmisel/texts/numbered_texts.h"
 
 namespace ipmisel {
 namespace {

@@ -1,10 +1,10 @@
 #include <string>
 
-#include "base/log.h"
 #include "base/text.h"
-#include "records/calendar_time.h"
-#include "records/sel_entry.h"
-#include "records/sel_texts.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/records/calendar_time.h"
+#include "plugins/ipmisel/records/sel_entry.h"
+#include "plugins/ipmisel/records/sel_texts.h"
 #include "tqr/datetime.h"
 #include "tqr/status.h"
 

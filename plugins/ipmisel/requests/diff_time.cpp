@@ -1,11 +1,11 @@
-#include "ipmi/diff_time.h"
+#include "plugins/ipmisel/requests/diff_time.h"
 
 #include <cstdint>
 #include <optional>
 #include <string>
 
-#include "ipmi/ipmi_message.h"
-#include "records/calendar_time.h"
+#include "plugins/ipmisel/records/calendar_time.h"
+#include "plugins/ipmisel/requests/ipmi_message.h"
 #include "tqr/status.h"
 
 using namespace ipmisel;

@@ -1,4 +1,4 @@
-#include "ipmi/ipmi_message.h"
+#include "plugins/ipmisel/requests/ipmi_message.h"
 
 #include <algorithm>
 

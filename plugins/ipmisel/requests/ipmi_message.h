@@ -8,8 +8,8 @@
 #include <string_view>
 
 #include "base/bytes.h"
-#include "base/log.h"
-#include "base/result.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/result.h"
 #include "tqr/splibrary.h"
 
 namespace ipmisel {

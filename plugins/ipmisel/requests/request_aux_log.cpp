@@ -1,4 +1,4 @@
-#include "ipmi/request_aux_log.h"
+#include "plugins/ipmisel/requests/request_aux_log.h"
 
 #include <array>
 #include <cstdint>

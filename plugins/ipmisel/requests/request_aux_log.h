@@ -1,7 +1,7 @@
 #pragma once
 
-#include "ipmi/ipmi_message.h"
-#include "records/rows.h"
+#include "plugins/ipmisel/records/rows.h"
+#include "plugins/ipmisel/requests/ipmi_message.h"
 #include "tqr/splibrary.h"
 
 /// Asks one BMC node for its auxiliary log (an OEM command of the Storage function).

@@ -3,8 +3,8 @@
 #include <cstdint>
 #include <vector>
 
-#include "ipmi/ipmi_message.h"
-#include "records/fru_locator.h"
+#include "plugins/ipmisel/records/fru_locator.h"
+#include "plugins/ipmisel/requests/ipmi_message.h"
 #include "tqr/plugin.h"
 #include "tqr/splibrary.h"
 

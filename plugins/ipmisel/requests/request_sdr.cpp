@@ -1,4 +1,4 @@
-#include "ipmi/request_sdr.h"
+#include "plugins/ipmisel/requests/request_sdr.h"
 
 #include <algorithm>
 #include <array>

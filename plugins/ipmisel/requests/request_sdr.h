@@ -4,9 +4,9 @@
 #include <span>
 #include <vector>
 
-#include "ipmi/debug_file.h"
-#include "ipmi/ipmi_message.h"
-#include "records/rows.h"
+#include "plugins/ipmisel/records/rows.h"
+#include "plugins/ipmisel/requests/debug_file.h"
+#include "plugins/ipmisel/requests/ipmi_message.h"
 #include "tqr/plugin.h"
 #include "tqr/splibrary.h"
 

@@ -1,4 +1,4 @@
-#include "ipmi/request_sel.h"
+#include "plugins/ipmisel/requests/request_sel.h"
 
 #include <algorithm>
 #include <array>

@@ -1,4 +1,4 @@
-#include "ipmi/request_vpd.h"
+#include "plugins/ipmisel/requests/request_vpd.h"
 
 #include <algorithm>
 #include <utility>

@@ -5,10 +5,10 @@
 #include <span>
 #include <string>
 
-#include "ipmi/ipmi_message.h"
-#include "ipmi/request_fru_locator.h"
-#include "mapping/machine_families.h"
-#include "records/fru_locator.h"
+#include "plugins/ipmisel/records/fru_locator.h"
+#include "plugins/ipmisel/requests/ipmi_message.h"
+#include "plugins/ipmisel/requests/request_fru_locator.h"
+#include "plugins/ipmisel/texts/machine_families.h"
 #include "tqr/plugin.h"
 #include "tqr/splibrary.h"
 

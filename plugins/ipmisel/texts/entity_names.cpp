@@ -1,4 +1,4 @@
-#include "mapping/entity_names.h"
+#include "plugins/ipmisel/texts/entity_names.h"
 
 #include <array>
 

@@ -1,4 +1,4 @@
-#include "mapping/event_offsets.h"
+#include "plugins/ipmisel/texts/event_offsets.h"
 
 #include <algorithm>
 #include <array>
@@ -7,12 +7,12 @@
 #include <span>
 #include <string_view>
 
-#include "base/log.h"
 #include "base/text.h"
-#include "mapping/machine_families.h"
-#include "mapping/numbered_texts.h"
-#include "mapping/oem_detail.h"
-#include "mapping/sensor_units.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/texts/machine_families.h"
+#include "plugins/ipmisel/texts/numbered_texts.h"
+#include "plugins/ipmisel/texts/oem_detail.h"
+#include "plugins/ipmisel/texts/sensor_units.h"
 #include "tqr/datetime.h"
 
 namespace ipmisel {

@@ -2,8 +2,8 @@
 
 #include <string>
 
-#include "mapping/event_data.h"
-#include "mapping/sensor_mod_units.h"
+#include "plugins/ipmisel/texts/event_data.h"
+#include "plugins/ipmisel/texts/sensor_mod_units.h"
 #include "tqr/plugin.h"
 
 // The "event data" texts of the three classes of events. Every text fetched from the numbered ones

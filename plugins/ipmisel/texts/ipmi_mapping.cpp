@@ -1,17 +1,17 @@
-#include "mapping/ipmi_mapping.h"
+#include "plugins/ipmisel/texts/ipmi_mapping.h"
 
 #include <cstdint>
 #include <optional>
 #include <span>
 #include <string>
 
-#include "base/log.h"
 #include "base/text.h"
-#include "mapping/event_offsets.h"
-#include "mapping/numbered_texts.h"
-#include "mapping/oem_records.h"
-#include "mapping/sensor_types.h"
-#include "mapping/sensor_units.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/texts/event_offsets.h"
+#include "plugins/ipmisel/texts/numbered_texts.h"
+#include "plugins/ipmisel/texts/oem_records.h"
+#include "plugins/ipmisel/texts/sensor_types.h"
+#include "plugins/ipmisel/texts/sensor_units.h"
 
 using NQORTQR20::TCPluginCallbacks;
 

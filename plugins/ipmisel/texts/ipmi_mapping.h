@@ -2,7 +2,7 @@
 
 #include <cstdint>
 
-#include "mapping/sensor_mod_units.h"
+#include "plugins/ipmisel/texts/sensor_mod_units.h"
 #include "tqr/plugin.h"
 
 /// Translator from IPMI codes to English text. Holds no state; one object serves every record.

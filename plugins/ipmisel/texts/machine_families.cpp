@@ -1,4 +1,4 @@
-#include "mapping/machine_families.h"
+#include "plugins/ipmisel/texts/machine_families.h"
 
 #include <algorithm>
 #include <array>

@@ -1,4 +1,4 @@
-#include "mapping/numbered_texts.h"
+#include "plugins/ipmisel/texts/numbered_texts.h"
 
 #include <fcntl.h>
 #include <unistd.h>
@@ -7,8 +7,8 @@
 #include <cerrno>
 #include <utility>
 
-#include "base/log.h"
 #include "base/text.h"
+#include "plugins/ipmisel/log.h"
 
 namespace ipmisel {
 namespace {

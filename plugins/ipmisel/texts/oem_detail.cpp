@@ -1,4 +1,4 @@
-#include "mapping/oem_detail.h"
+#include "plugins/ipmisel/texts/oem_detail.h"
 
 #include <optional>
 

@@ -3,8 +3,8 @@
 #include <span>
 #include <string>
 
-#include "mapping/event_data.h"
-#include "mapping/machine_families.h"
+#include "plugins/ipmisel/texts/event_data.h"
+#include "plugins/ipmisel/texts/machine_families.h"
 
 namespace ipmisel {
 

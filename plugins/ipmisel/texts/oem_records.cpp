@@ -1,4 +1,4 @@
-#include "mapping/oem_records.h"
+#include "plugins/ipmisel/texts/oem_records.h"
 
 #include <string_view>
 

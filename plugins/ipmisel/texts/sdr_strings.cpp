@@ -1,4 +1,4 @@
-#include "mapping/sdr_strings.h"
+#include "plugins/ipmisel/texts/sdr_strings.h"
 
 #include <algorithm>
 #include <array>

@@ -1,4 +1,4 @@
-#include "mapping/sensor_types.h"
+#include "plugins/ipmisel/texts/sensor_types.h"
 
 #include <array>
 

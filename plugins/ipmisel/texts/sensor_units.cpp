@@ -1,11 +1,11 @@
-#include "mapping/sensor_units.h"
+#include "plugins/ipmisel/texts/sensor_units.h"
 
 #include <cmath>
 #include <cstdint>
 
-#include "base/log.h"
 #include "base/text.h"
-#include "mapping/numbered_texts.h"
+#include "plugins/ipmisel/log.h"
+#include "plugins/ipmisel/texts/numbered_texts.h"
 
 namespace ipmisel {
 namespace {

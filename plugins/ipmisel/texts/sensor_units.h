@@ -2,7 +2,7 @@
 
 #include <string>
 
-#include "mapping/sensor_mod_units.h"
+#include "plugins/ipmisel/texts/sensor_mod_units.h"
 #include "tqr/plugin.h"
 
 namespace ipmisel {

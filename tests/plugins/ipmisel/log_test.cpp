@@ -1,4 +1,4 @@
-#include "base/log.h"
+#include "plugins/ipmisel/log.h"
 
 #include "tests/support/bmc_fixture.h"
 

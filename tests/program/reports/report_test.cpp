@@ -1,7 +1,7 @@
 #include <gmock/gmock.h>
 
-#include "collector/failure.h"
-#include "collector/report.h"
+#include "program/commands/failure.h"
+#include "program/reports/report.h"
 
 namespace {
 

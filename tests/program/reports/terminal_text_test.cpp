@@ -2,8 +2,8 @@
 
 #include <nlohmann/json.hpp>
 
-#include "collector/json_text.h"
-#include "collector/terminal_text.h"
+#include "program/reports/json_text.h"
+#include "program/reports/terminal_text.h"
 
 namespace {
 

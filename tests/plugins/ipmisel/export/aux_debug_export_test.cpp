@@ -1,6 +1,6 @@
-#include "export/aux_debug_export.h"
+#include "plugins/ipmisel/export/aux_debug_export.h"
 
-#include "tests/export/export_fixture.h"
+#include "tests/plugins/ipmisel/export/export_fixture.h"
 
 namespace ipmiseltest {
 namespace {

@@ -4,8 +4,8 @@
 #include <vector>
 
 #include "host/core/host.h"
-#include "records/sel_entry.h"
-#include "tests/records/text_field.h"
+#include "plugins/ipmisel/records/sel_entry.h"
+#include "tests/plugins/ipmisel/records/text_field.h"
 #include "tests/support/bmc_fixture.h"
 #include "tests/support/wire.h"
 

@@ -1,4 +1,4 @@
-#include "export/fru_export.h"
+#include "plugins/ipmisel/export/fru_export.h"
 
 #include "tests/support/bmc_fixture.h"
 #include "tests/support/fru_inventory.h"

@@ -1,6 +1,6 @@
 #include <dlfcn.h>
 
-#include "tests/export/export_fixture.h"
+#include "tests/plugins/ipmisel/export/export_fixture.h"
 #include "tqr/plugin.h"
 
 bool ipmiseltest::gNoArrays = false;

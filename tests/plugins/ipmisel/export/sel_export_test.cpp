@@ -1,12 +1,12 @@
-#include "export/sel_export.h"
+#include "plugins/ipmisel/export/sel_export.h"
 
 #include <memory>
 #include <string>
 #include <vector>
 
-#include "base/log.h"
-#include "export/event_message.h"
-#include "tests/export/export_fixture.h"
+#include "plugins/ipmisel/export/event_message.h"
+#include "plugins/ipmisel/log.h"
+#include "tests/plugins/ipmisel/export/export_fixture.h"
 
 namespace ipmiseltest {
 namespace {

@@ -1,4 +1,4 @@
-#include "inventory/spd.h"
+#include "plugins/ipmisel/inventory/spd.h"
 
 #include <gtest/gtest.h>
 

@@ -1,4 +1,4 @@
-#include "inventory/vpd_entry.h"
+#include "plugins/ipmisel/inventory/vpd_entry.h"
 
 #include <gtest/gtest.h>
 

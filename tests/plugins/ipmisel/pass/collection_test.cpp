@@ -1,13 +1,13 @@
-#include "plugin/collection.h"
+#include "plugins/ipmisel/pass/collection.h"
 
 #include <cstdlib>
 #include <new>
 
-#include "ipmi/request_aux_log.h"
-#include "ipmi/request_sdr.h"
-#include "ipmi/request_sel.h"
-#include "ipmi/request_vpd.h"
-#include "records/sdr_entry.h"
+#include "plugins/ipmisel/records/sdr_entry.h"
+#include "plugins/ipmisel/requests/request_aux_log.h"
+#include "plugins/ipmisel/requests/request_sdr.h"
+#include "plugins/ipmisel/requests/request_sel.h"
+#include "plugins/ipmisel/requests/request_vpd.h"
 #include "tests/support/machine_fixture.h"
 
 namespace {

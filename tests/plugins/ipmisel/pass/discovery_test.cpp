@@ -1,4 +1,4 @@
-#include "plugin/discovery.h"
+#include "plugins/ipmisel/pass/discovery.h"
 
 #include <dlfcn.h>
 

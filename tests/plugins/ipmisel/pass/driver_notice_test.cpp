@@ -1,4 +1,4 @@
-#include "plugin/driver_notice.h"
+#include "plugins/ipmisel/pass/driver_notice.h"
 
 #include <cstdlib>
 

@@ -1,10 +1,10 @@
-#include "plugin/entry_points.h"
+#include "plugins/ipmisel/pass/entry_points.h"
 
 #include <array>
 #include <cstdio>
 #include <memory>
 
-#include "plugin/state.h"
+#include "plugins/ipmisel/pass/state.h"
 #include "tests/support/bmc_fixture.h"
 
 namespace ipmiseltest {

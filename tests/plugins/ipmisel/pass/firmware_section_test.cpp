@@ -1,4 +1,4 @@
-#include "plugin/sections.h"
+#include "plugins/ipmisel/pass/sections.h"
 #include "tests/support/machine_fixture.h"
 
 namespace ipmiseltest {

@@ -1,4 +1,4 @@
-#include "ipmi/request_fru_locator.h"
+#include "plugins/ipmisel/requests/request_fru_locator.h"
 #include "tests/support/fru_inventory.h"
 #include "tests/support/machine_fixture.h"
 

@@ -1,8 +1,8 @@
-#include "records/extended_log.h"
+#include "plugins/ipmisel/records/extended_log.h"
 
 #include <gmock/gmock.h>
 
-#include "tests/records/text_field.h"
+#include "tests/plugins/ipmisel/records/text_field.h"
 #include "tests/support/bmc_fixture.h"
 
 namespace {

@@ -1,4 +1,4 @@
-#include "records/fru_locator.h"
+#include "plugins/ipmisel/records/fru_locator.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

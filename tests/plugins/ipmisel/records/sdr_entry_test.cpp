@@ -1,12 +1,12 @@
-#include "records/sdr_entry.h"
+#include "plugins/ipmisel/records/sdr_entry.h"
 
 #include <gmock/gmock.h>
 
 #include <cctype>
 #include <memory>
 
-#include "tests/mapping/mapping_fixture.h"
-#include "tests/records/text_field.h"
+#include "tests/plugins/ipmisel/records/text_field.h"
+#include "tests/plugins/ipmisel/texts/mapping_fixture.h"
 
 namespace {
 

@@ -1,4 +1,4 @@
-#include "records/sel_entry.h"
+#include "plugins/ipmisel/records/sel_entry.h"
 
 #include <gmock/gmock.h>
 
@@ -7,9 +7,9 @@
 #include <limits>
 #include <memory>
 
-#include "records/sel_texts.h"
-#include "tests/mapping/mapping_fixture.h"
-#include "tests/records/text_field.h"
+#include "plugins/ipmisel/records/sel_texts.h"
+#include "tests/plugins/ipmisel/records/text_field.h"
+#include "tests/plugins/ipmisel/texts/mapping_fixture.h"
 
 namespace {
 

@@ -5,7 +5,7 @@
 #include <string_view>
 
 #include "base/bytes.h"
-#include "records/rows.h"
+#include "plugins/ipmisel/records/rows.h"
 #include "tests/support/wire.h"
 
 namespace ipmiseltest {

@@ -8,10 +8,10 @@
 #include <limits>
 
 #include "host/spdriver/transport.h"
-#include "ipmi/request_aux_log.h"
-#include "ipmi/request_fru_locator.h"
-#include "ipmi/request_sdr.h"
-#include "ipmi/request_sel.h"
+#include "plugins/ipmisel/requests/request_aux_log.h"
+#include "plugins/ipmisel/requests/request_fru_locator.h"
+#include "plugins/ipmisel/requests/request_sdr.h"
+#include "plugins/ipmisel/requests/request_sel.h"
 
 namespace {
 

@@ -1,12 +1,12 @@
-#include "ipmi/ipmi_message.h"
+#include "plugins/ipmisel/requests/ipmi_message.h"
 
 #include <filesystem>
 #include <functional>
 
-#include "ipmi/diff_time.h"
-#include "ipmi/request_aux_log.h"
-#include "ipmi/request_sdr.h"
-#include "ipmi/request_sel.h"
+#include "plugins/ipmisel/requests/diff_time.h"
+#include "plugins/ipmisel/requests/request_aux_log.h"
+#include "plugins/ipmisel/requests/request_sdr.h"
+#include "plugins/ipmisel/requests/request_sel.h"
 #include "tests/support/bmc_fixture.h"
 
 namespace {

@@ -1,4 +1,4 @@
-#include "ipmi/request_fru_locator.h"
+#include "plugins/ipmisel/requests/request_fru_locator.h"
 
 #include <algorithm>
 #include <numeric>

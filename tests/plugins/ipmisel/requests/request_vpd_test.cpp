@@ -1,4 +1,4 @@
-#include "ipmi/request_vpd.h"
+#include "plugins/ipmisel/requests/request_vpd.h"
 
 #include "tests/support/bmc_fixture.h"
 

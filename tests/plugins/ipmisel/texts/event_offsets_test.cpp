@@ -1,6 +1,6 @@
-#include "mapping/event_offsets.h"
+#include "plugins/ipmisel/texts/event_offsets.h"
 
-#include "tests/mapping/mapping_fixture.h"
+#include "tests/plugins/ipmisel/texts/mapping_fixture.h"
 
 namespace {
 

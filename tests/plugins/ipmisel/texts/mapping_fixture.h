@@ -7,7 +7,7 @@
 
 #include "base/text.h"
 #include "host/core/host.h"
-#include "mapping/ipmi_mapping.h"
+#include "plugins/ipmisel/texts/ipmi_mapping.h"
 #include "tests/support/bmc_fixture.h"
 #include "tests/support/temporary_folder.h"
 

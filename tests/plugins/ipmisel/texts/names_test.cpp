@@ -1,9 +1,9 @@
 #include <string>
 #include <vector>
 
-#include "mapping/entity_names.h"
-#include "mapping/sdr_strings.h"
-#include "tests/mapping/mapping_fixture.h"
+#include "plugins/ipmisel/texts/entity_names.h"
+#include "plugins/ipmisel/texts/sdr_strings.h"
+#include "tests/plugins/ipmisel/texts/mapping_fixture.h"
 
 namespace {
 

@@ -1,8 +1,8 @@
-#include "mapping/numbered_texts.h"
+#include "plugins/ipmisel/texts/numbered_texts.h"
 
 #include <algorithm>
 
-#include "tests/mapping/mapping_fixture.h"
+#include "tests/plugins/ipmisel/texts/mapping_fixture.h"
 
 namespace {
 

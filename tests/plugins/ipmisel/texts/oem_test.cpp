@@ -2,9 +2,9 @@
 #include <array>
 #include <set>
 
-#include "mapping/machine_families.h"
-#include "mapping/oem_detail.h"
-#include "tests/mapping/mapping_fixture.h"
+#include "plugins/ipmisel/texts/machine_families.h"
+#include "plugins/ipmisel/texts/oem_detail.h"
+#include "tests/plugins/ipmisel/texts/mapping_fixture.h"
 
 namespace {
 

@@ -1,6 +1,6 @@
-#include "mapping/sensor_units.h"
+#include "plugins/ipmisel/texts/sensor_units.h"
 
-#include "tests/mapping/mapping_fixture.h"
+#include "tests/plugins/ipmisel/texts/mapping_fixture.h"
 
 namespace {
 
