@@ -5,19 +5,18 @@
 #include <span>
 #include <string>
 
-// Serial presence detect data of a memory module, as JEDEC lays it down for each kind of memory:
-// byte 0 the bytes that are used and the size of the device, byte 2 the memory type; further on
-// the module's maker (JEP106), serial number and part number, and a checksum.
+#include "ipmi/spd.h"
+
+// What is shown of the serial presence detect data of a memory module.
 
 namespace ipmisel {
 
 /// What is shown in place of a text that cannot be.
 inline constexpr const char* kNotAvailable = "Not Available";
 
-enum class SpdKind { kDdr2, kDdr3, kDdr4 };
+using ipmi::SpdKind;
 
-/// The kind of memory whose image the bytes begin with, told by type and sizes alone: an image
-/// that is damaged is no data of another kind. Empty for everything else.
+/// The kind of memory of an image that is read whole, 256 bytes of it; empty for everything else.
 std::optional<SpdKind> RecogniseSpd(std::span<const std::uint8_t> bytes);
 
 struct MemoryModule {

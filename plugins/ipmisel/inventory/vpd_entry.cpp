@@ -1,15 +1,12 @@
 #include "plugins/ipmisel/inventory/vpd_entry.h"
 
-#include "plugins/ipmisel/inventory/jedec_types.h"
+#include "ipmi/jep106.h"
 #include "plugins/ipmisel/log.h"
 
 using NQORTQR20::fdriIOHandle;
 using NQORTQR20::kStatusFailed;
 
 namespace {
-
-constexpr unsigned char kContinuationCode = 0x7F;
-constexpr unsigned char kWithoutParity = 0x7F;
 
 bool Write(fdriIOHandle* output, const char* className, const ipmisel::PropertyMap& instance) {
     if (NQORTQR20::fdrGetInstance(output, className).code == kStatusFailed) return false;
@@ -44,19 +41,8 @@ unsigned IPMIVPDEntry::GenerateCIMInstance(fdriIOHandle* output, const char* cla
 
 std::string IPMIVPDEntry::getMDManufacturer(const unsigned char* code, bool twoBytes) {
     if (code == nullptr) return {};
-    unsigned bank = 0;
-    if (twoBytes) {
-        bank = code[0] & kWithoutParity;
-        ++code;
-    } else {
-        while (bank < kJedecBanks && code[bank] == kContinuationCode) ++bank;
-        if (bank < kJedecBanks) code += bank;
-    }
-    if (bank >= kJedecBanks) return {};
-    const unsigned number = *code & kWithoutParity;
-    if (number == 0 || number > kJedecCodes) return {};
-    const char* name = JEDEC_Types[bank * kJedecCodes + number - 1];
-    return name == nullptr ? std::string() : std::string(name);
+    return std::string(twoBytes ? ipmi::ManufacturerOfBank(code[0], code[1])
+                                : ipmi::ManufacturerAfterContinuations({code, ipmi::kJep106Banks}));
 }
 
 bool IPMIVPDEntry::IsASCIIStr(const unsigned char* text) {

@@ -1,7 +1,9 @@
-// Made by make_jedec_types.py from jep106.csv; edit those.
-#include "plugins/ipmisel/inventory/jedec_types.h"
+// Made by make_jep106_names.py from jep106.csv; edit those.
+#include "ipmi/jep106.h"
 
-const char* const JEDEC_Types[kJedecBanks * kJedecCodes] = {
+namespace ipmi {
+
+const char* const kJep106Names[kJep106Banks * kJep106Codes] = {
     // bank 1
     "AMD",
     "AMI",
@@ -892,3 +894,5 @@ const char* const JEDEC_Types[kJedecBanks * kJedecCodes] = {
     "Provigent",
     nullptr,
 };
+
+}  // namespace ipmi

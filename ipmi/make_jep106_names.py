@@ -1,7 +1,7 @@
 #!/usr/bin/env python3
-"""Writes jedec_types.cpp from jep106.csv, the names of JEDEC standard JEP106, banks 1 to 7.
+"""Writes jep106_names.cpp from jep106.csv, the names of JEDEC standard JEP106, banks 1 to 7.
 
-usage: plugins/ipmisel/inventory/make_jedec_types.py  (from anywhere; both files stand beside this script)
+usage: ipmi/make_jep106_names.py  (from anywhere; both files stand beside this script)
 """
 import csv
 import pathlib
@@ -18,15 +18,17 @@ if set(names) != wanted:
     raise SystemExit(f"jep106.csv: expected every code 1 to {CODES} of {BANKS} banks, once each")
 
 lines = [
-    "// Made by make_jedec_types.py from jep106.csv; edit those.",
-    '#include "plugins/ipmisel/inventory/jedec_types.h"',
+    "// Made by make_jep106_names.py from jep106.csv; edit those.",
+    '#include "ipmi/jep106.h"',
     "",
-    "const char* const JEDEC_Types[kJedecBanks * kJedecCodes] = {",
+    "namespace ipmi {",
+    "",
+    "const char* const kJep106Names[kJep106Banks * kJep106Codes] = {",
 ]
 for bank in range(BANKS):
     lines.append(f"    // bank {bank + 1}")
     for code in range(1, CODES + 1):
         name = names[bank, code].replace("\\", "\\\\").replace('"', '\\"')
         lines.append(f'    "{name}",' if name else "    nullptr,")
-lines.append("};")
-(HERE / "jedec_types.cpp").write_text("\n".join(lines) + "\n", encoding="utf-8")
+lines += ["};", "", "}  // namespace ipmi"]
+(HERE / "jep106_names.cpp").write_text("\n".join(lines) + "\n", encoding="utf-8")
