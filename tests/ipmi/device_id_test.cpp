@@ -1,0 +1,58 @@
+#include "ipmi/device_id.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <vector>
+
+namespace ipmi {
+
+using testing::ElementsAre;
+
+// Device 20h, revision 1 with SDRs, firmware 2.15, IPMI 2.0, manufacturer 32473, product 0101h.
+const std::vector<std::uint8_t> kAnswer{0x20, 0x81, 0x02, 0x15, 0x02, 0xBF, 0xD9, 0x7E,
+                                        0x00, 0x01, 0x02, 0x0A, 0x00, 0xFF, 0x03};
+
+TEST(DeviceId, NamesEveryFieldOfTheAnswer) {
+    const auto id = ParseDeviceId(kAnswer);
+    ASSERT_TRUE(id);
+    EXPECT_EQ(id->deviceId, 0x20);
+    EXPECT_EQ(id->deviceRevision, 1);
+    EXPECT_TRUE(id->providesSdrs);
+    EXPECT_FALSE(id->updateInProgress);
+    EXPECT_EQ(FirmwareVersionText(*id), "2.15");
+    EXPECT_EQ(IpmiVersionText(*id), "2.0");
+    EXPECT_EQ(id->manufacturerId, 32473u);
+    EXPECT_EQ(id->productId, 0x0201);
+    EXPECT_EQ(AuxiliaryRevisionText(*id), "0a00ff03");
+    EXPECT_THAT(CapabilityNames(*id),
+                ElementsAre("chassis device", "IPMB event generator", "IPMB event receiver",
+                            "FRU inventory device", "SEL device", "SDR repository device",
+                            "sensor device"));
+}
+
+TEST(DeviceId, KeepsFlagsAndReservedBitsOutOfTheNumbers) {
+    auto answer = kAnswer;
+    answer[2] = 0x8A;  // update in progress, major 10
+    answer[3] = 0x05;
+    answer[4] = 0x51;
+    answer[8] = 0xF1;
+    const auto id = ParseDeviceId(answer);
+    ASSERT_TRUE(id);
+    EXPECT_TRUE(id->updateInProgress);
+    EXPECT_EQ(FirmwareVersionText(*id), "10.05");
+    EXPECT_EQ(IpmiVersionText(*id), "1.5");
+    EXPECT_EQ(id->manufacturerId, 0x17ED9u);
+}
+
+TEST(DeviceId, IsWholeWithoutTheAuxiliaryRevisionAndNothingWhenCutBefore) {
+    for (std::size_t length = 0; length <= kAnswer.size(); ++length) {
+        const auto id = ParseDeviceId(std::span(kAnswer).first(length));
+        EXPECT_EQ(id.has_value(), length >= 11) << length;
+        if (id) {
+            EXPECT_EQ(AuxiliaryRevisionText(*id).empty(), length < 15) << length;
+        }
+    }
+}
+
+}  // namespace ipmi
