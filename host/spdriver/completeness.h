@@ -1,64 +1,34 @@
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
-#include <memory>
 #include <optional>
 #include <string>
 #include <vector>
 
-#include "host/spdriver/loop_guard.h"
-#include "host/spdriver/transport.h"
-
 namespace tqrhost {
 
-/// Watches one node's exchanges and keeps account of what could be read: the event log, the sensor
-/// repository and the FRU devices. Also the place where a collection is stopped: after a deadline
-/// or an interruption no command goes through.
-class ReadingWatch : public Transport {
-public:
-    explicit ReadingWatch(std::unique_ptr<LoopGuard> guard);
-    std::optional<Response> Exchange(const RequestFrame& request) override;
-    const NodeCompleteness& Account();
-
-private:
-    void Note(const RequestFrame& request, std::optional<Response>* answer);
-    /// One reading from the first record to the last.
-    struct Walk {
-        bool fromFirst = false;
-        bool ended = false;  ///< no next record was named
-        unsigned count = 0;
-    };
-    /// An account, and which records it has counted: a record that is read again counts once.
-    struct Source {
-        const char* infoCommand;
-        const char* readCommand;
-        bool isLog;
-        SourceAccount* account;
-        std::vector<bool> counted;
-        Walk walk;
-        /// The record whose beginning came last, and its length; 0 when that did not come.
-        std::uint16_t record = 0;
-        std::size_t recordLength = 0;
-    };
-
-    void NoteInfo(Source* source, bool askedAgain, const std::optional<Response>& response);
-    /// Judges a walk that is over: a second one that was whole does not make up for it.
-    void FinishWalk(Source* source);
-    void NoteRecord(Source* source, const RequestFrame& request, std::optional<Response>* answer);
-    void NoteFru(const RequestFrame& request, const std::optional<Response>& response);
-    /// Bytes that an answer must have, by what was asked and what is known of the record.
-    static std::size_t WholeAnswer(const Source& source, std::uint16_t record, std::uint8_t offset,
-                                   std::uint8_t count);
-    void AddFault(ReadFault fault);
-    /// What went wrong with an answer that has to have so many bytes; empty when nothing did.
-    std::string ProblemOf(const std::optional<Response>& response, std::size_t least) const;
-
-    std::unique_ptr<LoopGuard> guard_;
-    NodeCompleteness account_;
-    Source log_;
-    Source sensors_;
-    std::uint8_t lastCommand_ = 0;  ///< Storage command
+/// One read that brought nothing, or too little.
+struct ReadFault {
+    std::string what;     ///< the command, as the IPMI standard calls it
+    std::string record;   ///< record or FRU device ID, four hexadecimal digits; empty without one
+    std::string problem;  ///< "no response", "completion code cb", "short answer", ...
+    bool ofLogOrSensors;  ///< else of a FRU device
+    bool operator==(const ReadFault&) const = default;
 };
+/// What a node announced of a source, and what was read of it.
+struct SourceAccount {
+    std::optional<unsigned> announced;  ///< empty when it was not asked, or did not say
+    unsigned read = 0;
+};
+/// How whole the reading of a node is, as the host saw it go by.
+struct NodeCompleteness {
+    std::string source;  ///< as the user wrote it
+    SourceAccount log;
+    SourceAccount sensors;
+    std::vector<ReadFault> faults;
+    /// Event log and sensor repository were read as far as they were announced, without a fault.
+    bool Whole() const;
+};
+/// One for each node of the open machine.
+std::vector<NodeCompleteness> GetCompleteness();
 
 }  // namespace tqrhost

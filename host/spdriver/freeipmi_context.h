@@ -6,7 +6,7 @@
 #include <optional>
 #include <string>
 
-#include "host/spdriver/transport.h"
+#include "host/spdriver/source.h"
 
 namespace tqrhost {
 

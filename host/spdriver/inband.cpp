@@ -11,6 +11,7 @@
 #include "host/smbios/smbios_tables.h"
 #include "host/spdriver/freeipmi_context.h"
 #include "host/spdriver/kinds.h"
+#include "host/spdriver/stop_gate.h"
 
 namespace tqrhost {
 namespace {
@@ -37,7 +38,7 @@ std::unique_ptr<Transport> OpenDevice(const std::filesystem::path& device) {
                              IPMI_WORKAROUND_FLAGS_DEFAULT, IPMI_FLAGS_DEFAULT) < 0) {
         throw SourceError(ErrorAdvice(device.string(), ipmi_ctx_errnum(context.get())));
     }
-    return std::make_unique<FreeIpmiTransport>(std::move(context));
+    return std::make_unique<StopGate>(std::make_unique<FreeIpmiTransport>(std::move(context)));
 }
 
 }  // namespace
@@ -52,10 +53,10 @@ Source OpenInbandDevice(const std::vector<std::filesystem::path>& devices,
         return std::filesystem::exists(path, error);
     });
     if (device != devices.end()) {
-        source.nodes.push_back(OpenDevice(*device));
+        source.nodes.push_back({"inband", OpenDevice(*device), nullptr});
     } else if (HasIpmiDevice(source.facts.smbios)) {
         source.facts.ipmiDriver = false;
-        source.nodes.push_back(std::make_unique<SilentTransport>());
+        source.nodes.push_back({"inband", std::make_unique<SilentTransport>(), nullptr});
     } else {
         throw SourceError(
             "no BMC: this machine has neither an IPMI device (/dev/ipmi0) nor an IPMI record in "

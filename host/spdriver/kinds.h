@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "host/spdriver/transport.h"
+#include "host/spdriver/source.h"
 
 // The kinds of source, one file each. `places` is what follows the name of the kind: one, or for a
 // kind that joins several. All throw SourceError.

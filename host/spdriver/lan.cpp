@@ -14,6 +14,7 @@
 #include "host/spdriver/freeipmi_context.h"
 #include "host/spdriver/kinds.h"
 #include "host/spdriver/lan_session.h"
+#include "host/spdriver/stop_gate.h"
 
 namespace tqrhost {
 namespace {
@@ -208,7 +209,7 @@ std::unique_ptr<Transport> OpenWithFreeIpmi(const Session& session) {
         if (!SuiteIsMissing(error)) break;
     }
     if (error != IPMI_ERR_SUCCESS) throw SourceError(ErrorAdvice("lan:" + session.place, error));
-    return std::make_unique<FreeIpmiTransport>(std::move(context));
+    return std::make_unique<StopGate>(std::make_unique<FreeIpmiTransport>(std::move(context)));
 }
 
 /// Our own session, which keeps several requests outstanding.
@@ -259,12 +260,14 @@ Source OpenLan(const std::vector<std::string>& places, const SourceOptions& opti
     for (const std::string& place : places) {
         const Session session = MakeSession(place, options);
         if (NeedsFreeIpmi(session)) {
-            source.nodes.push_back(OpenWithFreeIpmi(session));
+            source.nodes.push_back({"lan:" + place, OpenWithFreeIpmi(session), nullptr});
             continue;
         }
         std::unique_ptr<LanSession> own = BeginOwn(session);
         opening.push_back(own.get());
-        source.nodes.push_back(std::make_unique<LanTransport>(std::move(own)));
+        source.nodes.push_back(
+            {"lan:" + place,
+             std::make_unique<StopGate>(std::make_unique<LanTransport>(std::move(own))), nullptr});
     }
     LanSession::OpenAll(opening);
     return source;

@@ -4,14 +4,10 @@
 
 #include "base/bytes.h"
 #include "base/text.h"
-#include "host/spdriver/commands.h"
 #include "tqr/log.h"
 
 namespace tqrhost {
 namespace {
-
-constexpr std::uint16_t kFirstRecord = 0x0000;
-constexpr std::uint16_t kNoNextRecord = 0xFFFF;
 
 /// What of a Get SEL Entry or Get SDR answer concerns a walk: completion code, next record ID, then
 /// the record, which begins with its own ID.
@@ -51,18 +47,18 @@ LoopGuard::LoopGuard(std::unique_ptr<Transport> transport) : transport_(std::mov
 
 std::optional<Response> LoopGuard::Exchange(const RequestFrame& request) {
     endedCircle_ = false;
-    if (request.netFn() == kNetFnStorage) {
+    if (request.netFn() == ipmi::kNetFnStorage) {
         switch (request.command()) {
-            case kGetSelInfo:
+            case ipmi::kGetSelInfo.number:
                 eventLog_.Restart();
                 break;
-            case kGetSdrRepositoryInfo:
-            case kReserveSdrRepository:
+            case ipmi::kGetSdrRepositoryInfo.number:
+            case ipmi::kReserveSdrRepository.number:
                 sensorRepository_.Restart();
                 break;
-            case kGetSelEntry:
+            case ipmi::kGetSelEntry.number:
                 return Read(&eventLog_, true, request);
-            case kGetSdr:
+            case ipmi::kGetSdr.number:
                 return Read(&sensorRepository_, false, request);
             default:
                 break;
@@ -79,7 +75,7 @@ std::optional<Response> LoopGuard::Read(Walk* walk, bool isEventLog, const Reque
     const std::uint8_t offset = in.U8();
     if (!in.ok()) return transport_->Exchange(request);
 
-    if (walk->ended && record == kFirstRecord && offset == 0) walk->Restart();
+    if (walk->ended && record == ipmi::kFirstRecordId && offset == 0) walk->Restart();
     if (walk->WasGiven(record, offset)) {
         NQORTQR20::fdrWriteLog(
             NQORTQR20::ILogger::kNotice,
@@ -103,12 +99,12 @@ std::optional<Response> LoopGuard::Read(Walk* walk, bool isEventLog, const Reque
     }
     walk->Given(record, offset);
     // The first record is asked for by 0x0000 and comes back in a circle under its own ID.
-    if (record == kFirstRecord && answer.own) walk->Given(*answer.own, offset);
+    if (record == ipmi::kFirstRecordId && answer.own) walk->Given(*answer.own, offset);
     // Every walk over the event log ends at a next record ID of 0xFFxx; over the repository only
     // 0xFFFF ends them all, and the rest of the last record may still be read after it. Walks go by
     // what the beginning of a record says, even if the rest says something else.
     if (offset == 0) {
-        walk->ended = isEventLog ? answer.next >> 8 == 0xFF : answer.next == kNoNextRecord;
+        walk->ended = isEventLog ? answer.next >> 8 == 0xFF : answer.next == ipmi::kLastRecordId;
     }
     return response;
 }

@@ -11,7 +11,7 @@
 #include <string>
 #include <utility>
 
-#include "host/spdriver/transport.h"
+#include "host/spdriver/capture.h"
 #include "tqr/datetime.h"
 
 namespace tqrhost {
@@ -111,8 +111,12 @@ std::shared_ptr<CaptureWriter> RecordTo(const std::string& file, Source& source)
     }
     auto capture = std::make_shared<CaptureFile>(file, source);
     for (std::size_t node = 0; node < source.nodes.size(); ++node) {
-        source.nodes[node] =
-            std::make_unique<RecordingTransport>(std::move(source.nodes[node]), node, capture);
+        SourceNode& recorded = source.nodes[node];
+        if (recorded.pipeline) {
+            recorded.transport = std::make_unique<PipelineTransport>(std::move(recorded.pipeline));
+        }
+        recorded.transport =
+            std::make_unique<RecordingTransport>(std::move(recorded.transport), node, capture);
     }
     return capture;
 }

@@ -11,7 +11,7 @@
 #include <vector>
 
 #include "host/spdriver/kinds.h"
-#include "host/spdriver/transport.h"
+#include "host/spdriver/stop_gate.h"
 #include "simulator/strict_json.h"
 
 // A capture: one JSON object a line. The first holds the facts of the machine, every other one
@@ -137,7 +137,10 @@ Source OpenReplay(const std::vector<std::string>& places, const SourceOptions& /
     if (number == 0) {
         throw SourceError(place + ": is empty, not a capture; name another with --from");
     }
-    std::move(nodes.begin(), nodes.end(), std::back_inserter(source.nodes));
+    for (auto& node : nodes) {
+        source.nodes.push_back(
+            {"replay:" + place, std::make_unique<StopGate>(std::move(node)), nullptr});
+    }
     return source;
 }
 

@@ -8,7 +8,7 @@
 #include <string>
 #include <vector>
 
-#include "host/spdriver/transport.h"
+#include "host/spdriver/source.h"
 
 // The packets of an RMCP+ session (IPMI 2.0, chapter 13), built and taken apart with libfreeipmi,
 // which also does the cryptography. No sockets and no time here: bytes in, bytes out.

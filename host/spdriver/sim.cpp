@@ -4,7 +4,7 @@
 #include <utility>
 
 #include "host/spdriver/kinds.h"
-#include "host/spdriver/transport.h"
+#include "host/spdriver/stop_gate.h"
 #include "simulator/server_file.h"
 #include "simulator/simulated_bmc.h"
 
@@ -38,7 +38,9 @@ Source OpenSimulated(const std::vector<std::string>& places, const SourceOptions
         std::move(server.machineType), server.integratedBmc,    server.ipmiDriver, server.ipmiLan,
         std::move(server.localTime),   std::move(server.smbios)};
     for (auto& bmc : server.bmcs) {
-        source.nodes.push_back(std::make_unique<SimTransport>(std::move(bmc)));
+        source.nodes.push_back(
+            {"sim:" + place,
+             std::make_unique<StopGate>(std::make_unique<SimTransport>(std::move(bmc))), nullptr});
     }
     return source;
 }

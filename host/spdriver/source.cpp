@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "host/spdriver/kinds.h"
-#include "host/spdriver/transport.h"
+#include "host/spdriver/source.h"
 
 namespace tqrhost {
 namespace {

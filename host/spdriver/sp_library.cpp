@@ -10,14 +10,16 @@
 #include <vector>
 
 #include "host/core/host.h"
-#include "host/spdriver/completeness.h"
+#include "host/spdriver/completeness_tracker.h"
 #include "host/spdriver/loop_guard.h"
-#include "host/spdriver/transport.h"
+#include "host/spdriver/record_trimmer.h"
+#include "host/spdriver/source.h"
 
 namespace NQORTQR20 {
 
 struct SPLibrary::Impl {
-    std::unique_ptr<tqrhost::ReadingWatch> transport;  ///< null when there is no way to the BMC
+    std::unique_ptr<tqrhost::CompletenessTracker>
+        transport;  ///< null when there is no way to the BMC
     bool integratedBmc;
 };
 
@@ -26,52 +28,46 @@ struct SPLibrary::Impl {
 namespace tqrhost {
 namespace {
 
-// The request frame: 0x01, responder address, NetFn, LUN, command, count of data bytes in four
-// bytes, data. The reply frame: completion code in byte 4, response from byte 8.
-constexpr std::size_t kCountAt = 5;
-constexpr std::size_t kDataAt = 9;
-constexpr std::size_t kPaddedFrame = 15;
+// The reply frame: completion code in byte 4, response from byte 8.
 constexpr std::size_t kCompletionCodeAt = 4;
 constexpr std::size_t kResponseAt = 8;
 
 /// The nodes of the machine that is collected from.
-std::vector<std::unique_ptr<NQORTQR20::SPLibrary>>& Nodes() {
-    static std::vector<std::unique_ptr<NQORTQR20::SPLibrary>> nodes;
+struct OpenNode {
+    std::string source;
+    std::unique_ptr<NQORTQR20::SPLibrary> library;
+};
+std::vector<OpenNode>& Nodes() {
+    static std::vector<OpenNode> nodes;
     return nodes;
 }
 
 }  // namespace
 
-std::optional<RequestFrame> RequestFrame::FromBuffer(std::span<const std::uint8_t> buffer) {
-    if (buffer.size() < kDataAt) return std::nullopt;
-    std::size_t count = 0;
-    for (std::size_t i = kDataAt - 1; i >= kCountAt; --i) count = count << 8 | buffer[i];
-    if (count > buffer.size() - kDataAt) return std::nullopt;
-    RequestFrame frame;
-    frame.dataLength_ = count;
-    const auto bytes =
-        buffer.first(std::max(kDataAt + count, std::min(kPaddedFrame, buffer.size())));
-    frame.bytes_.assign(bytes.begin(), bytes.end());
-    return frame;
-}
-
 void OpenMachine(Source source) {
     CloseMachine();
     SetMachineFacts(std::move(source.facts));
-    for (auto& transport : source.nodes) {
-        Nodes().push_back(std::make_unique<NQORTQR20::SPLibrary>(std::move(transport),
-                                                                 GetMachineFacts().integratedBmc));
+    for (SourceNode& node : source.nodes) {
+        if (node.pipeline) {
+            node.transport = std::make_unique<PipelineTransport>(std::move(node.pipeline));
+        }
+        Nodes().push_back({std::move(node.name),
+                           std::make_unique<NQORTQR20::SPLibrary>(
+                               std::move(node.transport), GetMachineFacts().integratedBmc)});
     }
 }
 
 NodeCompleteness CompletenessOf(const NQORTQR20::SPLibrary& library) {
-    const auto& watch = library.impl_->transport;
-    return watch ? watch->Account() : NodeCompleteness();
+    const auto& tracker = library.impl_->transport;
+    return tracker ? tracker->Completeness() : NodeCompleteness();
 }
 
 std::vector<NodeCompleteness> GetCompleteness() {
     std::vector<NodeCompleteness> accounts;
-    for (const auto& node : Nodes()) accounts.push_back(CompletenessOf(*node));
+    for (const OpenNode& node : Nodes()) {
+        accounts.push_back(CompletenessOf(*node.library));
+        accounts.back().source = node.source;
+    }
     return accounts;
 }
 
@@ -87,8 +83,9 @@ namespace NQORTQR20 {
 SPLibrary::SPLibrary(std::unique_ptr<tqrhost::Transport> transport, bool integratedBmc)
     : impl_(std::make_unique<Impl>()) {
     if (transport) {
-        impl_->transport = std::make_unique<tqrhost::ReadingWatch>(
-            std::make_unique<tqrhost::LoopGuard>(std::move(transport)));
+        impl_->transport =
+            std::make_unique<tqrhost::CompletenessTracker>(std::make_unique<tqrhost::LoopGuard>(
+                std::make_unique<tqrhost::RecordTrimmer>(std::move(transport))));
     }
     impl_->integratedBmc = integratedBmc;
 }
@@ -99,8 +96,9 @@ int SPLibrary::GetNumberBMCNode() { return static_cast<int>(tqrhost::Nodes().siz
 
 SPLibrary* SPLibrary::GetSplibraryInstance(int node) {
     const auto& nodes = tqrhost::Nodes();
-    return node >= 0 && node < GetNumberBMCNode() ? nodes[static_cast<std::size_t>(node)].get()
-                                                  : nullptr;
+    return node >= 0 && node < GetNumberBMCNode()
+               ? nodes[static_cast<std::size_t>(node)].library.get()
+               : nullptr;
 }
 
 bool SPLibrary::IsIPMIDriversPresent() { return tqrhost::GetMachineFacts().ipmiDriver; }

@@ -17,8 +17,10 @@
 #include <vector>
 
 #include "host/core/host.h"
+#include "host/spdriver/capture.h"
+#include "host/spdriver/completeness.h"
+#include "host/spdriver/source.h"
 #include "host/spdriver/stop.h"
-#include "host/spdriver/transport.h"
 #include "program/commands/classes.h"
 #include "program/commands/failure.h"
 #include "program/commands/log_lines.h"

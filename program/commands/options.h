@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "host/spdriver/transport.h"
+#include "host/spdriver/source.h"
 #include "tqr/log.h"
 
 namespace ipmisel {

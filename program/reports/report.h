@@ -8,8 +8,8 @@
 
 #include "host/core/host.h"
 #include "host/core/sink.h"
+#include "host/spdriver/completeness.h"
 #include "host/spdriver/stop.h"
-#include "host/spdriver/transport.h"
 #include "program/reports/output_file.h"
 #include "tqr/status.h"
 

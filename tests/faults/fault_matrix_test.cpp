@@ -133,7 +133,7 @@ protected:
         source.facts = facts;
         Pass pass;
         source.nodes.push_back(
-            std::make_unique<SpoiledBmc>(nodes[0], std::move(spoil), &pass.steps));
+            {"", std::make_unique<SpoiledBmc>(nodes[0], std::move(spoil), &pass.steps), nullptr});
         tqrhost::OpenMachine(std::move(source));
         const tqrhost::OutputHandle output(written);
         const char* classes[] = {ipmisel::kBmcFirmwareClass,

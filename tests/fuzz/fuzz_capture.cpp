@@ -8,7 +8,7 @@
 #include <cstdint>
 #include <string>
 
-#include "host/spdriver/transport.h"
+#include "host/spdriver/source.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     const int file = memfd_create("capture", MFD_CLOEXEC);
@@ -19,7 +19,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
                 tqrhost::OpenSources({"replay:/proc/self/fd/" + std::to_string(file)}, {});
             const std::array<std::uint8_t, 15> frame{0x01, 0x20, 0x0A, 0x00, 0x40};
             const auto request = tqrhost::RequestFrame::FromBuffer(frame);
-            for (const auto& node : source.nodes) node->Exchange(*request);
+            for (const auto& node : source.nodes) node.transport->Exchange(*request);
         } catch (const tqrhost::SourceError&) {
         }
     }

@@ -14,7 +14,7 @@
 #include "base/bytes.h"
 #include "host/core/host.h"
 #include "host/smbios/smbios_tables.h"
-#include "host/spdriver/transport.h"
+#include "host/spdriver/source.h"
 #include "plugins/ipmisel/pass/entry_points.h"
 #include "plugins/ipmisel/pass/state.h"
 
@@ -85,8 +85,9 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const std::size_t smbiosLength = Take(&input) + std::size_t{256} * (switches >> 6);
     source.facts.smbios = tqrhost::SplitSmbiosTable(Take(&input, smbiosLength));
     source.facts.smbios.push_back({38, 4, 0, 0, 0, 0});
-    source.nodes.push_back(std::make_unique<FuzzedBmc>(&input));
-    if ((switches & 16) != 0) source.nodes.push_back(std::make_unique<FuzzedBmc>(&input));
+    source.nodes.push_back({"", std::make_unique<FuzzedBmc>(&input), nullptr});
+    if ((switches & 16) != 0)
+        source.nodes.push_back({"", std::make_unique<FuzzedBmc>(&input), nullptr});
 
     ipmisel::ResetModuleState();
     tqrhost::OpenMachine(std::move(source));

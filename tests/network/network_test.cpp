@@ -12,6 +12,7 @@
 #include <string>
 #include <vector>
 
+#include "host/spdriver/capture.h"
 #include "host/spdriver/stop.h"
 #include "program/commands/classes.h"
 #include "simulator/network_bmc.h"
@@ -101,7 +102,7 @@ protected:
         tqrhost::Source source;
         for (const ipmisim::BmcDescription& bmc : server.bmcs) {
             source.nodes.push_back(
-                std::make_unique<ipmiseltest::SimulatedTransport>(bmc, &requests));
+                {"", std::make_unique<ipmiseltest::SimulatedTransport>(bmc, &requests), nullptr});
         }
         return CollectFrom(std::move(source));
     }

@@ -8,7 +8,9 @@
 #include <vector>
 
 #include "host/core/host.h"
-#include "host/spdriver/transport.h"
+#include "host/spdriver/completeness.h"
+#include "host/spdriver/source.h"
+#include "host/spdriver/stop_gate.h"
 #include "plugins/ipmisel/pass/entry_points.h"
 #include "plugins/ipmisel/pass/state.h"
 #include "simulator/simulated_bmc.h"
@@ -44,7 +46,10 @@ protected:
         tqrhost::Source source;
         source.facts = facts;
         for (const ipmisim::BmcDescription& node : nodes) {
-            source.nodes.push_back(std::make_unique<SimulatedTransport>(node, &requests));
+            source.nodes.push_back({"",
+                                    std::make_unique<tqrhost::StopGate>(
+                                        std::make_unique<SimulatedTransport>(node, &requests)),
+                                    nullptr});
         }
         tqrhost::OpenMachine(std::move(source));
     }

@@ -1,6 +1,6 @@
 #include <array>
 
-#include "host/spdriver/transport.h"
+#include "host/spdriver/completeness.h"
 #include "tests/support/bmc_fixture.h"
 
 namespace {

@@ -3,7 +3,7 @@
 #include <chrono>
 #include <functional>
 
-#include "host/spdriver/transport.h"
+#include "host/spdriver/source.h"
 #include "tests/support/ipmi_sim.h"
 
 namespace {

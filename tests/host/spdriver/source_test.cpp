@@ -2,8 +2,8 @@
 
 #include <fstream>
 
+#include "host/spdriver/capture.h"
 #include "host/spdriver/kinds.h"
-#include "host/spdriver/transport.h"
 #include "tests/host/spdriver/requests.h"
 #include "tests/support/ipmi_sim.h"
 
@@ -56,10 +56,10 @@ TEST(Sources, WhatIsOfNoKindOrCannotBeJoinedIsRefused) {
 std::vector<std::optional<Response>> Converse(const Source& source) {
     std::vector<std::optional<Response>> answers;
     for (int i = 0; i < 3; ++i) {
-        answers.push_back(source.nodes[0]->Exchange(StorageRequest(kGetSelTime)));
+        answers.push_back(source.nodes[0].transport->Exchange(StorageRequest(kGetSelTime)));
     }
-    answers.push_back(source.nodes[0]->Exchange(ReadRequest(kGetSelEntry, 1)));
-    answers.push_back(source.nodes[1]->Exchange(StorageRequest(kGetSelTime)));
+    answers.push_back(source.nodes[0].transport->Exchange(ReadRequest(kGetSelEntry, 1)));
+    answers.push_back(source.nodes[1].transport->Exchange(StorageRequest(kGetSelTime)));
     return answers;
 }
 
@@ -88,10 +88,10 @@ TEST(Capture, AReplayAnswersWhatWasRecorded) {
     ASSERT_EQ(replay.nodes.size(), 2u);
     EXPECT_EQ(Converse(replay), recorded);
     // Asked once more than recorded; another node's request; other data; another command.
-    EXPECT_EQ(replay.nodes[0]->Exchange(StorageRequest(kGetSelTime)), recorded[2]);
-    EXPECT_EQ(replay.nodes[1]->Exchange(ReadRequest(kGetSelEntry, 1)), std::nullopt);
-    EXPECT_EQ(replay.nodes[0]->Exchange(ReadRequest(kGetSelEntry, 2)), std::nullopt);
-    EXPECT_EQ(replay.nodes[0]->Exchange(StorageRequest(kGetSelInfo)), std::nullopt);
+    EXPECT_EQ(replay.nodes[0].transport->Exchange(StorageRequest(kGetSelTime)), recorded[2]);
+    EXPECT_EQ(replay.nodes[1].transport->Exchange(ReadRequest(kGetSelEntry, 1)), std::nullopt);
+    EXPECT_EQ(replay.nodes[0].transport->Exchange(ReadRequest(kGetSelEntry, 2)), std::nullopt);
+    EXPECT_EQ(replay.nodes[0].transport->Exchange(StorageRequest(kGetSelInfo)), std::nullopt);
 }
 
 TEST(Capture, WhatCannotBeWrittenIsTold) {
@@ -139,7 +139,7 @@ TEST(Inband, WithoutADriverOnlyTheSmbiosRecordMakesAMachine) {
     EXPECT_FALSE(source.facts.ipmiDriver);
     EXPECT_THAT(source.facts.smbios, ElementsAre(ipmiDevice));
     ASSERT_EQ(source.nodes.size(), 1u);
-    EXPECT_EQ(source.nodes[0]->Exchange(StorageRequest(kGetSelInfo)), std::nullopt);
+    EXPECT_EQ(source.nodes[0].transport->Exchange(StorageRequest(kGetSelInfo)), std::nullopt);
     // A device that is there is used; what is no IPMI device fails in one line.
     EXPECT_THROW(tqrhost::OpenInbandDevice({"/nonexistent", "/dev"}, {ipmiDevice}), SourceError);
 }

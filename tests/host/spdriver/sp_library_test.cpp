@@ -4,7 +4,7 @@
 
 #include <stdexcept>
 
-#include "host/spdriver/transport.h"
+#include "host/spdriver/source.h"
 
 namespace {
 
@@ -105,7 +105,7 @@ TEST(Machine, ItsNodesLastUntilItIsClosed) {
     Script script;
     tqrhost::Source source;
     for (int i = 0; i < 2; ++i)
-        source.nodes.push_back(std::make_unique<ScriptedTransport>(&script));
+        source.nodes.push_back({"", std::make_unique<ScriptedTransport>(&script), nullptr});
     tqrhost::OpenMachine(std::move(source));
     ASSERT_EQ(SPLibrary::GetNumberBMCNode(), 2);
     EXPECT_NE(SPLibrary::GetSplibraryInstance(1), nullptr);

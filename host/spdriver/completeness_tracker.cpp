@@ -1,19 +1,16 @@
-#include "host/spdriver/completeness.h"
+#include "host/spdriver/completeness_tracker.h"
 
 #include <algorithm>
 #include <utility>
 
 #include "base/bytes.h"
 #include "base/text.h"
-#include "host/spdriver/commands.h"
 #include "host/spdriver/stop.h"
 
 namespace tqrhost {
 namespace {
 
-constexpr std::size_t kMostFaults = 1000;
-constexpr std::uint8_t kNotPresent = 0xCB;
-constexpr std::uint8_t kOutOfRange = 0xC9;
+constexpr std::size_t kMaxFaults = 1000;
 
 // Answers, completion code included: version and count; next record ID and one byte of a record;
 // the count of FRU bytes.
@@ -24,17 +21,6 @@ constexpr std::size_t kRecordAt = 3;
 constexpr std::size_t kSelEntryLength = 16;
 // The length of a sensor record counts what follows its header (IPMI 2.0, clause 43).
 constexpr std::size_t kSdrHeaderLength = 5;
-constexpr std::uint8_t kToTheEnd = 0xFF;
-
-/// Takes off what follows the record's end: some BMCs answer a read to the end with more, left over
-/// from other records, which would lengthen the name that ends the record. A name that is longer
-/// by its own length byte than the record's length has it stays.
-void CutToRecord(std::size_t rest, Response* response) {
-    constexpr std::uint8_t kNameLength = 0x1F;
-    if (response->size() <= kRecordAt) return;
-    const std::size_t name = std::size_t{1} + (response->at(kRecordAt) & kNameLength);
-    response->resize(std::min(response->size(), kRecordAt + std::max(rest, name)));
-}
 
 const char* StopText(StopReason reason) {
     return reason == StopReason::kDeadline ? "deadline" : "interrupted";
@@ -43,51 +29,50 @@ const char* StopText(StopReason reason) {
 }  // namespace
 
 bool NodeCompleteness::Whole() const {
-    const auto whole = [](const SourceAccount& source) {
-        return !source.announced || source.read >= *source.announced;
+    const auto whole = [](const SourceAccount& account) {
+        return !account.announced || account.read >= *account.announced;
     };
     const bool faulty = std::any_of(faults.begin(), faults.end(),
                                     [](const ReadFault& fault) { return fault.ofLogOrSensors; });
     return !faulty && whole(log) && whole(sensors);
 }
 
-ReadingWatch::ReadingWatch(std::unique_ptr<LoopGuard> guard)
+CompletenessTracker::CompletenessTracker(std::unique_ptr<LoopGuard> guard)
     : guard_(std::move(guard)),
       log_{"Get SEL Info", "Get SEL Entry", true, &account_.log, {}, {}},
       sensors_{"Get SDR Repository Info", "Get SDR", false, &account_.sensors, {}, {}} {}
 
-std::optional<Response> ReadingWatch::Exchange(const RequestFrame& request) {
-    std::optional<Response> response;
-    if (Stopped() == StopReason::kNone) response = guard_->Exchange(request);
+std::optional<Response> CompletenessTracker::Exchange(const RequestFrame& request) {
+    auto response = guard_->Exchange(request);
     // Not even a completion code: nothing came.
     if (response && response->empty()) response.reset();
-    if (request.netFn() == kNetFnStorage) Note(request, &response);
+    if (request.netFn() == ipmi::kNetFnStorage) Note(request, response);
     return response;
 }
 
-void ReadingWatch::Note(const RequestFrame& request, std::optional<Response>* answer) {
-    const std::optional<Response>& response = *answer;
+void CompletenessTracker::Note(const RequestFrame& request,
+                               const std::optional<Response>& response) {
     const bool askedAgain = std::exchange(lastCommand_, request.command()) == request.command();
     switch (request.command()) {
-        case kGetSelInfo:
+        case ipmi::kGetSelInfo.number:
             NoteInfo(&log_, askedAgain, response);
             break;
-        case kGetSelEntry:
-            NoteRecord(&log_, request, answer);
+        case ipmi::kGetSelEntry.number:
+            NoteRecord(&log_, request, response);
             break;
-        case kGetSdrRepositoryInfo:
+        case ipmi::kGetSdrRepositoryInfo.number:
             NoteInfo(&sensors_, askedAgain, response);
             break;
-        case kReserveSdrRepository:
+        case ipmi::kReserveSdrRepository.number:
             FinishWalk(&sensors_);
             if (const std::string problem = ProblemOf(response, 3); !problem.empty()) {
                 AddFault({"Reserve SDR Repository", "", problem, true});
             }
             break;
-        case kGetSdr:
-            NoteRecord(&sensors_, request, answer);
+        case ipmi::kGetSdr.number:
+            NoteRecord(&sensors_, request, response);
             break;
-        case kReadFruData:
+        case ipmi::kReadFruData.number:
             NoteFru(request, response);
             break;
         default:
@@ -95,14 +80,14 @@ void ReadingWatch::Note(const RequestFrame& request, std::optional<Response>* an
     }
 }
 
-const NodeCompleteness& ReadingWatch::Account() {
+const NodeCompleteness& CompletenessTracker::Completeness() {
     FinishWalk(&log_);
     FinishWalk(&sensors_);
     return account_;
 }
 
-void ReadingWatch::NoteInfo(Source* source, bool askedAgain,
-                            const std::optional<Response>& response) {
+void CompletenessTracker::NoteInfo(Source* source, bool askedAgain,
+                                   const std::optional<Response>& response) {
     const std::string what = source->infoCommand;
     const std::string problem = ProblemOf(response, kInfoAnswer);
     if (!problem.empty()) {
@@ -122,7 +107,7 @@ void ReadingWatch::NoteInfo(Source* source, bool askedAgain,
     FinishWalk(source);
 }
 
-void ReadingWatch::FinishWalk(Source* source) {
+void CompletenessTracker::FinishWalk(Source* source) {
     const Walk walk = std::exchange(source->walk, Walk());
     const bool whole = walk.fromFirst && walk.ended;
     if (whole && walk.count < source->account->announced.value_or(0)) {
@@ -131,27 +116,28 @@ void ReadingWatch::FinishWalk(Source* source) {
     }
 }
 
-std::size_t ReadingWatch::WholeAnswer(const Source& source, std::uint16_t record,
-                                      std::uint8_t offset, std::uint8_t count) {
+std::size_t CompletenessTracker::WholeAnswer(const Source& source, std::uint16_t record,
+                                             std::uint8_t offset, std::uint8_t count) {
     std::size_t length = source.isLog ? kSelEntryLength : 1;
     if (!source.isLog && source.record == record && source.recordLength > offset) {
         length = source.recordLength - offset;
-    } else if (!source.isLog && count != kToTheEnd) {
+    } else if (!source.isLog && count != ipmi::kWholeRecord) {
         length = std::min<std::size_t>(count, kSdrHeaderLength);
     }
-    return kRecordAt + (count == kToTheEnd ? length : std::min<std::size_t>(count, length));
+    return kRecordAt +
+           (count == ipmi::kWholeRecord ? length : std::min<std::size_t>(count, length));
 }
 
-void ReadingWatch::NoteRecord(Source* source, const RequestFrame& request,
-                              std::optional<Response>* answer) {
-    const std::optional<Response>& response = *answer;
+void CompletenessTracker::NoteRecord(Source* source, const RequestFrame& request,
+                                     const std::optional<Response>& response) {
     ipmisel::ByteReader in(request.data());
     in.U16();
     const std::uint16_t record = in.U16();
     const std::uint8_t offset = in.U8();
     const std::uint8_t count = in.U8();
     // An empty log or repository has no first record.
-    if (response && response->front() == kNotPresent && source->account->announced == 0u) return;
+    if (response && response->front() == ipmi::kNotPresent && source->account->announced == 0u)
+        return;
     if (offset == 0) {
         if (record == 0) FinishWalk(source);
         source->record = record;
@@ -166,12 +152,7 @@ void ReadingWatch::NoteRecord(Source* source, const RequestFrame& request,
         AddFault({source->readCommand, ipmisel::Format("%04x", record), problem, true});
         return;
     }
-    if (offset != 0) {
-        if (source->record == record && source->recordLength > offset) {
-            CutToRecord(source->recordLength - offset, &**answer);
-        }
-        return;
-    }
+    if (offset != 0) return;
     if (source->counted.empty()) source->counted.resize(0x10000);
     if (!source->counted[record]) ++source->account->read;
     source->counted[record] = true;
@@ -182,13 +163,14 @@ void ReadingWatch::NoteRecord(Source* source, const RequestFrame& request,
     if (lowEnds || response->at(2) == 0xFF) source->walk.ended = true;
 }
 
-void ReadingWatch::NoteFru(const RequestFrame& request, const std::optional<Response>& response) {
+void CompletenessTracker::NoteFru(const RequestFrame& request,
+                                  const std::optional<Response>& response) {
     ipmisel::ByteReader in(request.data());
     const std::uint8_t device = in.U8();
     const std::uint16_t offset = in.U16();
-    if (response && response->front() == kNotPresent && offset == 0) return;  // absent
+    if (response && response->front() == ipmi::kNotPresent && offset == 0) return;  // absent
     // A device may be smaller than what is asked for.
-    if (response && response->front() == kOutOfRange && offset > 0) return;
+    if (response && response->front() == ipmi::kParameterOutOfRange && offset > 0) return;
     // The count, and as many bytes as it says.
     const bool counts = response && response->size() >= kFruAnswer;
     const std::size_t least = kFruAnswer + (counts ? response->at(1) : 0);
@@ -198,15 +180,15 @@ void ReadingWatch::NoteFru(const RequestFrame& request, const std::optional<Resp
     }
 }
 
-void ReadingWatch::AddFault(ReadFault fault) {
-    if (account_.faults.size() >= kMostFaults) return;
+void CompletenessTracker::AddFault(ReadFault fault) {
+    if (account_.faults.size() >= kMaxFaults) return;
     if (std::find(account_.faults.begin(), account_.faults.end(), fault) == account_.faults.end()) {
         account_.faults.push_back(std::move(fault));
     }
 }
 
-std::string ReadingWatch::ProblemOf(const std::optional<Response>& response,
-                                    std::size_t least) const {
+std::string CompletenessTracker::ProblemOf(const std::optional<Response>& response,
+                                           std::size_t least) const {
     if (!response) {
         if (const StopReason reason = Stopped(); reason != StopReason::kNone) {
             return StopText(reason);

@@ -1,0 +1,23 @@
+#pragma once
+
+#include <memory>
+#include <string>
+
+#include "host/spdriver/source.h"
+
+namespace tqrhost {
+
+/// A capture file in the making; docs/capture.md has its format. It is complete when the transports
+/// that write to it are gone.
+class CaptureWriter {
+public:
+    virtual ~CaptureWriter() = default;
+    /// Flushes; false when anything could not be written.
+    virtual bool Finish() = 0;
+};
+
+/// Wraps the ways to the nodes of a source so that every exchange is appended to the capture file.
+/// Throws SourceError when the file cannot be written.
+std::shared_ptr<CaptureWriter> RecordTo(const std::string& file, Source& source);
+
+}  // namespace tqrhost

@@ -1,0 +1,65 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "host/spdriver/completeness.h"
+#include "host/spdriver/loop_guard.h"
+#include "host/spdriver/transport.h"
+
+namespace tqrhost {
+
+/// Tracks what could be read of one node: the event log, the sensor repository and the FRU devices.
+/// Every exchange goes through unchanged.
+class CompletenessTracker : public Transport {
+public:
+    explicit CompletenessTracker(std::unique_ptr<LoopGuard> guard);
+    std::optional<Response> Exchange(const RequestFrame& request) override;
+    const NodeCompleteness& Completeness();
+
+private:
+    void Note(const RequestFrame& request, const std::optional<Response>& response);
+    /// One reading from the first record to the last.
+    struct Walk {
+        bool fromFirst = false;
+        bool ended = false;  ///< no next record was named
+        unsigned count = 0;
+    };
+    /// An account, and which records it has counted: a record that is read again counts once.
+    struct Source {
+        const char* infoCommand;
+        const char* readCommand;
+        bool isLog;
+        SourceAccount* account;
+        std::vector<bool> counted;
+        Walk walk;
+        /// The record whose beginning came last, and its length; 0 when that did not come.
+        std::uint16_t record = 0;
+        std::size_t recordLength = 0;
+    };
+
+    void NoteInfo(Source* source, bool askedAgain, const std::optional<Response>& response);
+    /// Judges a walk that is over: a second one that was whole does not make up for it.
+    void FinishWalk(Source* source);
+    void NoteRecord(Source* source, const RequestFrame& request,
+                    const std::optional<Response>& response);
+    void NoteFru(const RequestFrame& request, const std::optional<Response>& response);
+    /// Bytes that an answer must have, by what was asked and what is known of the record.
+    static std::size_t WholeAnswer(const Source& source, std::uint16_t record, std::uint8_t offset,
+                                   std::uint8_t count);
+    void AddFault(ReadFault fault);
+    /// What went wrong with an answer that has to have so many bytes; empty when nothing did.
+    std::string ProblemOf(const std::optional<Response>& response, std::size_t least) const;
+
+    std::unique_ptr<LoopGuard> guard_;
+    NodeCompleteness account_;
+    Source log_;
+    Source sensors_;
+    std::uint8_t lastCommand_ = 0;  ///< Storage command
+};
+
+}  // namespace tqrhost

@@ -1,0 +1,83 @@
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <span>
+#include <stdexcept>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "host/core/host.h"
+#include "host/spdriver/pipeline.h"
+#include "host/spdriver/transport.h"
+
+// Where a machine is reached: what the user says of it, and what comes of it.
+
+namespace tqrhost {
+
+/// Why a source could not be opened; what() is one line for the user that says what to do.
+struct SourceError : std::runtime_error {
+    using std::runtime_error::runtime_error;
+};
+/// The sources are named wrongly: a kind that is not known, kinds that do not go together, or
+/// options that no BMC could be opened with.
+struct SourceUsageError : SourceError {
+    using SourceError::SourceError;
+};
+
+/// What the user said about access, as it was said.
+struct SourceOptions {
+    std::optional<std::string> user;
+    std::function<std::string()> password;          ///< asked for only where a password is needed
+    std::function<std::vector<std::uint8_t>()> kg;  ///< the BMC's own key; empty: it has none
+    std::optional<int> cipherSuite;                 ///< by number; else the best that the BMC has
+    std::string privilege = "admin";                ///< user, operator, admin
+    std::vector<std::string> workarounds;           ///< names of KnownWorkarounds()
+    std::optional<int> window;                      ///< requests outstanding
+    double timeoutSeconds = 20;  ///< how long one request may go unanswered in all
+};
+
+struct WorkaroundInfo {
+    std::string_view name;
+    std::string_view description;
+};
+/// The known deviations of BMCs that a user may ask to put up with.
+std::span<const WorkaroundInfo> KnownWorkarounds();
+
+/// One BMC node of a source: either of the two ways is set.
+struct SourceNode {
+    std::string name;                           ///< the source as the user wrote it
+    std::unique_ptr<Transport> transport;       ///< each request is answered by itself
+    std::unique_ptr<RequestPipeline> pipeline;  ///< a live BMC, which is read ahead
+};
+
+/// A node that could not be opened.
+struct UnreachableNode {
+    std::string name;    ///< the source as the user wrote it
+    std::string reason;  ///< one line for the user
+};
+
+/// A place where a machine is reached: its facts and its BMC nodes.
+struct Source {
+    MachineFacts facts;
+    std::vector<SourceNode> nodes;
+    std::vector<UnreachableNode> unreachable;
+};
+
+/// Opens "inband", "lan:HOST", "sim:FILE", "replay:FILE". Several sources must all be of a kind
+/// that can be joined (lan:); their nodes follow each other, and those of them that cannot be
+/// opened stand in `unreachable`. Throws SourceError when there is no node at all, also for a kind
+/// that is not built in.
+Source OpenSources(const std::vector<std::string>& sources, const SourceOptions& options);
+
+/// Makes the nodes and facts of a source the machine that SPLibrary and the core speak of; until
+/// the next call, or CloseMachine.
+void OpenMachine(Source source);
+void CloseMachine();
+
+}  // namespace tqrhost
