@@ -1,10 +1,12 @@
 #include "simulator/server_file.h"
 
 #include <algorithm>
+#include <chrono>
 #include <cstdint>
 #include <limits>
 #include <string_view>
 
+#include "ipmi/pef.h"
 #include "simulator/strict_json.h"
 
 namespace ipmisim {
@@ -34,14 +36,43 @@ std::uint8_t NetFn(const JsonValue& value) {
     return netFn;
 }
 
-std::array<std::uint8_t, 16> SelEntry(const JsonValue& value) {
-    std::array<std::uint8_t, 16> entry{};
-    const Bytes bytes = value.Hex();
-    if (bytes.size() != entry.size()) {
-        value.Refuse("an entry has 16 bytes, not " + std::to_string(bytes.size()));
+/// Seconds since 1970 UTC of such a time; empty where it is no calendar time.
+std::optional<std::int64_t> SecondsOf(const std::string& cim) {
+    using namespace std::chrono;
+    const auto number = [&](std::size_t at, std::size_t digits) {
+        return std::stoi(cim.substr(at, digits));
+    };
+    const year_month_day date{year(number(0, 4)), month(static_cast<unsigned>(number(4, 2))),
+                              day(static_cast<unsigned>(number(6, 2)))};
+    const int minutesEast = number(22, 3) * (cim[21] == '-' ? -1 : 1);
+    if (!date.ok()) return std::nullopt;
+    const auto local =
+        sys_days(date) + hours(number(8, 2)) + minutes(number(10, 2)) + seconds(number(12, 2));
+    return (local - minutes(minutesEast)).time_since_epoch().count();
+}
+
+/// Minutes east of UTC, or the value that stands for "not known" (IPMI 2.0, 31.11a).
+constexpr std::int32_t kUtcOffsetNotKnown = 0x07FF;
+
+std::int16_t UtcOffset(const JsonValue& value) {
+    constexpr std::int32_t kDay = 24 * 60;
+    const std::int32_t minutes = value.Integer(-kDay, kUtcOffsetNotKnown);
+    if (minutes > kDay && minutes != kUtcOffsetNotKnown) {
+        value.Refuse("must be -1440 to 1440, or 2047 for not known");
     }
-    std::copy(bytes.begin(), bytes.end(), entry.begin());
-    return entry;
+    return static_cast<std::int16_t>(minutes);
+}
+
+template <std::size_t N>
+std::array<std::uint8_t, N> Exactly(const JsonValue& value, const char* what) {
+    std::array<std::uint8_t, N> exact{};
+    const Bytes bytes = value.Hex();
+    if (bytes.size() != N) {
+        value.Refuse(std::string(what) + " has " + std::to_string(N) + " bytes, not " +
+                     std::to_string(bytes.size()));
+    }
+    std::copy(bytes.begin(), bytes.end(), exact.begin());
+    return exact;
 }
 
 std::uint8_t FruDevice(const std::string& key, const JsonValue& value) {
@@ -50,6 +81,80 @@ std::uint8_t FruDevice(const std::string& key, const JsonValue& value) {
     const unsigned long number = isNumber ? std::stoul(key) : kMost16;
     if (number > 0xFF) value.Refuse("a FRU device ID is a number from 0 to 255");
     return static_cast<std::uint8_t>(number);
+}
+
+/// A key of `factors`: a raw reading.
+std::uint8_t HexKey(const std::string& key, const JsonValue& value, const char* what) {
+    std::size_t digits = 0;
+    const bool isByte =
+        key.size() == 2 && key.find_first_not_of("0123456789abcdefABCDEF") == std::string::npos;
+    if (!isByte) value.Refuse(std::string(what) + " is two hexadecimal digits");
+    return static_cast<std::uint8_t>(std::stoul(key, &digits, 16));
+}
+
+/// A key of `sensors`: "NN", or "OWNER/LUN/NN" with the owner in two hexadecimal digits.
+SensorAddress AddressOf(const std::string& key, const JsonValue& value) {
+    constexpr const char* kForms = "a sensor is NN or OWNER/LUN/NN; each of NN and OWNER";
+    SensorAddress address;
+    if (key.find('/') == std::string::npos) {
+        address.number = HexKey(key, value, kForms);
+        return address;
+    }
+    if (key.size() != 7 || key[2] != '/' || key[4] != '/')
+        value.Refuse("a sensor is NN or OWNER/LUN/NN");
+    address.owner = HexKey(key.substr(0, 2), value, kForms);
+    address.number = HexKey(key.substr(5), value, kForms);
+    if (key[3] < '0' || key[3] > '3') value.Refuse("a LUN is 0 to 3");
+    address.lun = static_cast<std::uint8_t>(key[3] - '0');
+    return address;
+}
+
+void ReadSensor(const std::string& key, const JsonValue& value, BmcDescription* bmc) {
+    SensorAddress address = AddressOf(key, value);
+    const bool isAddressed = key.find('/') != std::string::npos;
+    SimulatedSensor sensor;
+    const auto onlyOnce = [&](const JsonValue& v) {
+        if (isAddressed) v.Refuse("stands in the sensor's key already");
+    };
+    value.Object({
+        {"reading", [&](const JsonValue& v) { sensor.reading = v.HexByte(); }},
+        {"states", [&](const JsonValue& v) { sensor.states = v.Hex(); }},
+        {"thresholds", [&](const JsonValue& v) { sensor.thresholds = v.Hex(); }},
+        {"factors",
+         [&](const JsonValue& v) {
+             v.Members([&](const std::string& reading, const JsonValue& factors) {
+                 sensor.factors[HexKey(reading, factors, "a reading")] =
+                     Exactly<7>(factors, "an answer with factors");
+             });
+         }},
+        {"owner",
+         [&](const JsonValue& v) {
+             onlyOnce(v);
+             address.owner = v.HexByte();
+         }},
+        {"lun",
+         [&](const JsonValue& v) {
+             onlyOnce(v);
+             address.lun = static_cast<std::uint8_t>(v.Number(0, 3));
+         }},
+    });
+    if (!bmc->sensors.emplace(address, std::move(sensor)).second) {
+        value.Refuse("the same sensor stands here twice");
+    }
+}
+
+void ReadPef(const JsonValue& value, BmcDescription* bmc) {
+    constexpr std::size_t kMaxFilters = 0x7F;
+    value.Object({{"filters",
+                   [&](const JsonValue& v) {
+                       auto& filters = bmc->pefFilters.emplace();
+                       v.List([&](const JsonValue& f) {
+                           if (filters.size() == kMaxFilters) f.Refuse("at most 127 filters");
+                           filters.push_back(
+                               Exactly<ipmi::kEventFilterLength>(f, "an event filter"));
+                       });
+                   },
+                   true}});
 }
 
 void ReadReply(const JsonValue& value, FixedReply* reply) {
@@ -104,9 +209,21 @@ void ReadBmc(const JsonValue& value, BmcDescription* bmc) {
             {"version", [&](const JsonValue& v) { bmc->selVersion = v.HexByte(); }},
             {"entries",
              [&](const JsonValue& v) {
-                 v.List([&](const JsonValue& e) { bmc->selEntries.push_back(SelEntry(e)); });
+                 v.List([&](const JsonValue& e) {
+                     bmc->selEntries.push_back(Exactly<16>(e, "an entry"));
+                 });
              }},
             {"time", [&](const JsonValue& v) { bmc->selTime = v.Number(0, kMost32); }},
+            {"free_bytes",
+             [&](const JsonValue& v) {
+                 bmc->selFreeBytes = static_cast<std::uint16_t>(v.Number(0, kMost16));
+             }},
+            {"last_addition",
+             [&](const JsonValue& v) { bmc->selLastAddition = v.Number(0, kMost32); }},
+            {"last_erase", [&](const JsonValue& v) { bmc->selLastErase = v.Number(0, kMost32); }},
+            {"overflow", [&](const JsonValue& v) { bmc->selOverflow = v.Flag(); }},
+            {"utc_offset_minutes",
+             [&](const JsonValue& v) { bmc->utcOffsetMinutes = UtcOffset(v); }},
         });
     };
     const auto readSdr = [&](const JsonValue& sdr) {
@@ -135,6 +252,17 @@ void ReadBmc(const JsonValue& value, BmcDescription* bmc) {
              });
          }},
         {"aux_log", readAuxLog},
+        {"guid", [&](const JsonValue& v) { bmc->guid = Exactly<16>(v, "a GUID"); }},
+        {"chassis_status", [&](const JsonValue& v) { bmc->chassisStatus = v.Hex(); }},
+        {"self_test", [&](const JsonValue& v) { bmc->selfTest = v.Hex(); }},
+        {"sensors",
+         [&](const JsonValue& v) {
+             v.Members([&](const std::string& key, const JsonValue& sensor) {
+                 ReadSensor(key, sensor, bmc);
+             });
+         }},
+        {"pef", [&](const JsonValue& v) { ReadPef(v, bmc); }},
+        {"whole_sdr", [&](const JsonValue& v) { bmc->wholeSdr = v.Flag(); }},
         {"replies",
          [&](const JsonValue& v) {
              v.List([&](const JsonValue& r) { ReadReply(r, &bmc->replies.emplace_back()); });
@@ -162,6 +290,17 @@ void ReadServer(const JsonValue& value, ServerDescription* server) {
              v.List([&](const JsonValue& b) { ReadBmc(b, &server->bmcs.emplace_back()); });
          }},
     });
+    // The clock of a BMC that does not say otherwise is that of its machine; it keeps local time
+    // where the offset is known.
+    const auto now = server->localTime ? SecondsOf(*server->localTime) : std::nullopt;
+    if (!now) return;
+    for (BmcDescription& bmc : server->bmcs) {
+        if (bmc.selTime) continue;
+        const bool offsetKnown =
+            bmc.utcOffsetMinutes && *bmc.utcOffsetMinutes != kUtcOffsetNotKnown;
+        bmc.selTime = static_cast<std::uint32_t>(
+            *now + (offsetKnown ? *bmc.utcOffsetMinutes * std::int64_t{60} : 0));
+    }
 }
 
 }  // namespace

@@ -5,23 +5,14 @@
 #include <ctime>
 #include <thread>
 
+#include "ipmi/command.h"
+
 namespace ipmisim {
 namespace {
 
-constexpr std::uint8_t kNetFnApp = 0x06;
-constexpr std::uint8_t kNetFnStorage = 0x0A;
+using ipmi::kCompleted;
+using ipmi::kNotPresent;
 
-// Completion codes, IPMI 2.0 table 5-2.
-constexpr std::uint8_t kSuccess = 0x00;
-constexpr std::uint8_t kInvalidCommand = 0xC1;
-constexpr std::uint8_t kReservationCancelled = 0xC5;
-constexpr std::uint8_t kRequestLengthInvalid = 0xC7;
-constexpr std::uint8_t kParameterOutOfRange = 0xC9;
-constexpr std::uint8_t kNotPresent = 0xCB;
-
-constexpr std::uint16_t kFirstRecord = 0x0000;
-constexpr std::uint16_t kLastRecord = 0xFFFF;     // and, as the next record ID, the end
-constexpr std::uint8_t kWholeRecord = 0xFF;       // count of a record read
 constexpr std::uint32_t kNoTime = 0xFFFFFFFF;     // IPMI 2.0, clause 37: unspecified
 constexpr std::uint8_t kFirstUntimedType = 0xE0;  // OEM records without a time stamp
 
@@ -43,6 +34,15 @@ std::uint16_t U16At(std::span<const std::uint8_t> bytes, std::size_t at) {
 /// A count that the answer has 16 bits for.
 std::size_t Count16(std::size_t count) { return std::min<std::size_t>(count, 0xFFFF); }
 
+/// An answer that stands in the description as a whole.
+template <typename Data>
+std::optional<Bytes> Completed(const std::optional<Data>& data) {
+    if (!data) return std::nullopt;
+    Bytes answer{kCompleted};
+    answer.insert(answer.end(), data->begin(), data->end());
+    return answer;
+}
+
 template <typename Records>
 auto IndexById(const Records& records) {
     std::unordered_map<std::uint16_t, std::size_t> index;
@@ -57,34 +57,34 @@ Bytes ReadRecord(const Records& records, const Index& index, std::uint16_t id, s
                  std::uint8_t count) {
     if (records.empty()) return {kNotPresent};
     std::size_t position = 0;
-    if (id == kLastRecord) {
+    if (id == ipmi::kLastRecordId) {
         position = records.size() - 1;
-    } else if (id != kFirstRecord) {
+    } else if (id != ipmi::kFirstRecordId) {
         const auto found = index.find(id);
         if (found == index.end()) return {kNotPresent};
         position = found->second;
     }
     const std::span<const std::uint8_t> record(records[position]);
-    if (offset >= record.size()) return {kParameterOutOfRange};
+    if (offset >= record.size()) return {ipmi::kParameterOutOfRange};
     const auto rest = record.subspan(offset);
     const auto part =
-        count == kWholeRecord ? rest : rest.first(std::min<std::size_t>(count, rest.size()));
-    Bytes answer{kSuccess};
+        count == ipmi::kWholeRecord ? rest : rest.first(std::min<std::size_t>(count, rest.size()));
+    Bytes answer{kCompleted};
     answer.reserve(3 + part.size());
-    AppendU16(&answer,
-              position + 1 < records.size() ? U16At(records[position + 1], 0) : kLastRecord);
+    AppendU16(&answer, position + 1 < records.size() ? U16At(records[position + 1], 0)
+                                                     : ipmi::kLastRecordId);
     answer.insert(answer.end(), part.begin(), part.end());
     return answer;
 }
 
 /// Answer of Get SEL Info and Get SDR Repository Info.
 Bytes RepositoryInfo(std::uint8_t version, std::size_t count, std::size_t freeBytes,
-                     std::uint32_t lastAddition, std::uint8_t operations) {
-    Bytes answer{kSuccess, version};
+                     std::uint32_t lastAddition, std::uint32_t lastErase, std::uint8_t operations) {
+    Bytes answer{kCompleted, version};
     AppendU16(&answer, Count16(count));
     AppendU16(&answer, Count16(freeBytes));
     AppendU32(&answer, lastAddition);
-    AppendU32(&answer, kNoTime);  // last erase
+    AppendU32(&answer, lastErase);
     answer.push_back(operations);
     return answer;
 }
@@ -93,24 +93,31 @@ Bytes RepositoryInfo(std::uint8_t version, std::size_t count, std::size_t freeBy
 
 /// A command that the BMC knows. Its operation answers completion code and data; empty where the
 /// description leaves the command out.
-struct SimulatedBmc::Command {
-    std::uint8_t netFn;
-    std::uint8_t command;
+struct SimulatedBmc::Known {
+    ipmi::CommandCode code;
     std::size_t requestLength;
-    std::optional<Bytes> (SimulatedBmc::*answer)(std::span<const std::uint8_t> data);
+    std::optional<Bytes> (SimulatedBmc::*answer)(const Request& request);
 };
 
-const SimulatedBmc::Command SimulatedBmc::kCommands[] = {
-    {kNetFnApp, 0x01, 0, &SimulatedBmc::GetDeviceId},
-    {kNetFnStorage, 0x10, 1, &SimulatedBmc::GetFruInventoryAreaInfo},
-    {kNetFnStorage, 0x11, 4, &SimulatedBmc::ReadFruData},
-    {kNetFnStorage, 0x20, 0, &SimulatedBmc::GetSdrRepositoryInfo},
-    {kNetFnStorage, 0x22, 0, &SimulatedBmc::ReserveSdrRepository},
-    {kNetFnStorage, 0x23, 6, &SimulatedBmc::GetSdr},
-    {kNetFnStorage, 0x40, 0, &SimulatedBmc::GetSelInfo},
-    {kNetFnStorage, 0x43, 6, &SimulatedBmc::GetSelEntry},
-    {kNetFnStorage, 0x48, 0, &SimulatedBmc::GetSelTime},
-    {kNetFnStorage, 0x5A, 1, &SimulatedBmc::GetAuxLogStatus},
+const SimulatedBmc::Known SimulatedBmc::kKnown[] = {
+    {ipmi::kGetChassisStatus, 0, &SimulatedBmc::GetChassisStatus},
+    {ipmi::kGetPefConfigurationParameters, 3, &SimulatedBmc::GetPefParameter},
+    {ipmi::kGetSensorReadingFactors, 2, &SimulatedBmc::GetSensorReadingFactors},
+    {ipmi::kGetSensorThresholds, 1, &SimulatedBmc::GetSensorThresholds},
+    {ipmi::kGetSensorReading, 1, &SimulatedBmc::GetSensorReading},
+    {ipmi::kGetDeviceId, 0, &SimulatedBmc::GetDeviceId},
+    {ipmi::kGetSelfTestResults, 0, &SimulatedBmc::GetSelfTestResults},
+    {ipmi::kGetSystemGuid, 0, &SimulatedBmc::GetSystemGuid},
+    {ipmi::kGetFruInventoryAreaInfo, 1, &SimulatedBmc::GetFruInventoryAreaInfo},
+    {ipmi::kReadFruData, 4, &SimulatedBmc::ReadFruData},
+    {ipmi::kGetSdrRepositoryInfo, 0, &SimulatedBmc::GetSdrRepositoryInfo},
+    {ipmi::kReserveSdrRepository, 0, &SimulatedBmc::ReserveSdrRepository},
+    {ipmi::kGetSdr, 6, &SimulatedBmc::GetSdr},
+    {ipmi::kGetSelInfo, 0, &SimulatedBmc::GetSelInfo},
+    {ipmi::kGetSelEntry, 6, &SimulatedBmc::GetSelEntry},
+    {ipmi::kGetSelTime, 0, &SimulatedBmc::GetSelTime},
+    {ipmi::kGetAuxiliaryLogStatus, 1, &SimulatedBmc::GetAuxLogStatus},
+    {ipmi::kGetSelTimeUtcOffset, 0, &SimulatedBmc::GetSelTimeUtcOffset},
 };
 
 SimulatedBmc::SimulatedBmc(BmcDescription description)
@@ -118,7 +125,7 @@ SimulatedBmc::SimulatedBmc(BmcDescription description)
       selIndex_(IndexById(description_.selEntries)),
       sdrIndex_(IndexById(description_.sdrRecords)) {}
 
-std::optional<Bytes> SimulatedBmc::Execute(std::uint8_t netFn, std::uint8_t /*lun*/,
+std::optional<Bytes> SimulatedBmc::Execute(std::uint8_t netFn, std::uint8_t lun,
                                            std::uint8_t command,
                                            std::span<const std::uint8_t> data) {
     if (description_.latencyMicroseconds != 0) {
@@ -129,7 +136,7 @@ std::optional<Bytes> SimulatedBmc::Execute(std::uint8_t netFn, std::uint8_t /*lu
         std::find_if(description_.faults.begin(), description_.faults.end(), [&](const Fault& f) {
             return f.netFn == netFn && f.command == command && f.call.value_or(call) == call;
         });
-    if (fault == description_.faults.end()) return Normal(netFn, command, data);
+    if (fault == description_.faults.end()) return Normal(netFn, lun, command, data);
     Bytes answer;
     switch (fault->kind) {
         case Fault::Kind::kNoResponse:
@@ -137,11 +144,11 @@ std::optional<Bytes> SimulatedBmc::Execute(std::uint8_t netFn, std::uint8_t /*lu
         case Fault::Kind::kCompletionCode:
             return Bytes{fault->completionCode};
         case Fault::Kind::kTruncate:
-            answer = Normal(netFn, command, data);
+            answer = Normal(netFn, lun, command, data);
             if (answer.size() - 1 > fault->truncate) answer.resize(1 + fault->truncate);
             return answer;
         case Fault::Kind::kData:
-            answer.push_back(kSuccess);
+            answer.push_back(kCompleted);
             answer.insert(answer.end(), fault->data.begin(), fault->data.end());
             return answer;
     }
@@ -149,12 +156,12 @@ std::optional<Bytes> SimulatedBmc::Execute(std::uint8_t netFn, std::uint8_t /*lu
 }
 
 /// What the BMC answers when nothing is wrong with it; never empty.
-Bytes SimulatedBmc::Normal(std::uint8_t netFn, std::uint8_t command,
+Bytes SimulatedBmc::Normal(std::uint8_t netFn, std::uint8_t lun, std::uint8_t command,
                            std::span<const std::uint8_t> data) {
-    for (const Command& known : kCommands) {
-        if (known.netFn != netFn || known.command != command) continue;
-        if (data.size() != known.requestLength) return {kRequestLengthInvalid};
-        if (auto answer = (this->*known.answer)(data)) return *std::move(answer);
+    for (const Known& known : kKnown) {
+        if (known.code != ipmi::CommandCode{netFn, command}) continue;
+        if (data.size() != known.requestLength) return {ipmi::kRequestLengthInvalid};
+        if (auto answer = (this->*known.answer)({lun, data})) return *std::move(answer);
     }
     for (const FixedReply& reply : description_.replies) {
         if (reply.netFn != netFn || reply.command != command) continue;
@@ -162,91 +169,174 @@ Bytes SimulatedBmc::Normal(std::uint8_t netFn, std::uint8_t command,
             !std::equal(reply.request.begin(), reply.request.end(), data.begin())) {
             continue;
         }
-        Bytes answer{kSuccess};
+        Bytes answer{kCompleted};
         answer.insert(answer.end(), reply.response.begin(), reply.response.end());
         return answer;
     }
-    return {kInvalidCommand};
+    return {ipmi::kInvalidCommand};
 }
 
-std::optional<Bytes> SimulatedBmc::GetDeviceId(std::span<const std::uint8_t>) {
-    if (!description_.deviceId) return std::nullopt;
-    Bytes answer{kSuccess};
-    answer.insert(answer.end(), description_.deviceId->begin(), description_.deviceId->end());
+std::optional<Bytes> SimulatedBmc::GetDeviceId(const Request&) {
+    return Completed(description_.deviceId);
+}
+
+std::optional<Bytes> SimulatedBmc::GetSelfTestResults(const Request&) {
+    return Completed(description_.selfTest);
+}
+
+std::optional<Bytes> SimulatedBmc::GetSystemGuid(const Request&) {
+    return Completed(description_.guid);
+}
+
+std::optional<Bytes> SimulatedBmc::GetChassisStatus(const Request&) {
+    return Completed(description_.chassisStatus);
+}
+
+std::optional<Bytes> SimulatedBmc::GetPefParameter(const Request& request) {
+    if (!description_.pefFilters) return std::nullopt;
+    constexpr std::uint8_t kRevision = 0x11;
+    constexpr std::uint8_t kRevisionOnly = 0x80;
+    constexpr std::uint8_t kParameterNotSupported = 0x80;  // table 30-4
+    const auto& filters = *description_.pefFilters;
+    Bytes answer{kCompleted, kRevision};
+    const std::uint8_t parameter = request.data[0] & 0x7F;
+    const std::size_t entry = request.data[1] & 0x7F;  // from 1
+    if (parameter != ipmi::kPefEventFilterCount && parameter != ipmi::kPefEventFilter) {
+        return Bytes{kParameterNotSupported};
+    }
+    if ((request.data[0] & kRevisionOnly) != 0) return answer;
+    if (parameter == ipmi::kPefEventFilterCount) {
+        answer.push_back(static_cast<std::uint8_t>(filters.size()));
+        return answer;
+    }
+    if (entry == 0 || entry > filters.size()) return Bytes{ipmi::kParameterOutOfRange};
+    answer.insert(answer.end(), filters[entry - 1].begin(), filters[entry - 1].end());
     return answer;
 }
 
-std::optional<Bytes> SimulatedBmc::GetFruInventoryAreaInfo(std::span<const std::uint8_t> data) {
+const SimulatedSensor* SimulatedBmc::OwnSensor(const Request& request) const {
+    const auto sensor =
+        description_.sensors.find({ipmi::kBmcAddress, request.lun, request.data[0]});
+    return sensor == description_.sensors.end() ? nullptr : &sensor->second;
+}
+
+std::optional<Bytes> SimulatedBmc::GetSensorReading(const Request& request) {
+    const SimulatedSensor* sensor = OwnSensor(request);
+    if (sensor == nullptr || (!sensor->reading && !sensor->states)) return Bytes{kNotPresent};
+    // Events and scanning enabled, no state asserted.
+    static const Bytes kWell{0xC0, 0x00, 0x80};
+    const Bytes& states = sensor->states ? *sensor->states : kWell;
+    Bytes answer{kCompleted, sensor->reading.value_or(0)};
+    answer.insert(answer.end(), states.begin(), states.end());
+    return answer;
+}
+
+std::optional<Bytes> SimulatedBmc::GetSensorThresholds(const Request& request) {
+    const SimulatedSensor* sensor = OwnSensor(request);
+    if (sensor == nullptr || !sensor->thresholds) return Bytes{kNotPresent};
+    return Completed(sensor->thresholds);
+}
+
+std::optional<Bytes> SimulatedBmc::GetSensorReadingFactors(const Request& request) {
+    const SimulatedSensor* sensor = OwnSensor(request);
+    if (sensor == nullptr) return Bytes{kNotPresent};
+    const auto factors = sensor->factors.find(request.data[1]);
+    if (factors == sensor->factors.end()) return Bytes{kNotPresent};
+    return Completed(std::optional(factors->second));
+}
+
+std::optional<Bytes> SimulatedBmc::GetFruInventoryAreaInfo(const Request& request) {
+    const auto data = request.data;
     const auto device = description_.fru.find(data[0]);
     if (device == description_.fru.end()) return Bytes{kNotPresent};
-    Bytes answer{kSuccess};
+    Bytes answer{kCompleted};
     AppendU16(&answer, Count16(device->second.size()));
     answer.push_back(0x00);  // accessed by bytes
     return answer;
 }
 
-std::optional<Bytes> SimulatedBmc::ReadFruData(std::span<const std::uint8_t> data) {
+std::optional<Bytes> SimulatedBmc::ReadFruData(const Request& request) {
+    const auto data = request.data;
     const auto device = description_.fru.find(data[0]);
     if (device == description_.fru.end()) return Bytes{kNotPresent};
     const std::span<const std::uint8_t> inventory(device->second);
     const std::size_t offset = U16At(data, 1);
-    if (offset >= inventory.size()) return Bytes{kParameterOutOfRange};
+    if (offset >= inventory.size()) return Bytes{ipmi::kParameterOutOfRange};
     const auto part =
         inventory.subspan(offset, std::min<std::size_t>(data[3], inventory.size() - offset));
-    Bytes answer{kSuccess, static_cast<std::uint8_t>(part.size())};
+    Bytes answer{kCompleted, static_cast<std::uint8_t>(part.size())};
     answer.insert(answer.end(), part.begin(), part.end());
     return answer;
 }
 
-std::optional<Bytes> SimulatedBmc::GetSdrRepositoryInfo(std::span<const std::uint8_t>) {
+std::optional<Bytes> SimulatedBmc::GetSdrRepositoryInfo(const Request&) {
     std::size_t used = 0;
     for (const Bytes& record : description_.sdrRecords) used += record.size();
     constexpr std::uint8_t kReserveSupported = 0x02;
     return RepositoryInfo(description_.sdrVersion, description_.sdrRecords.size(),
-                          0xFFFF - Count16(used), kNoTime, kReserveSupported);
+                          0xFFFF - Count16(used), kNoTime, kNoTime, kReserveSupported);
 }
 
-std::optional<Bytes> SimulatedBmc::ReserveSdrRepository(std::span<const std::uint8_t>) {
+std::optional<Bytes> SimulatedBmc::ReserveSdrRepository(const Request&) {
     if (++sdrReservation_ == 0) ++sdrReservation_;
-    Bytes answer{kSuccess};
+    Bytes answer{kCompleted};
     AppendU16(&answer, sdrReservation_);
     return answer;
 }
 
-std::optional<Bytes> SimulatedBmc::GetSdr(std::span<const std::uint8_t> data) {
+std::optional<Bytes> SimulatedBmc::GetSdr(const Request& request) {
+    constexpr std::size_t kMaxPart = 22;         // of a controller that gives no whole records
+    constexpr std::size_t kCompletionAndId = 3;  // what stands before the part in an answer
+    const auto data = request.data;
     const std::uint8_t offset = data[4];
     if (offset != 0 && (sdrReservation_ == 0 || U16At(data, 0) != sdrReservation_)) {
-        return Bytes{kReservationCancelled};
+        return Bytes{ipmi::kReservationCanceled};
     }
-    return ReadRecord(description_.sdrRecords, sdrIndex_, U16At(data, 2), offset, data[5]);
+    Bytes answer = ReadRecord(description_.sdrRecords, sdrIndex_, U16At(data, 2), offset, data[5]);
+    if (!description_.wholeSdr && answer.size() > kCompletionAndId + kMaxPart) {
+        return Bytes{ipmi::kCannotReturnBytes};
+    }
+    return answer;
 }
 
-std::optional<Bytes> SimulatedBmc::GetSelInfo(std::span<const std::uint8_t>) {
+std::optional<Bytes> SimulatedBmc::GetSelInfo(const Request&) {
     const auto& entries = description_.selEntries;
     const auto newest = std::find_if(entries.rbegin(), entries.rend(), [](const auto& entry) {
         return entry[2] < kFirstUntimedType;
     });
-    const std::uint32_t lastAddition =
+    const std::uint32_t newestTime =
         newest == entries.rend()
             ? kNoTime
             : U16At(*newest, 3) | static_cast<std::uint32_t>(U16At(*newest, 5)) << 16;
     constexpr std::size_t kEntrySize = 16;
-    return RepositoryInfo(description_.selVersion, entries.size(),
-                          (0xFFFF - Count16(entries.size())) * kEntrySize, lastAddition, 0x00);
+    constexpr std::uint8_t kOverflow = 0x80;
+    const std::size_t left = (0xFFFF - Count16(entries.size())) * kEntrySize;
+    return RepositoryInfo(
+        description_.selVersion, entries.size(), description_.selFreeBytes.value_or(Count16(left)),
+        description_.selLastAddition.value_or(newestTime),
+        description_.selLastErase.value_or(kNoTime), description_.selOverflow ? kOverflow : 0x00);
 }
 
-std::optional<Bytes> SimulatedBmc::GetSelEntry(std::span<const std::uint8_t> data) {
+std::optional<Bytes> SimulatedBmc::GetSelEntry(const Request& request) {
+    const auto data = request.data;
     return ReadRecord(description_.selEntries, selIndex_, U16At(data, 2), data[4], data[5]);
 }
 
-std::optional<Bytes> SimulatedBmc::GetSelTime(std::span<const std::uint8_t>) {
-    Bytes answer{kSuccess};
+std::optional<Bytes> SimulatedBmc::GetSelTime(const Request&) {
+    Bytes answer{kCompleted};
     AppendU32(&answer,
               description_.selTime.value_or(static_cast<std::uint32_t>(std::time(nullptr))));
     return answer;
 }
 
-std::optional<Bytes> SimulatedBmc::GetAuxLogStatus(std::span<const std::uint8_t>) {
+std::optional<Bytes> SimulatedBmc::GetSelTimeUtcOffset(const Request&) {
+    if (!description_.utcOffsetMinutes) return std::nullopt;
+    Bytes answer{kCompleted};
+    AppendU16(&answer, static_cast<std::uint16_t>(*description_.utcOffsetMinutes));
+    return answer;
+}
+
+std::optional<Bytes> SimulatedBmc::GetAuxLogStatus(const Request&) {
     if (!description_.auxLogCount) return std::nullopt;
     // The count stands in bytes 16 and 17 of the reply frame, whose byte 8 is the completion code.
     Bytes answer(8, 0x00);

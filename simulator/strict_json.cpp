@@ -170,6 +170,16 @@ std::uint32_t JsonValue::Number(std::uint32_t least, std::uint32_t most) const {
     return value_.get<std::uint32_t>();
 }
 
+std::int32_t JsonValue::Integer(std::int32_t least, std::int32_t most) const {
+    const auto range = std::to_string(least) + " to " + std::to_string(most);
+    if (!value_.is_number_integer()) RefuseKind(("a whole number, " + range).c_str());
+    const bool tooLarge = value_.is_number_unsigned() && value_.get<std::uint64_t>() > INT32_MAX;
+    if (tooLarge || value_.get<std::int64_t>() < least || value_.get<std::int64_t>() > most) {
+        Refuse("must be " + range + ", not " + value_.dump());
+    }
+    return value_.get<std::int32_t>();
+}
+
 std::vector<std::uint8_t> JsonValue::Hex() const {
     if (!value_.is_string()) RefuseKind("a text of hexadecimal digits");
     const auto& text = value_.get_ref<const std::string&>();

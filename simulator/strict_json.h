@@ -37,6 +37,8 @@ public:
     std::string Text() const;
     bool Flag() const;
     std::uint32_t Number(std::uint32_t least, std::uint32_t most) const;
+    /// A whole number that may be negative.
+    std::int32_t Integer(std::int32_t least, std::int32_t most) const;
     /// Bytes as hexadecimal digits, blanks free.
     std::vector<std::uint8_t> Hex() const;
     /// One such byte.

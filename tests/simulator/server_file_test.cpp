@@ -24,8 +24,15 @@ constexpr const char* kWhole = R"({  // a server with everything
     "faults": [{"netfn": "0a", "command": "40", "call": 1, "no_response": true},
       {"netfn": "0a", "command": "43", "completion_code": "cb"},
       {"netfn": "0a", "command": "23", "truncate": 4},
-      {"netfn": "3f", "command": "43", "data": "00 ff"}]
-  }]
+      {"netfn": "3f", "command": "43", "data": "00 ff"}],
+    "guid": "00010203 04050607 08090a0b 0c0d0e0f", "chassis_status": "01 00 00",
+    "self_test": "5500", "whole_sdr": false,
+    "sensors": {"30": {"reading": "59", "states": "c0 c0", "thresholds": "3f 05", "lun": 1,
+                       "factors": {"5a": "60 01 00 02 00 00 00"}, "owner": "20"},
+                "82/3/30": {"reading": "5A"}},
+    "pef": {"filters": ["01 80 01 02 10 ffff 01 ff 01 00 02 000000 000000 000000"]}
+  }, {"sel": {"free_bytes": 65535, "last_addition": 1, "last_erase": 4294967295,
+              "overflow": true, "utc_offset_minutes": -90}}]
 })";
 
 /// The one line with which a text is refused, after the name of the file.
@@ -48,8 +55,18 @@ TEST(ServerFile, TheMachineIsRead) {
     EXPECT_TRUE(server.integratedBmc && !server.ipmiDriver && server.ipmiLan);
     EXPECT_EQ(server.localTime, "20240305120000.000000+060");
     EXPECT_THAT(server.smbios, ElementsAre(ElementsAre(0x26, 0x12, 0x00, 0x30), ElementsAre()));
-    ASSERT_EQ(server.bmcs.size(), 2u);
+    ASSERT_EQ(server.bmcs.size(), 3u);
     EXPECT_EQ(server.bmcs[1].latencyMicroseconds, 0xFFFFFFFFu);
+}
+
+TEST(ServerFile, AClockThatIsNotGivenIsTheMachines) {
+    const ServerDescription server = ParseServer(kWhole, "s.json");
+    EXPECT_EQ(server.bmcs[0].selTime, 1709636400u);  // 11:00 UTC
+    EXPECT_EQ(server.bmcs[1].selTime, 1709640000u);
+    EXPECT_EQ(server.bmcs[2].selTime, 1709636400u - 90 * 60);  // it keeps local time
+    EXPECT_EQ(ParseServer("{\"bmcs\": [{}]}", "s.json").bmcs[0].selTime, std::nullopt);
+    const auto none = R"({"local_time": "20241305120000.000000+060", "bmcs": [{}]})";
+    EXPECT_EQ(ParseServer(none, "s.json").bmcs[0].selTime, std::nullopt);
 }
 
 TEST(ServerFile, RefusalNamesLineKeyAndReason) {
@@ -82,6 +99,32 @@ TEST(ServerFile, RefusalNamesLineKeyAndReason) {
          "14: bmcs[1].faults[2]: a fault is one of no_response, completion_code, truncate and "
          "data, not 2 of them"},
         {"\"3f\"", "\"40\"", "15: bmcs[1].faults[3].netfn: a NetFn has six bits, 00 to 3f"},
+        {"0e0f", "0e", "16: bmcs[1].guid: a GUID has 16 bytes, not 15"},
+        {"false,\n    \"sens", "0,\n    \"sens",
+         "17: bmcs[1].whole_sdr: must be true or false, not number"},
+        {"\"59\"", "\"0059\"",
+         "18: bmcs[1].sensors.30.reading: must be one byte in hexadecimal digits, not 2"},
+        {"\"lun\": 1", "\"lun\": 4", "18: bmcs[1].sensors.30.lun: must be 0 to 3, not 4"},
+        {"\"5a\"", "\"5\"",
+         "19: bmcs[1].sensors.30.factors.5: a reading is two hexadecimal digits"},
+        {"60 01 00 02 00 00 00", "60",
+         "19: bmcs[1].sensors.30.factors.5a: an answer with factors has 7 bytes, not 1"},
+        {"82/3/30", "82/4/30", "20: bmcs[1].sensors.82/4/30: a LUN is 0 to 3"},
+        {"82/3/30", "82/330", "20: bmcs[1].sensors.82/330: a sensor is NN or OWNER/LUN/NN"},
+        {"82/3/30", "8x/3/30",
+         "20: bmcs[1].sensors.8x/3/30: a sensor is NN or OWNER/LUN/NN; each of NN and OWNER is "
+         "two hexadecimal digits"},
+        {"82/3/30", "20/1/30", "18: bmcs[1].sensors.30: the same sensor stands here twice"},
+        {"\"5A\"", "\"5A\", \"lun\": 3",
+         "20: bmcs[1].sensors.82/3/30.lun: stands in the sensor's key already"},
+        {"01 80 01 02", "01 80 01",
+         "21: bmcs[1].pef.filters[0]: an event filter has 21 bytes, not 20"},
+        {"65535", "65536", "22: bmcs[2].sel.free_bytes: must be 0 to 65535, not 65536"},
+        {"-90", "-1441", "23: bmcs[2].sel.utc_offset_minutes: must be -1440 to 2047, not -1441"},
+        {"-90", "1441",
+         "23: bmcs[2].sel.utc_offset_minutes: must be -1440 to 1440, or 2047 for not known"},
+        {"-90", "4294967296",
+         "23: bmcs[2].sel.utc_offset_minutes: must be -1440 to 2047, not 4294967296"},
     };
     for (const auto& [from, to, message] : cases) {
         std::string text = kWhole;

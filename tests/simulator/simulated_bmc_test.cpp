@@ -8,7 +8,8 @@
 namespace ipmisim {
 namespace {
 
-/// Request: NetFn, command, data. Answer: completion code, data; "none" for no response.
+/// Request: NetFn (and, from bit 8 on, LUN), command, data. Answer: completion code, data; "none"
+/// for no response.
 struct Case {
     const char* request;
     const char* answer;
@@ -16,10 +17,10 @@ struct Case {
 
 void Expect(SimulatedBmc& bmc, std::initializer_list<Case> cases) {
     for (const Case& c : cases) {
-        Bytes request;
         const auto values = ipmisel::ScanHexRow(c.request, 16);
-        request.assign(values->begin(), values->end());
-        const auto answer = bmc.Execute(request[0], 0, request[1], std::span(request).subspan(2));
+        const Bytes request(values->begin(), values->end());
+        const auto lun = static_cast<std::uint8_t>(values->front() >> 8);
+        const auto answer = bmc.Execute(request[0], lun, request[1], std::span(request).subspan(2));
         std::string text = answer ? DumpBytes(*answer, ipmisel::Digits::kLowerHex) : "none ";
         text.pop_back();
         EXPECT_EQ(text, c.answer) << c.request;
@@ -105,6 +106,66 @@ TEST(SimulatedBmc, OtherCommandsAnswerWhatIsDescribed) {
                     {"0a 5b", "c1"},
                     {"2e 00 99", "00 56"},
                 });
+}
+
+TEST(SimulatedBmc, SensorsAreTheBmcsOwnAtTheLunAskedFor) {
+    auto bmc = Bmc(R"({"sensors": {
+        "30": {"reading": "59", "states": "c0 c1 c2", "thresholds": "3f 05 0a 0f 50 5a 64",
+               "factors": {"59": "60 01 02 03 04 05 06"}},
+        "20/2/30": {"reading": "77"}, "82/0/31": {"reading": "88"}, "33": {"states": "40"},
+        "34": {"thresholds": "00"}, "35": {"reading": "99", "states": ""}}})");
+    Expect(bmc, {{"04 2d 30", "00 59 c0 c1 c2"},
+                 {"204 2d 30", "00 77 c0 00 80"},
+                 {"104 2d 30", "cb"},
+                 {"04 2d 31", "cb"},  // the sensor of another controller
+                 {"04 2d 33", "00 00 40"},
+                 {"04 2d 34", "cb"},
+                 {"04 2d 35", "00 99"},
+                 {"04 27 30", "00 3f 05 0a 0f 50 5a 64"},
+                 {"204 27 30", "cb"},
+                 {"04 23 30 59", "00 60 01 02 03 04 05 06"},
+                 {"04 23 30 5a", "cb"},
+                 {"04 23 32 59", "cb"},
+                 {"04 2d", "c7"}});
+}
+
+TEST(SimulatedBmc, TheControllerTellsOfItself) {
+    auto bmc = Bmc(R"({"guid": "000102030405060708090a0b0c0d0e0f", "chassis_status": "01 02 03",
+        "self_test": "57 04", "sel": {"free_bytes": 513, "last_addition": 67305985,
+        "last_erase": 134678021, "overflow": true, "utc_offset_minutes": -90},
+        "pef": {"filters": ["07 80 01 02 10 ffff 01 ff 01 00 02 000000 000000 000000",
+                            "02 00 01 02 10 ffff 01 ff 01 00 02 000000 000000 000000"]}})");
+    Expect(bmc, {{"06 37", "00 00 01 02 03 04 05 06 07 08 09 0a 0b 0c 0d 0e 0f"},
+                 {"06 04", "00 57 04"},
+                 {"00 01", "00 01 02 03"},
+                 {"0a 40", "00 51 00 00 01 02 01 02 03 04 05 06 07 08 80"},
+                 {"0a 5c", "00 a6 ff"},
+                 {"04 13 05 00 00", "00 11 02"},
+                 {"04 13 85 00 00", "00 11"},
+                 // The second entry, whatever number it has.
+                 {"04 13 06 02 00",
+                  "00 11 02 00 01 02 10 ff ff 01 ff 01 00 02 00 00 00 00 00 00 00 00 00"},
+                 {"04 13 06 00 00", "c9"},
+                 {"04 13 06 03 00", "c9"},
+                 {"04 13 01 00 00", "80"}});
+    auto silent = Bmc("{}");
+    Expect(silent, {{"06 37", "c1"},
+                    {"06 04", "c1"},
+                    {"00 01", "c1"},
+                    {"0a 5c", "c1"},
+                    {"04 13 05 00 00", "c1"},
+                    {"04 2d 30", "cb"},
+                    {"04 27 30", "cb"}});
+}
+
+TEST(SimulatedBmc, WholeSensorRecordsMayBeRefused) {
+    auto bmc = Bmc(R"({"whole_sdr": false, "sdr": {"records": [
+        "0100 51 01 12 010203040506070809 0a0b0c0d0e0f101112", "0200 51 02 00"]}})");
+    Expect(bmc, {{"0a 22", "00 01 00"},
+                 {"0a 23 0 0 0 0 0 ff", "ca"},
+                 {"0a 23 0 0 0 0 0 17", "ca"},
+                 {"0a 23 0 0 2 0 0 ff", "00 ff ff 02 00 51 02 00"},
+                 {"0a 23 1 0 1 0 14 16", "00 02 00 10 11 12"}});
 }
 
 TEST(SimulatedBmc, FaultsStrikeTheCallTheyName) {
