@@ -6,6 +6,7 @@
 #include <string_view>
 
 #include "base/bytes.h"
+#include "ipmi/smbios.h"
 
 namespace tqrhost {
 namespace {
@@ -13,7 +14,6 @@ namespace {
 using Bytes = std::span<const std::uint8_t>;
 
 constexpr std::size_t kHeaderLength = 4;
-constexpr std::uint8_t kSystemInformation = 1;
 constexpr std::uint8_t kEndOfTable = 127;
 
 bool StartsWith(Bytes bytes, std::string_view anchor) {
@@ -108,31 +108,14 @@ SmbiosStructures ReadSystemSmbios(const std::filesystem::path& folder) {
     return SplitSmbiosTable(table, *entryPoint->numberOfStructures);
 }
 
-std::string SmbiosString(Bytes structure, std::size_t number) {
-    if (number == 0 || structure.size() < 2 || structure[1] > structure.size()) return {};
-    Bytes strings = structure.subspan(structure[1]);
-    for (;;) {
-        const auto end = std::find(strings.begin(), strings.end(), 0);
-        // An empty string ends the set; one without its NUL is cut off.
-        if (end == strings.begin() || end == strings.end()) return {};
-        if (--number == 0) return {strings.begin(), end};
-        strings = strings.subspan(static_cast<std::size_t>(end - strings.begin()) + 1);
-    }
-}
-
-std::string SmbiosStringAt(Bytes structure, std::size_t offset) {
-    if (structure.size() < 2 || offset >= structure[1] || offset >= structure.size()) return {};
-    return SmbiosString(structure, structure[offset]);
-}
-
 std::string SystemProductName(const SmbiosStructures& structures) {
     constexpr std::size_t kProductName = 5;
     const auto system =
         std::find_if(structures.begin(), structures.end(), [](const auto& structure) {
-            return !structure.empty() && structure[0] == kSystemInformation;
+            return !structure.empty() && structure[0] == ipmi::kSmbiosSystem;
         });
     if (system == structures.end()) return {};
-    std::string name = SmbiosStringAt(*system, kProductName);
+    std::string name = ipmi::SmbiosStringAt(*system, kProductName);
     name.erase(name.find_last_not_of(' ') + 1);
     return name;
 }

@@ -11,9 +11,7 @@
 // SMBIOS as it stands in memory and in files (DSP0134): an entry point that says where the table is
 // and how long, and the table, structure after structure.
 //
-// A structure: type, length of the formatted area (4 at least), handle (16 bits), the rest of the
-// formatted area; then its strings, each with its NUL, and a further NUL. A structure without
-// strings ends with two NULs. Fields that name a string hold its number, from 1; 0 is none.
+// A structure (ipmi/smbios.h) without strings ends with two NULs.
 
 namespace tqrhost {
 
@@ -38,12 +36,6 @@ std::optional<SmbiosEntryPoint> ReadSmbiosEntryPoint(std::span<const std::uint8_
 /// The structures of the machine that this program runs on: files smbios_entry_point and DMI of
 /// `folder`, as Linux has them. Empty when they are not there, may not be read or make no sense.
 SmbiosStructures ReadSystemSmbios(const std::filesystem::path& folder = "/sys/firmware/dmi/tables");
-
-/// The number-th string (from 1) of a structure; empty when it has none of that number.
-std::string SmbiosString(std::span<const std::uint8_t> structure, std::size_t number);
-/// The string whose number stands at `offset` of the formatted area; empty when the area ends
-/// before it.
-std::string SmbiosStringAt(std::span<const std::uint8_t> structure, std::size_t offset);
 
 /// The product name of the system information structure (type 1) without trailing blanks.
 std::string SystemProductName(const SmbiosStructures& structures);

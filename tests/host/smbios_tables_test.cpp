@@ -74,20 +74,6 @@ TEST(SmbiosTable, ImpossibleLengthEndsTheWalk) {
     }
 }
 
-TEST(SmbiosTable, StringsAreFoundByTheirNumber) {
-    EXPECT_EQ(SmbiosString(kSystem, 1), "Acme");
-    EXPECT_EQ(SmbiosString(kSystem, 2), "S1  ");
-    for (const std::size_t number : {0, 3, 4, 255}) EXPECT_EQ(SmbiosString(kSystem, number), "");
-    EXPECT_EQ(SmbiosString(kBare, 1), "");
-    EXPECT_EQ(SmbiosStringAt(kSystem, 4), "Acme");
-    EXPECT_EQ(SmbiosStringAt(kSystem, 6), "");  // no string 9
-    EXPECT_EQ(SmbiosStringAt(kSystem, 8), "");  // past the formatted area
-    for (std::size_t length = 0; length < kSystem.size() - 1; ++length) {
-        const Bytes cut(kSystem.begin(), kSystem.begin() + static_cast<std::ptrdiff_t>(length));
-        EXPECT_EQ(SmbiosStringAt(cut, 5), "") << length;
-    }
-}
-
 TEST(SmbiosTable, ProductNameComesWithoutTrailingBlanks) {
     EXPECT_EQ(SystemProductName({{}, kBare, kSystem}), "S1");
     EXPECT_EQ(SystemProductName({kBare}), "");
