@@ -10,6 +10,7 @@
 #include <variant>
 #include <vector>
 
+#include "ipmi/entities.h"
 #include "ipmi/reading.h"
 #include "ipmi/sensor_reading.h"
 #include "ipmi/units.h"
@@ -54,7 +55,7 @@ struct Entity {
     std::uint8_t id = 0;
     std::uint8_t instance = 0;  ///< 7 bits
 
-    bool IsDeviceRelative() const { return instance >= 0x60; }
+    bool IsDeviceRelative() const { return ipmi::IsDeviceRelative(instance); }
     bool IsSpecified() const { return id != 0; }
     auto operator<=>(const Entity&) const = default;
 };

@@ -36,11 +36,10 @@ public:
     /// The interval between two values. CIM intervals carry no sign: the result is the absolute
     /// difference.
     TCIMDateTime operator-(const TCIMDateTime& other) const;
-
-private:
     /// Microseconds since 1970-01-01 UTC, or of the interval.
     std::int64_t TotalMicroseconds() const;
 
+private:
     bool interval_ = false;
     std::uint32_t year_ = 1970;  // points in time only
     std::uint32_t month_ = 1;    // points in time only

@@ -1,0 +1,96 @@
+#include "plugins/standard/repository_reader.h"
+
+#include <algorithm>
+#include <cstddef>
+
+#include "ipmi/sdr_record.h"
+
+namespace standard {
+namespace {
+
+/// What every controller can return at a time.
+constexpr std::size_t kPart = 16;
+/// A reservation that is lost again and again is not made for ever.
+constexpr int kMaxReservations = 4;
+constexpr std::size_t kNextIdLength = 2;
+
+bool CannotReturnSoMany(std::uint8_t completionCode) {
+    return completionCode == ipmi::kCannotReturnBytes ||
+           completionCode == ipmi::kRequestLengthInvalid ||
+           completionCode == ipmi::kRequestLengthExceeded;
+}
+
+/// The next record's ID, which stands before the bytes of a record.
+std::uint16_t NextId(const std::vector<std::uint8_t>& data) {
+    return static_cast<std::uint16_t>(data[0] | data[1] << 8);
+}
+
+std::size_t ClaimedLength(const std::vector<std::uint8_t>& record) {
+    const auto header = ipmi::SdrHeader::Parse(record);
+    return header ? ipmi::kSdrHeaderLength + header->length : 0;
+}
+
+}  // namespace
+
+std::optional<RepositoryReader::Record> RepositoryReader::Read(std::uint16_t recordId) {
+    std::optional<Record> record;
+    if (!inParts_) record = ReadWhole(recordId);
+    if (inParts_ && !record) {
+        const auto header = ReadPart(recordId, 0, ipmi::kSdrHeaderLength);
+        if (!header || !header->Completed() || header->data.size() < kNextIdLength) {
+            return std::nullopt;
+        }
+        record = Record{NextId(header->data),
+                        {header->data.begin() + kNextIdLength, header->data.end()}};
+    }
+    if (record && record->bytes.size() < ClaimedLength(record->bytes)) ReadRest(recordId, &*record);
+    return record;
+}
+
+std::optional<RepositoryReader::Record> RepositoryReader::ReadWhole(std::uint16_t recordId) {
+    const auto answer = controller_.Send(ipmi::GetSdr(recordId));
+    if (!answer) return std::nullopt;
+    if (CannotReturnSoMany(answer->completionCode)) {
+        inParts_ = true;
+        return std::nullopt;
+    }
+    if (!answer->Completed() || answer->data.size() < kNextIdLength) return std::nullopt;
+    return Record{NextId(answer->data), {answer->data.begin() + kNextIdLength, answer->data.end()}};
+}
+
+void RepositoryReader::ReadRest(std::uint16_t recordId, Record* record) {
+    // The ID in the record is the one to go on with: 0000h has only asked for the first.
+    if (recordId == ipmi::kFirstRecordId)
+        recordId = ipmi::SdrHeader::Parse(record->bytes)->recordId;
+    const std::size_t length = ClaimedLength(record->bytes);
+    while (record->bytes.size() < length) {
+        const std::size_t count = std::min(kPart, length - record->bytes.size());
+        const auto part = ReadPart(recordId, record->bytes.size(), count);
+        if (!part || !part->Completed() || part->data.size() <= kNextIdLength) return;
+        const auto bytes = part->data.begin() + kNextIdLength;
+        const auto end = std::min(part->data.end(), bytes + static_cast<std::ptrdiff_t>(count));
+        record->bytes.insert(record->bytes.end(), bytes, end);
+    }
+}
+
+std::optional<Answer> RepositoryReader::ReadPart(std::uint16_t recordId, std::size_t offset,
+                                                 std::size_t count) {
+    for (int i = 0; i < kMaxReservations; ++i) {
+        if (!reservation_ && !Reserve()) return std::nullopt;
+        auto answer =
+            controller_.Send(ipmi::GetSdr(recordId, static_cast<std::uint8_t>(offset),
+                                          static_cast<std::uint8_t>(count), *reservation_));
+        if (!answer || answer->completionCode != ipmi::kReservationCanceled) return answer;
+        reservation_.reset();
+    }
+    return std::nullopt;
+}
+
+bool RepositoryReader::Reserve() {
+    const auto data = controller_.Completed(ipmi::ReserveSdrRepository());
+    if (!data || data->size() < 2) return false;
+    reservation_ = static_cast<std::uint16_t>((*data)[0] | (*data)[1] << 8);
+    return true;
+}
+
+}  // namespace standard
