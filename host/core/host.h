@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <stdexcept>
@@ -11,6 +12,7 @@
 #include <vector>
 
 #include "host/core/sink.h"
+#include "tqr/classes.h"
 #include "tqr/log.h"
 #include "tqr/plugin.h"
 
@@ -40,6 +42,13 @@ using LogConsumer = std::function<void(NQORTQR20::ILogger::ETQRLogSeverity, std:
 void SetMachineFacts(MachineFacts facts);
 const MachineFacts& GetMachineFacts();
 
+/// What the user has set for the plug-ins: fdrGetOption and fdrGetSystemName answer from it.
+struct PluginSettings {
+    std::map<std::string, std::string, std::less<>> options;
+    std::vector<std::string> systemNames;  ///< by node
+};
+void SetPluginSettings(PluginSettings settings);
+
 /// Everybody who reads the log, each with the highest severity number that it wants.
 /// Returns an identity for RemoveLogConsumer.
 int AddLogConsumer(NQORTQR20::ILogger::ETQRLogSeverity upTo, LogConsumer consumer);
@@ -59,17 +68,38 @@ struct PluginInfo {
     std::string interfaceVersion;
 };
 
+/// A class as its plug-in declares it (tqr/classes.h).
+struct PropertyInfo {
+    std::string name;
+    NQORTQR20::fdrPropertyType type;
+    std::string description;
+};
+struct ClassInfo {
+    std::string name;
+    std::string description;
+    std::uint32_t marks;
+    std::string nodeProperty;  ///< empty: instances belong to no node
+    std::string exporter;      ///< empty: getData collects the class
+    std::vector<PropertyInfo> properties;
+
+    bool Is(NQORTQR20::fdrClassMark mark) const { return (marks & mark) != 0; }
+};
+
 /// A loaded and initialised plug-in; de-initialised and unloaded with the object.
 class Plugin {
 public:
-    /// Throws PluginError when the file cannot be loaded, does not register, or fails to
-    /// initialise.
+    /// Throws PluginError when the file cannot be loaded, does not register, fails to initialise,
+    /// needs another host interface, or declares its classes wrongly.
     explicit Plugin(const std::filesystem::path& file);
     ~Plugin();
     Plugin(const Plugin&) = delete;
     Plugin& operator=(const Plugin&) = delete;
 
     PluginInfo Info() const;
+    /// In the order of its table; none when it exports no table.
+    const std::vector<ClassInfo>& Classes() const;
+    /// Throws PluginError when a file that the plug-in needs is missing, unreadable or too large.
+    void CheckNeededFiles() const;
     /// One collection of the named classes; blocks until the pass is over.
     NQORTQR20::TTQRStatusCode Collect(const std::vector<std::string>& classNames,
                                       InstanceSink& sink);

@@ -1,3 +1,5 @@
+#include <cmath>
+#include <cstdint>
 #include <string>
 #include <utility>
 #include <vector>
@@ -40,6 +42,13 @@ bool TakesProperty(const fdriIOHandle* output, const char* name) {
     return IsLive(output) && output->open && name != nullptr;
 }
 
+template <typename Value>
+TTQRStatusCode AddValue(fdriIOHandle* output, const char* name, Value value) {
+    return Guarded([&] {
+        return TakesProperty(output, name) && output->sink.AddProperty(name, std::move(value));
+    });
+}
+
 }  // namespace
 
 TTQRStatusCode fdrGetInstance(fdriIOHandle* output, const char* className) {
@@ -55,6 +64,37 @@ TTQRStatusCode fdrAddProperty(fdriIOHandle* output, const char* name, const char
     return Guarded([&] {
         return TakesProperty(output, name) && value != nullptr &&
                output->sink.AddProperty(name, std::string(value));
+    });
+}
+
+TTQRStatusCode fdrAddIntegerProperty(fdriIOHandle* output, const char* name, std::int64_t value) {
+    return AddValue(output, name, value);
+}
+
+TTQRStatusCode fdrAddRealProperty(fdriIOHandle* output, const char* name, double value) {
+    if (!std::isfinite(value)) return {kStatusFailed};
+    return AddValue(output, name, value);
+}
+
+TTQRStatusCode fdrAddBooleanProperty(fdriIOHandle* output, const char* name, bool value) {
+    return AddValue(output, name, value);
+}
+
+TTQRStatusCode fdrAddTimeProperty(fdriIOHandle* output, const char* name, std::int64_t seconds) {
+    if (seconds < tqrhost::kFirstTime || seconds > tqrhost::kLastTime) return {kStatusFailed};
+    return AddValue(output, name, tqrhost::Time{seconds});
+}
+
+TTQRStatusCode fdrAddTextListProperty(fdriIOHandle* output, const char* name,
+                                      const char* const* texts, std::uint32_t count) {
+    return Guarded([&] {
+        if (!TakesProperty(output, name) || (texts == nullptr && count > 0)) return false;
+        std::vector<std::string> list;
+        for (std::uint32_t i = 0; i < count; ++i) {
+            if (texts[i] == nullptr) return false;
+            list.emplace_back(texts[i]);
+        }
+        return output->sink.AddProperty(name, list);
     });
 }
 

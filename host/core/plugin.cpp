@@ -1,8 +1,18 @@
 #include <dlfcn.h>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
+#include <array>
+#include <cerrno>
+#include <charconv>
+#include <cstdio>
+#include <cstring>
 #include <map>
+#include <span>
 #include <string>
+#include <string_view>
 #include <system_error>
 #include <utility>
 
@@ -47,6 +57,11 @@ std::map<void*, fdrPluginCallbacks>& Residents() {
     return residents;
 }
 
+tqrhost::PluginSettings& Settings() {
+    static tqrhost::PluginSettings settings;
+    return settings;
+}
+
 std::string PathOfPlugin(const std::filesystem::path& folder) {
     return (folder / "ipmisel").string();
 }
@@ -64,6 +79,58 @@ Result Contained(Call call, Result failed) {
     NQORTQR20::fdrWriteLog(NQORTQR20::ILogger::kError,
                            ("Plug-in ended by an exception: " + what).c_str());
     return failed;
+}
+
+/// "major.minor"; empty when the text is none.
+std::optional<std::pair<unsigned, unsigned>> ParseVersion(std::string_view text) {
+    unsigned major = 0;
+    unsigned minor = 0;
+    const char* const end = text.data() + text.size();
+    const auto first = std::from_chars(text.data(), end, major);
+    if (first.ec != std::errc() || first.ptr == end || *first.ptr != '.') return std::nullopt;
+    const auto second = std::from_chars(first.ptr + 1, end, minor);
+    if (second.ec != std::errc() || second.ptr != end) return std::nullopt;
+    return std::pair(major, minor);
+}
+
+/// Whether this host has what a plug-in of that interface version uses.
+bool IsSupported(std::string_view version) {
+    const auto own = ParseVersion(NQORTQR20::fdrPluginInterfaceVersion);
+    const auto wanted = ParseVersion(version);
+    return wanted && wanted->first == own->first && wanted->second <= own->second;
+}
+
+/// What a plug-in's table says, copied. Empty when the table is not as tqr/classes.h has it.
+std::optional<std::vector<tqrhost::ClassInfo>> CopyClasses(const NQORTQR20::fdrClassTable& table) {
+    using NQORTQR20::fdrPropertyType;
+    const auto text = [](const char* value) { return std::string(value == nullptr ? "" : value); };
+    if (table.size != sizeof table || table.classInfoSize != sizeof(NQORTQR20::fdrClassInfo) ||
+        (table.classes == nullptr && table.classCount > 0) ||
+        (table.neededFiles == nullptr && table.neededFileCount > 0)) {
+        return std::nullopt;
+    }
+    std::vector<tqrhost::ClassInfo> classes;
+    for (const NQORTQR20::fdrClassInfo& row : std::span(table.classes, table.classCount)) {
+        tqrhost::ClassInfo& copy = classes.emplace_back();
+        copy.name = text(row.name);
+        copy.description = text(row.description);
+        copy.marks = row.marks;
+        copy.nodeProperty = text(row.nodeProperty);
+        copy.exporter = text(row.exporter);
+        if (copy.name.empty() || copy.description.empty() ||
+            (row.properties == nullptr && row.propertyCount > 0) ||
+            (copy.Is(NQORTQR20::kPerLogRecord) && copy.nodeProperty.empty())) {
+            return std::nullopt;
+        }
+        for (const auto& property : std::span(row.properties, row.propertyCount)) {
+            if (property.name == nullptr || property.description == nullptr ||
+                property.type > fdrPropertyType::kReference) {
+                return std::nullopt;
+            }
+            copy.properties.push_back({property.name, property.type, property.description});
+        }
+    }
+    return classes;
 }
 
 std::string LoaderMessage() {
@@ -114,9 +181,30 @@ TTQRStatusCode fdrShowNotice(TCPluginCallbacks* context, const char* plainText,
     return {kStatusOk};
 }
 
+TTQRStatusCode fdrGetOption(TCPluginCallbacks* context, const char* name, const char** value) {
+    if (value == nullptr) return {kStatusFailed};
+    *value = nullptr;
+    if (!tqrhost::Live<TCPluginCallbacks>::Is(context) || name == nullptr) return {kStatusFailed};
+    const auto option = Settings().options.find(std::string_view(name));
+    if (option != Settings().options.end()) *value = option->second.c_str();
+    return {kStatusOk};
+}
+
+TTQRStatusCode fdrGetSystemName(TCPluginCallbacks* context, int node, const char** name) {
+    if (name == nullptr) return {kStatusFailed};
+    *name = nullptr;
+    if (!tqrhost::Live<TCPluginCallbacks>::Is(context)) return {kStatusFailed};
+    const auto& names = Settings().systemNames;
+    const auto index = static_cast<std::size_t>(node);
+    if (node >= 0 && index < names.size()) *name = names[index].c_str();
+    return {kStatusOk};
+}
+
 }  // namespace NQORTQR20
 
 namespace tqrhost {
+
+void SetPluginSettings(PluginSettings settings) { Settings() = std::move(settings); }
 
 std::vector<Notice> TakeNotices() { return std::exchange(Notices(), {}); }
 
@@ -125,6 +213,8 @@ struct Plugin::Impl {
     std::unique_ptr<TCPluginCallbacks> context;
     Library library;
     std::optional<fdrPluginCallbacks> callbacks;  ///< once it has registered
+    std::vector<ClassInfo> classes;
+    std::vector<std::pair<std::string, std::uint64_t>> neededFiles;  ///< name and greatest size
 
     Impl() = default;
     Impl(const Impl&) = delete;
@@ -165,12 +255,58 @@ Plugin::Plugin(const std::filesystem::path& file) : impl_(std::make_unique<Impl>
         fail("it does not register itself with this host; name a plug-in with --plugin");
     }
 
+    const std::string version = Info().interfaceVersion;
+    if (!IsSupported(version)) {
+        fail("it is made for version \"" + version +
+             "\" of the plug-in interface and this host has " +
+             NQORTQR20::fdrPluginInterfaceVersion + "; name one that fits with --plugin");
+    }
+    if (const auto* const table =
+            static_cast<const NQORTQR20::fdrClassTable*>(Symbol("fdrPluginClasses"))) {
+        auto classes = CopyClasses(*table);
+        if (!classes) fail("its table of classes is damaged; reinstall it");
+        impl_->classes = std::move(*classes);
+        for (const auto& needed : std::span(table->neededFiles, table->neededFileCount)) {
+            if (needed.name == nullptr) fail("its table of classes is damaged; reinstall it");
+            impl_->neededFiles.emplace_back(needed.name, needed.maxSize);
+        }
+    }
+
     const TTQRStatusCode status =
         Contained([&] { return impl_->callbacks->initialise(impl_->context.get()); },
                   TTQRStatusCode{kStatusFailed});
     if (status.code != kStatusOk) {
         fail("it failed to initialise, status " + std::to_string(status.code) + " (" +
              status.TranslateStatusCode() + "); its log lines say more (--log-level trace)");
+    }
+}
+
+const std::vector<ClassInfo>& Plugin::Classes() const { return impl_->classes; }
+
+void Plugin::CheckNeededFiles() const {
+    for (const auto& [name, maxSize] : impl_->neededFiles) {
+        const auto path = impl_->file.parent_path() / name;
+        const auto fail = [&](const std::string& why) {
+            throw PluginError("cannot use " + path.string() + ", which the plug-in " +
+                              impl_->file.filename().string() + " needs: " + why +
+                              "; reinstall it");
+        };
+        // Not blocking: a pipe in the file's place must not hold the collection up.
+        const int descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+        const std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(
+            descriptor < 0 ? nullptr : fdopen(descriptor, "r"), std::fclose);
+        if (!file) fail(std::strerror(errno));
+        struct stat status {};
+        if (fstat(descriptor, &status) != 0) fail(std::strerror(errno));
+        if (!S_ISREG(status.st_mode)) fail("it is no file");
+        // Read to its end: a disk may fail in the middle.
+        std::array<char, 1 << 14> part;
+        std::uint64_t size = 0;
+        while (const std::size_t count = std::fread(part.data(), 1, part.size(), file.get())) {
+            size += count;
+            if (size > maxSize) fail("it has more than " + std::to_string(maxSize) + " bytes");
+        }
+        if (std::ferror(file.get()) != 0) fail(std::strerror(errno));
     }
 }
 

@@ -15,7 +15,19 @@ struct ObjectPath {
     std::vector<std::pair<std::string, std::string>> keys;
 };
 
-using PropertyValue = std::variant<std::string, std::vector<std::uint8_t>, ObjectPath>;
+/// A point in time.
+struct Time {
+    std::int64_t seconds = 0;  ///< since 1970-01-01 UTC; within the years 1 to 9999
+    bool operator==(const Time&) const = default;
+};
+constexpr std::int64_t kFirstTime = -62135596800;  ///< 0001-01-01T00:00:00Z
+constexpr std::int64_t kLastTime = 253402300799;   ///< 9999-12-31T23:59:59Z
+/// RFC 3339 in UTC: "2026-03-09T02:31:44Z".
+std::string TimeText(Time time);
+
+/// Reals are finite.
+using PropertyValue = std::variant<std::string, std::vector<std::uint8_t>, ObjectPath, std::int64_t,
+                                   double, bool, Time, std::vector<std::string>>;
 
 /// Where the instances of a collection go, piece by piece, so that the host holds no more than the
 /// open instance. An instance counts from CloseInstance on; one that is opened while another is

@@ -16,8 +16,10 @@ struct TCIMReference;           ///< an object path under construction
 struct TCIMValueArray;          ///< an array value under construction
 struct TPluginManagerProvider;  ///< what the SMBIOS reader needs of the host
 
-/// Version of this interface; a plug-in states the one that it was built against.
-inline constexpr const char* fdrPluginInterfaceVersion = "1.0";
+/// Version of this interface. A plug-in states the oldest one that has what it uses; the host
+/// refuses one of another major or a newer minor version. 1.1 has the typed properties,
+/// fdrGetOption and fdrGetSystemName in addition.
+inline constexpr const char* fdrPluginInterfaceVersion = "1.1";
 
 /// Answer of the information callback. The texts are static texts of the plug-in.
 struct fdrPluginInfo {
@@ -51,10 +53,27 @@ TTQRStatusCode fdrGetPluginPath(TCPluginCallbacks* context, const char** path);
 /// and with hyperlink mark-up (null where there is none).
 TTQRStatusCode fdrShowNotice(TCPluginCallbacks* context, const char* plainText,
                              const char* markupText);
+/// What the user has set for the plug-ins, by name; *value is null when nothing is set, and lives
+/// as long as the collection. Since 1.1. The options:
+///   "severities"  the text of the file of the user's own severities
+TTQRStatusCode fdrGetOption(TCPluginCallbacks* context, const char* name, const char** value);
+/// How the user calls the system of a node (from 0): what --name says, else the host of the source.
+/// *name is null for a node that there is not, and lives as long as the collection. Since 1.1.
+TTQRStatusCode fdrGetSystemName(TCPluginCallbacks* context, int node, const char** name);
 
 /// Opens an instance; one that is still open is dropped.
 TTQRStatusCode fdrGetInstance(fdriIOHandle* output, const char* className);
 TTQRStatusCode fdrAddProperty(fdriIOHandle* output, const char* name, const char* value);
+// Typed properties; since 1.1.
+TTQRStatusCode fdrAddIntegerProperty(fdriIOHandle* output, const char* name, std::int64_t value);
+/// Refuses what is no number (an infinity, a NaN).
+TTQRStatusCode fdrAddRealProperty(fdriIOHandle* output, const char* name, double value);
+TTQRStatusCode fdrAddBooleanProperty(fdriIOHandle* output, const char* name, bool value);
+/// A point in time in seconds since 1970-01-01 UTC, of the years 1 to 9999.
+TTQRStatusCode fdrAddTimeProperty(fdriIOHandle* output, const char* name, std::int64_t seconds);
+/// `texts` may be null when there is none; none of the texts is.
+TTQRStatusCode fdrAddTextListProperty(fdriIOHandle* output, const char* name,
+                                      const char* const* texts, std::uint32_t count);
 /// Closes the open instance and hands it on.
 TTQRStatusCode fdrAddInstance(fdriIOHandle* output);
 

@@ -3,11 +3,13 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <charconv>
 #include <chrono>
 #include <csignal>
 #include <cstdint>
-#include <cstdlib>
 #include <filesystem>
+#include <limits>
+#include <map>
 #include <memory>
 #include <optional>
 #include <string>
@@ -17,11 +19,11 @@
 #include <vector>
 
 #include "host/core/host.h"
+#include "host/core/plugin_set.h"
 #include "host/spdriver/capture.h"
 #include "host/spdriver/completeness.h"
 #include "host/spdriver/source.h"
 #include "host/spdriver/stop.h"
-#include "program/commands/classes.h"
 #include "program/commands/failure.h"
 #include "program/commands/log_lines.h"
 #include "program/commands/password.h"
@@ -29,21 +31,59 @@
 #include "program/reports/output_file.h"
 #include "program/reports/report.h"
 #include "program/reports/terminal_text.h"
+#include "tqr/classes.h"
+#include "tqr/datetime.h"
 #include "tqr/splibrary.h"
 
 namespace ipmisel {
 namespace {
 
-constexpr std::string_view kInventory = "QORSG_IPMIFRU";
+constexpr std::int64_t kMicrosecondsPerSecond = 1000000;
 constexpr std::uint8_t kIpmiDeviceStructure = 38;  // SMBIOS, IPMI device information
+
+/// The node of an instance, from 0; empty when it belongs to none.
+std::optional<std::size_t> NodeOf(const tqrhost::Instance& instance, std::string_view property) {
+    for (const auto& [name, value] : instance.properties) {
+        if (property.empty() || name != property) continue;
+        std::int64_t node = 0;
+        if (const auto* const text = std::get_if<std::string>(&value)) {
+            std::from_chars(text->data(), text->data() + text->size(), node);
+        } else if (const auto* const number = std::get_if<std::int64_t>(&value)) {
+            node = *number;
+        }
+        if (node >= 1) return static_cast<std::size_t>(node - 1);
+    }
+    return std::nullopt;
+}
 
 /// Counts log records by node on their way to the report. Once the report cannot be written, it
 /// takes nothing any more.
 class ReportSink : public tqrhost::WholeInstanceSink {
 public:
-    ReportSink(ReportWriter& report, std::size_t nodes) : report_(report), exported_(nodes) {}
+    ReportSink(ReportWriter& report, const tqrhost::PluginSet& plugins,
+               const std::vector<std::string>& wanted, std::size_t nodes)
+        : report_(report), nodes_(nodes) {
+        for (const std::string& name : wanted) {
+            const tqrhost::ClassInfo* const info = plugins.FindClass(name);
+            if (info == nullptr || !info->Is(NQORTQR20::kPerLogRecord)) continue;
+            Counted& counted = counted_[name];
+            counted.nodeProperty = info->nodeProperty;
+            counted.byNode.resize(nodes);
+            ++counted.times;
+        }
+    }
 
-    const std::vector<unsigned>& Exported() const { return exported_; }
+    /// As ReportEnd::exported.
+    std::vector<unsigned> Exported() const {
+        if (counted_.empty()) return {};
+        std::vector<unsigned> fewest(nodes_, std::numeric_limits<unsigned>::max());
+        for (const auto& [name, counted] : counted_) {
+            for (std::size_t node = 0; node < nodes_; ++node) {
+                fewest[node] = std::min(fewest[node], counted.byNode[node] / counted.times);
+            }
+        }
+        return fewest;
+    }
     /// Throws what has kept the report from being written. No exception goes through the plug-in.
     void Check() const {
         if (failure_) throw Failure(*failure_);
@@ -58,30 +98,31 @@ protected:
             failure_ = failure;
             return false;
         }
-        if (instance.className == "QORSG_IPMILogRecord") Count(instance);
+        if (const auto counted = counted_.find(instance.className); counted != counted_.end()) {
+            const auto node = NodeOf(instance, counted->second.nodeProperty);
+            if (node && *node < nodes_) ++counted->second.byNode[*node];
+        }
         return true;
     }
 
 private:
-    void Count(const tqrhost::Instance& instance) {
-        for (const auto& [name, value] : instance.properties) {
-            const auto* const text = std::get_if<std::string>(&value);
-            if (name != "SourceNode" || text == nullptr) continue;
-            const std::size_t node = std::strtoul(text->c_str(), nullptr, 10);
-            if (node >= 1 && node <= exported_.size()) ++exported_[node - 1];
-        }
-    }
+    /// A class with one instance for each log record.
+    struct Counted {
+        std::string nodeProperty;
+        std::vector<unsigned> byNode;
+        unsigned times = 0;  ///< that the user named it: it is collected so often
+    };
 
     ReportWriter& report_;
-    std::vector<unsigned> exported_;
+    std::size_t nodes_;
+    std::map<std::string, Counted, std::less<>> counted_;
     std::optional<Failure> failure_;
 };
 
-std::filesystem::path PluginFile(const Options& options) {
-    if (options.plugin) return *options.plugin;
+std::filesystem::path PluginFolder() {
     std::error_code error;
     const auto program = std::filesystem::read_symlink("/proc/self/exe", error);
-    return program.parent_path().parent_path() / "lib/ipmisel/libipmisel.pi";
+    return program.parent_path().parent_path() / "lib/ipmisel";
 }
 
 std::string Joined(const std::vector<std::string>& parts) {
@@ -107,49 +148,7 @@ struct Machine {
     Machine& operator=(const Machine&) = delete;
 };
 
-/// What is asked for, as the plug-in is called for it.
-struct Calls {
-    std::vector<std::vector<std::string>> passes;
-    std::vector<const char*> exporters;  ///< of the classes that no pass yields
-};
-
-/// The plug-in writes the inventory when a pass is over: what is to follow it takes another pass.
-Calls CallsFor(const std::vector<std::string>& wanted) {
-    Calls calls;
-    bool begun = false;
-    for (const std::string& name : wanted) {
-        const auto known = KnownClasses();
-        const auto info = std::find_if(known.begin(), known.end(),
-                                       [&name](const ClassInfo& c) { return c.name == name; });
-        if (info != known.end() && info->exporter != nullptr) {
-            calls.exporters.push_back(info->exporter);
-            continue;
-        }
-        if (!begun) calls.passes.emplace_back();
-        calls.passes.back().push_back(name);
-        begun = name != kInventory;
-    }
-    return calls;
-}
-
-/// The status is that of the first call that did not end well.
-NQORTQR20::TTQRStatusCode RunClasses(tqrhost::Plugin& plugin,
-                                     const std::vector<std::string>& wanted,
-                                     tqrhost::InstanceSink& sink) {
-    const Calls calls = CallsFor(wanted);
-    NQORTQR20::TTQRStatusCode status{NQORTQR20::kStatusOk};
-    const auto note = [&status](NQORTQR20::TTQRStatusCode ended) {
-        if (status.code == NQORTQR20::kStatusOk) status = ended;
-    };
-    for (const std::vector<std::string>& pass : calls.passes) {
-        if (tqrhost::Stopped() == tqrhost::StopReason::kNone) note(plugin.Collect(pass, sink));
-    }
-    if (!HasBmc()) return status;
-    for (const char* exporter : calls.exporters) {
-        note({plugin.RunExporter(exporter, sink).value_or(NQORTQR20::kStatusFailed)});
-    }
-    return status;
-}
+bool GoesOn() { return tqrhost::Stopped() == tqrhost::StopReason::kNone; }
 
 tqrhost::Source OpenSource(const Options& options) {
     tqrhost::SourceOptions access = options.source;
@@ -173,12 +172,48 @@ std::shared_ptr<tqrhost::CaptureWriter> Record(const Options& options, tqrhost::
     }
 }
 
-std::unique_ptr<tqrhost::Plugin> LoadPlugin(const Options& options) {
+/// Does something with plug-ins; what they are refused for is wrong usage.
+template <typename Work>
+auto WithPlugins(Work work) {
     try {
-        return std::make_unique<tqrhost::Plugin>(PluginFile(options));
+        return work();
     } catch (const tqrhost::PluginError& error) {
         throw Failure(kExitUsage, error.what());
     }
+}
+
+std::unique_ptr<tqrhost::PluginSet> LoadPlugins(const Options& options) {
+    return WithPlugins([&] {
+        return std::make_unique<tqrhost::PluginSet>(
+            PluginFolder(),
+            std::vector<std::filesystem::path>(options.plugins.begin(), options.plugins.end()));
+    });
+}
+
+/// The classes that are to be collected.
+std::vector<std::string> WantedClasses(const Options& options, const tqrhost::PluginSet& plugins) {
+    for (const std::string& name : options.classes) {
+        if (plugins.FindClass(name) != nullptr) continue;
+        std::string known;
+        for (const tqrhost::ClassInfo& info : plugins.Classes()) {
+            known += (known.empty() ? "" : ", ") + info.name;
+        }
+        throw Failure(kExitUsage, "there is no class \"" + name + "\"; use one of " + known);
+    }
+    return options.classes.empty() ? plugins.DefaultClasses() : options.classes;
+}
+
+/// One for each node. The nodes of lan: sources follow each other as they were named.
+std::vector<SystemInfo> SystemsOf(const Options& options, std::size_t nodes) {
+    std::vector<SystemInfo> systems(nodes);
+    for (std::size_t node = 0; node < nodes; ++node) {
+        const bool oneEach = options.sources.size() == nodes;
+        SystemInfo& system = systems[node];
+        system.source = options.sources[oneEach ? node : 0];
+        const auto colon = system.source.find(':');
+        system.name = colon == std::string::npos ? system.source : system.source.substr(colon + 1);
+    }
+    return systems;
 }
 
 /// Notices that the plug-in had for whoever runs the collection, said and kept.
@@ -197,8 +232,10 @@ std::vector<std::string> TellNotices() {
 }
 
 int CollectTo(const Options& options, OutputFile& output) {
-    // The plug-in first: without it nobody is asked for a password.
-    const std::unique_ptr<tqrhost::Plugin> plugin = LoadPlugin(options);
+    // The plug-ins first: without them nobody is asked for a password.
+    const std::unique_ptr<tqrhost::PluginSet> plugins = LoadPlugins(options);
+    const std::vector<std::string> wanted = WantedClasses(options, *plugins);
+    WithPlugins([&] { plugins->CheckNeededFiles(wanted); });
     tqrhost::Source source = OpenSource(options);
     const std::shared_ptr<tqrhost::CaptureWriter> capture = Record(options, source);
     const Machine machine(std::move(source));
@@ -207,14 +244,26 @@ int CollectTo(const Options& options, OutputFile& output) {
     const auto format = std::find_if(formats.begin(), formats.end(),
                                      [&](const FormatInfo& f) { return f.name == options.format; });
     const auto nodes = static_cast<std::size_t>(NQORTQR20::SPLibrary::GetNumberBMCNode());
-    const std::unique_ptr<ReportWriter> report = format->make(
-        output,
-        {Joined(options.sources), plugin->Info(), tqrhost::GetMachineFacts().machineType, nodes});
-    ReportSink sink(*report, nodes);
+    const ReportHead head{.source = Joined(options.sources),
+                          .plugin = plugins->Plugins().front()->Info(),
+                          .machineType = tqrhost::GetMachineFacts().machineType,
+                          .nodes = nodes,
+                          .systems = SystemsOf(options, nodes),
+                          .collected = {NQORTQR20::TOSSpecific::GetLocalTime().TotalMicroseconds() /
+                                        kMicrosecondsPerSecond},
+                          .classes = plugins->Classes(),
+                          .wanted = wanted,
+                          .named = !options.classes.empty()};
+    tqrhost::PluginSettings settings;
+    for (const SystemInfo& system : head.systems) settings.systemNames.push_back(system.name);
+    tqrhost::SetPluginSettings(std::move(settings));
+    const std::unique_ptr<ReportWriter> report = format->make(output, head);
+    ReportSink sink(*report, *plugins, wanted, nodes);
+    tqrhost::CollectionPlan plan(*plugins, wanted);
     ReportEnd end;
     StopSignals::BeginCollecting();
-    end.status =
-        RunClasses(*plugin, options.classes.empty() ? DefaultClasses() : options.classes, sink);
+    plan.RunPasses(sink, GoesOn);
+    if (HasBmc()) plan.RunExporters(sink);
     StopSignals::EndCollecting();
     sink.Check();
     end.stopped = tqrhost::Stopped();
@@ -222,6 +271,9 @@ int CollectTo(const Options& options, OutputFile& output) {
     end.notices = TellNotices();
     end.completeness = tqrhost::GetCompleteness();
     end.exported = sink.Exported();
+    end.plugins = plan.Statuses();
+    end.status = plan.Status();
+    end.systems = head.systems;
     report->Finish(end);
     output.Commit();
     if (capture && !capture->Finish()) {
@@ -235,10 +287,13 @@ int CollectTo(const Options& options, OutputFile& output) {
 
 }  // namespace
 
-int ListClasses() {
+int ListClasses(const Options& options) {
+    const std::vector<tqrhost::ClassInfo> classes = LoadPlugins(options)->Classes();
+    std::size_t width = 0;
+    for (const tqrhost::ClassInfo& info : classes) width = std::max(width, info.name.size());
     OutputFile output(std::nullopt);
-    for (const ClassInfo& info : KnownClasses()) {
-        output.Write(Fit(info.name, 26) + "  " + std::string(info.description) + "\n");
+    for (const tqrhost::ClassInfo& info : classes) {
+        output.Write(Fit(info.name, width) + "  " + info.description + "\n");
     }
     output.Commit();
     return kExitCollected;
@@ -265,7 +320,8 @@ int RunProgram(int argc, char** argv) {
         int exitStatus = kExitCollected;
         const auto options = ParseOptions(argc, argv, &exitStatus);
         if (!options) return exitStatus;
-        return options->command == Options::Command::kClasses ? ListClasses() : Collect(*options);
+        return options->command == Options::Command::kClasses ? ListClasses(*options)
+                                                              : Collect(*options);
     } catch (const Failure& failure) {
         Say(failure.what());
         return failure.exitStatus;

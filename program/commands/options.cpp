@@ -6,7 +6,6 @@
 #include <string_view>
 
 #include "base/text.h"
-#include "program/commands/classes.h"
 #include "program/commands/failure.h"
 #include "program/reports/report.h"
 
@@ -109,8 +108,7 @@ std::optional<Options> ParseOptions(int argc, char** argv, int* exitStatus) {
         ->allow_extra_args(false);
     collect->add_option("--class", options.classes, "Class to collect; see \"ipmisel classes\"")
         ->type_name("CLASS")
-        ->allow_extra_args(false)
-        ->check(OneOf(Names(KnownClasses()), false));
+        ->allow_extra_args(false);
     collect->add_option("--format", options.format, "Form of the report")
         ->type_name("FORMAT")
         ->capture_default_str()
@@ -128,9 +126,12 @@ std::optional<Options> ParseOptions(int argc, char** argv, int* exitStatus) {
     collect->add_option("--log-file", options.logFile, "Every log line as a JSON object a line")
         ->type_name("FILE")
         ->check(FileName());
-    collect->add_option("--plugin", options.plugin, "Another plug-in file")
-        ->type_name("FILE")
-        ->check(FileName());
+    for (CLI::App* command : {collect, classes}) {
+        command->add_option("--plugin", options.plugins, "A plug-in file in addition")
+            ->type_name("FILE")
+            ->allow_extra_args(false)
+            ->check(FileName());
+    }
     collect->add_option("--user", options.source.user, "User name at the BMC")->type_name("NAME");
     collect
         ->add_option("--password-file", options.passwordFile,

@@ -20,7 +20,7 @@ struct Options {
     std::optional<std::string> record;
     NQORTQR20::ILogger::ETQRLogSeverity logLevel = NQORTQR20::ILogger::kWarning;
     std::optional<std::string> logFile;
-    std::optional<std::string> plugin;
+    std::vector<std::string> plugins;  ///< further plug-in files
     std::optional<std::string> passwordFile;
     std::optional<std::string> kgFile;
     tqrhost::SourceOptions source;

@@ -1,6 +1,7 @@
 #include "program/reports/json_text.h"
 
 #include <algorithm>
+#include <nlohmann/json.hpp>
 #include <type_traits>
 #include <variant>
 
@@ -60,11 +61,23 @@ void AppendPair(std::string& out, std::string_view name, std::string_view text, 
 
 void AppendValue(std::string& out, const std::string& text) { AppendText(out, text); }
 
-void AppendValue(std::string& out, const std::vector<std::uint8_t>& numbers) {
+void AppendValue(std::string& out, std::uint8_t byte) { out += std::to_string(byte); }
+
+void AppendValue(std::string& out, std::int64_t number) { out += std::to_string(number); }
+
+/// The shortest text that reads back as the same number; 20 stands as 20.0.
+void AppendValue(std::string& out, double number) { out += nlohmann::json(number).dump(); }
+
+void AppendValue(std::string& out, bool truth) { out += truth ? "true" : "false"; }
+
+void AppendValue(std::string& out, tqrhost::Time time) { AppendText(out, TimeText(time)); }
+
+template <typename Element>
+void AppendValue(std::string& out, const std::vector<Element>& list) {
     out += '[';
-    for (std::size_t i = 0; i < numbers.size(); ++i) {
+    for (std::size_t i = 0; i < list.size(); ++i) {
         if (i > 0) out += ", ";
-        out += std::to_string(numbers[i]);
+        AppendValue(out, list[i]);
     }
     out += ']';
 }

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "host/core/host.h"
+#include "host/core/plugin_set.h"
 #include "host/core/sink.h"
 #include "host/spdriver/completeness.h"
 #include "host/spdriver/stop.h"
@@ -15,20 +16,37 @@
 
 namespace ipmisel {
 
+/// A node as the user knows it, and what it said of itself; what is not known is empty.
+struct SystemInfo {
+    std::string name;    ///< what --name says, else the host of the source
+    std::string source;  ///< as the user wrote it
+    std::string guid, manufacturer, product, serial;
+};
+
 struct ReportHead {
     std::string source;
-    tqrhost::PluginInfo plugin;
+    tqrhost::PluginInfo plugin;  ///< the first one, of the described classes
     std::string machineType;
     std::size_t nodes = 0;
+    std::vector<SystemInfo> systems{};  ///< by node; as far as known before the collection
+    tqrhost::Time collected{};          ///< when the collection began
+    /// Of every plug-in: where the node of an instance stands, and what is wanted by default.
+    std::vector<tqrhost::ClassInfo> classes{};
+    std::vector<std::string> wanted{};  ///< the classes that are collected, in their order
+    bool named = false;                 ///< the user named them
 };
 
 struct ReportEnd {
-    NQORTQR20::TTQRStatusCode status{};
+    NQORTQR20::TTQRStatusCode status{};  ///< the first of the plug-ins' that is not 0
     bool hasBmc = true;
     tqrhost::StopReason stopped = tqrhost::StopReason::kNone;
     std::vector<std::string> notices;
     std::vector<tqrhost::NodeCompleteness> completeness;
-    std::vector<unsigned> exported;  ///< log records written, by node
+    /// Log records written, by node: the fewest of the classes with one instance for each record.
+    /// Empty when no such class was asked for.
+    std::vector<unsigned> exported;
+    std::vector<tqrhost::PluginStatus> plugins{};
+    std::vector<SystemInfo> systems{};  ///< by node, with what the controllers said of themselves
 };
 
 /// One report on its way out: the instances as they come, the rest at the end. Memory does not grow

@@ -73,21 +73,35 @@ std::string MessageOf(std::string message, const std::string& sensorType,
     return message;
 }
 
-std::string ValueText(const tqrhost::PropertyValue& value) {
-    if (const auto* text = std::get_if<std::string>(&value)) return *text;
-    if (const auto* bytes = std::get_if<std::vector<std::uint8_t>>(&value)) {
-        std::string text;
-        for (const std::uint8_t byte : *bytes) {
-            text += Format(text.empty() ? "%02x" : " %02x", byte);
-        }
-        return text;
-    }
-    const auto& path = std::get<tqrhost::ObjectPath>(value);
+std::string ShownValue(const std::string& text) { return text; }
+
+std::string ShownValue(const std::vector<std::uint8_t>& bytes) {
+    std::string text;
+    for (const std::uint8_t byte : bytes) text += Format(text.empty() ? "%02x" : " %02x", byte);
+    return text;
+}
+
+std::string ShownValue(const tqrhost::ObjectPath& path) {
     std::string text = path.className;
     for (const auto& [key, name] : path.keys) {
         text += Format(" %s=%s", key.c_str(), name.c_str());
     }
     return text;
+}
+
+std::string ShownValue(std::int64_t number) { return std::to_string(number); }
+std::string ShownValue(double number) { return Format("%g", number); }
+std::string ShownValue(bool truth) { return truth ? "yes" : "no"; }
+std::string ShownValue(tqrhost::Time time) { return tqrhost::TimeText(time); }
+
+std::string ShownValue(const std::vector<std::string>& texts) {
+    std::string text;
+    for (const std::string& each : texts) text += (text.empty() ? "" : "; ") + each;
+    return text;
+}
+
+std::string ValueText(const tqrhost::PropertyValue& value) {
+    return std::visit([](const auto& each) { return ShownValue(each); }, value);
 }
 
 class TableReport : public ReportWriter {

@@ -5,6 +5,7 @@
 
 #include "base/text.h"
 #include "plugins/ipmisel/pass/sections.h"
+#include "tests/support/described_classes.h"
 #include "tests/support/fru_inventory.h"
 #include "tests/support/machine_fixture.h"
 
@@ -136,14 +137,10 @@ protected:
             {"", std::make_unique<SpoiledBmc>(nodes[0], std::move(spoil), &pass.steps), nullptr});
         tqrhost::OpenMachine(std::move(source));
         const tqrhost::OutputHandle output(written);
-        const char* classes[] = {ipmisel::kBmcFirmwareClass,
-                                 ipmisel::kCpldFirmwareClass,
-                                 ipmisel::kFpgaFirmwareClass,
-                                 ipmisel::kBackplaneFirmwareClass,
-                                 "QORSG_IPMIFRU",
-                                 "QORSG_IPMILogRecord",
-                                 "QORSG_ZMCAuxDebugRecord"};
-        pass.status = IPMISELGetData(context.get(), output.get(), classes, std::size(classes)).code;
+        std::vector<const char*> classes = DefaultClasses();
+        pass.status = IPMISELGetData(context.get(), output.get(), classes.data(),
+                                     static_cast<int>(classes.size()))
+                          .code;
         pass.account = tqrhost::GetCompleteness().front();
         tqrhost::CloseMachine();
         pass.instances = written.instances;

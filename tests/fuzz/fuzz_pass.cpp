@@ -10,6 +10,7 @@
 #include <span>
 #include <string_view>
 #include <utility>
+#include <vector>
 
 #include "base/bytes.h"
 #include "host/core/host.h"
@@ -17,6 +18,7 @@
 #include "host/spdriver/source.h"
 #include "plugins/ipmisel/pass/entry_points.h"
 #include "plugins/ipmisel/pass/state.h"
+#include "tests/support/described_classes.h"
 
 namespace {
 
@@ -58,14 +60,6 @@ public:
     bool CloseInstance() override { return true; }
 };
 
-const char* kClasses[] = {"QORSG_IPMIFirmwareElement",
-                          "QORSG_CPLDFirmwareElement",
-                          "QORSG_FPGAFirmwareElement",
-                          "QORSG_AMIFirmwareElement",
-                          "QORSG_IPMIFRU",
-                          "QORSG_IPMILogRecord",
-                          "QORSG_ZMCAuxDebugRecord"};
-
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
@@ -93,7 +87,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     tqrhost::OpenMachine(std::move(source));
     NoSink sink;
     const tqrhost::OutputHandle output(sink);
-    IPMISELGetData(context.get(), output.get(), kClasses, static_cast<int>(std::size(kClasses)));
+    static std::vector<const char*> classes = ipmiseltest::DefaultClasses();
+    IPMISELGetData(context.get(), output.get(), classes.data(), static_cast<int>(classes.size()));
     tqrhost::CloseMachine();
     tqrhost::TakeNotices();
     return 0;

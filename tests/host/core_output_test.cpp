@@ -1,5 +1,7 @@
 #include <gmock/gmock.h>
 
+#include <cstdint>
+#include <limits>
 #include <stdexcept>
 
 #include "tests/support/bmc_fixture.h"
@@ -65,6 +67,54 @@ TEST_F(Output, PropertiesStandInTheOrderWritten) {
     const auto& path = std::get<ObjectPath>(properties[2].second);
     EXPECT_EQ(path.className, "Other");
     EXPECT_THAT(path.keys, ElementsAre(Pair("Key", "1"), Pair("Also", "2")));
+}
+
+TEST_F(Output, TypedPropertiesKeepTheirType) {
+    const char* const texts[] = {"a", ""};
+    fdrGetInstance(output, "Class");
+    for (const TTQRStatusCode answer :
+         {fdrAddIntegerProperty(output, "I", INT64_MIN), fdrAddRealProperty(output, "R", -0.25),
+          fdrAddBooleanProperty(output, "B", true), fdrAddTimeProperty(output, "T", -1),
+          fdrAddTextListProperty(output, "L", texts, 2),
+          fdrAddTextListProperty(output, "None", nullptr, 0), fdrAddInstance(output)}) {
+        EXPECT_EQ(answer.code, 0);
+    }
+    using Texts = std::vector<std::string>;
+    ASSERT_EQ(sink.instances.size(), 1U);
+    EXPECT_THAT(
+        sink.instances[0].properties,
+        ElementsAre(Pair("I", VariantWith<std::int64_t>(INT64_MIN)),
+                    Pair("R", VariantWith<double>(-0.25)), Pair("B", VariantWith<bool>(true)),
+                    Pair("T", VariantWith<Time>(Time{-1})),
+                    Pair("L", VariantWith<Texts>(Texts{"a", ""})),
+                    Pair("None", VariantWith<Texts>(Texts{}))));
+}
+
+TEST_F(Output, WhatIsNoValueOfItsTypeIsRefused) {
+    const char* const texts[] = {"a", nullptr};
+    fdrGetInstance(output, "Class");
+    for (const TTQRStatusCode answer :
+         {fdrAddRealProperty(output, "R", std::numeric_limits<double>::infinity()),
+          fdrAddRealProperty(output, "R", std::numeric_limits<double>::quiet_NaN()),
+          fdrAddTimeProperty(output, "T", kFirstTime - 1),
+          fdrAddTimeProperty(output, "T", kLastTime + 1),
+          fdrAddTextListProperty(output, "L", texts, 2),
+          fdrAddTextListProperty(output, "L", nullptr, 1),
+          fdrAddIntegerProperty(output, nullptr, 1), fdrAddBooleanProperty(nullptr, "B", true)}) {
+        EXPECT_EQ(answer.code, kStatusFailed);
+    }
+    EXPECT_EQ(fdrAddInstance(output).code, 0);
+    EXPECT_THAT(sink.instances[0].properties, IsEmpty());
+}
+
+TEST(TimeText, IsInUniversalTime) {
+    const struct {
+        std::int64_t seconds;
+        const char* text;
+    } cases[] = {{0, "1970-01-01T00:00:00Z"},          {1709213400, "2024-02-29T13:30:00Z"},
+                 {-1, "1969-12-31T23:59:59Z"},         {4294967296, "2106-02-07T06:28:16Z"},
+                 {kFirstTime, "0001-01-01T00:00:00Z"}, {kLastTime, "9999-12-31T23:59:59Z"}};
+    for (const auto& c : cases) EXPECT_EQ(TimeText({c.seconds}), c.text) << c.seconds;
 }
 
 TEST_F(Output, RefusalOfTheSinkIsTold) {

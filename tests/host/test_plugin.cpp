@@ -2,10 +2,19 @@
 #include <stdexcept>
 #include <string>
 
+#include "tqr/classes.h"
 #include "tqr/log.h"
 #include "tqr/plugin.h"
 
-// A plug-in for the tests of the host. What it is asked to do wrong stands in the environment.
+// A plug-in for the tests of the host. What it is asked to do wrong stands in the environment; its
+// table of classes, which is constant, in two macros.
+
+#ifndef TEST_CLASS
+#define TEST_CLASS "TEST_Record"
+#endif
+#ifndef TEST_CLASS_INFO_SIZE
+#define TEST_CLASS_INFO_SIZE sizeof(fdrClassInfo)
+#endif
 
 namespace {
 
@@ -42,7 +51,11 @@ TTQRStatusCode GetData(TCPluginCallbacks*, fdriIOHandle* output, const char** na
 
 fdrPluginInfo GetInfo(TCPluginCallbacks*) {
     MayThrow("throw");
-    return {"TEST", "1.2", nullptr, 0, 0};
+    const char* version = "1.0";
+    for (const char* other : {"1.1", "1.2", "2.0", "0.9", "1", "1.0x"}) {
+        if (Fault(other)) version = other;
+    }
+    return {"TEST", "1.2", Fault("no version") ? nullptr : version, 0, 0};
 }
 
 struct AtLoad {
@@ -67,7 +80,20 @@ struct AtLoad {
     }
 } atLoad;
 
+constexpr fdrPropertyInfo kProperties[] = {{"Node", fdrPropertyType::kInteger, "node, from 1"},
+                                           {"Text", fdrPropertyType::kText, "a text"}};
+constexpr fdrClassInfo kClasses[] = {
+    {"TEST_Last", "written at the end", kByDefault | kWrittenAtEnd, nullptr, nullptr, nullptr, 0},
+    {TEST_CLASS, "one per record", kByDefault | kPerLogRecord | kReadsLog, "Node", nullptr,
+     kProperties, 2},
+    {"TEST_Exported", "by a function", 0, nullptr, "TestExporter", nullptr, 0},
+};
+constexpr fdrNeededFile kNeededFiles[] = {{"test_plugin.needs", 10}};
+
 }  // namespace
+
+const NQORTQR20::fdrClassTable fdrPluginClasses{
+    sizeof(fdrClassTable), TEST_CLASS_INFO_SIZE, kClasses, 3, kNeededFiles, 1};
 
 extern "C" __attribute__((visibility("default"))) int TestExporter(
     NQORTQR20::TCPluginCallbacks* context, NQORTQR20::fdriIOHandle* output) {

@@ -14,9 +14,9 @@
 
 #include "host/spdriver/capture.h"
 #include "host/spdriver/stop.h"
-#include "program/commands/classes.h"
 #include "simulator/network_bmc.h"
 #include "simulator/server_file.h"
+#include "tests/support/described_classes.h"
 #include "tests/support/ipmi_sim.h"
 #include "tests/support/machine_fixture.h"
 #include "tests/support/run_program.h"
@@ -76,9 +76,7 @@ protected:
         ipmisel::ResetModuleState();
         IPMISELPluginInit(context.get());
         tqrhost::OpenMachine(std::move(source));
-        std::vector<const char*> classes;
-        const std::vector<std::string> names = ipmisel::DefaultClasses();
-        for (const std::string& name : names) classes.push_back(name.c_str());
+        std::vector<const char*> classes = ipmiseltest::DefaultClasses();
         ipmiseltest::InstanceRecorder report;
         const tqrhost::OutputHandle output(report);
         IPMISELGetData(context.get(), output.get(), classes.data(),

@@ -80,8 +80,8 @@ TEST_F(Collecting, FormatsAndPlacesAgree) {
 
 TEST_F(Collecting, ClassesComeInTheirOrderOrTheUsers) {
     const std::vector<std::string> listed = Lines(Run({"classes"}).out);
-    ASSERT_THAT(listed, SizeIs(9));
-    EXPECT_THAT(listed, Each(ContainsRegex("^QORSG_[A-Za-z]+  +[A-Za-z]")));
+    ASSERT_THAT(listed, SizeIs(Ge(9U)));
+    EXPECT_THAT(listed, Each(ContainsRegex("^[A-Z]+_[A-Za-z]+  +[A-Za-z]")));
     EXPECT_THAT(listed[0], StartsWith("QORSG_IPMIFirmwareElement "));
     EXPECT_THAT(listed[5], StartsWith("QORSG_IPMILogRecord "));
 

@@ -6,6 +6,7 @@
 #include <span>
 #include <string>
 
+#include "plugins/ipmisel/class_names.h"
 #include "plugins/ipmisel/export/clock_difference.h"
 #include "plugins/ipmisel/export/copied_text.h"
 #include "plugins/ipmisel/export/value_array.h"
@@ -17,8 +18,6 @@ using NQORTQR20::TCPluginCallbacks;
 
 namespace ipmisel {
 namespace {
-
-constexpr const char* kAuxDebugClass = "QORSG_ZMCAuxDebugRecord";
 
 constexpr std::array<unsigned char, 3> kSignature{0x4D, 0x4F, 0x00};
 constexpr std::uint8_t kDebugCode = 0x03;

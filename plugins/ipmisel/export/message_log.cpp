@@ -2,13 +2,15 @@
 
 #include <initializer_list>
 
+#include "plugins/ipmisel/class_names.h"
+
+using ipmisel::kMessageLogClass;
 using NQORTQR20::fdriIOHandle;
 using NQORTQR20::TCIMReference;
 using NQORTQR20::TCPluginCallbacks;
 
 namespace {
 
-constexpr const char* kLogClass = "QORSG_IPMIMessageLog";
 constexpr const char* kLogName = "MessageLogEntry";
 
 /// An object path with one key; given back to the host with the object.
@@ -34,21 +36,21 @@ private:
 }  // namespace
 
 int ExportMessageLog(TCPluginCallbacks* /*context*/, fdriIOHandle* output) {
-    NQORTQR20::fdrGetInstance(output, kLogClass);
-    NQORTQR20::fdrAddProperty(output, "CreationClassName", kLogClass);
+    NQORTQR20::fdrGetInstance(output, kMessageLogClass);
+    NQORTQR20::fdrAddProperty(output, "CreationClassName", kMessageLogClass);
     NQORTQR20::fdrAddProperty(output, "Name", kLogName);
     NQORTQR20::fdrAddInstance(output);
     return 0;
 }
 
 int ExportReferences(TCPluginCallbacks* /*context*/, fdriIOHandle* output) {
-    const Reference log(output, kLogClass, "Name", kLogName);
+    const Reference log(output, kMessageLogClass, "Name", kLogName);
     // Compatibility: the records 1 and 2 whatever the log holds
     // (MessageLog.TwoReferencesWhateverTheLogHolds).
     for (const char* recordId : {"1", "2"}) {
-        NQORTQR20::fdrGetInstance(output, "QORSG_IPMIRecordInLog");
+        NQORTQR20::fdrGetInstance(output, ipmisel::kRecordInLogClass);
         {
-            const Reference record(output, "QORSG_IPMILogRecord", "RecordID", recordId);
+            const Reference record(output, ipmisel::kLogRecordClass, "RecordID", recordId);
             NQORTQR20::fdrAddReferenceProperty(output, "MessageLog", log.get());
             NQORTQR20::fdrAddReferenceProperty(output, "LogRecord", record.get());
         }

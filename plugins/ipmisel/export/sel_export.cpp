@@ -6,6 +6,7 @@
 #include <string>
 
 #include "base/text.h"
+#include "plugins/ipmisel/class_names.h"
 #include "plugins/ipmisel/export/clock_difference.h"
 #include "plugins/ipmisel/export/copied_text.h"
 #include "plugins/ipmisel/export/event_message.h"
@@ -87,8 +88,8 @@ bool AddProperty(const Record& record, const char* name, const std::string& valu
 }
 
 bool AddHead(const Record& record) {
-    return Added(NQORTQR20::fdrGetInstance(record.exported.output, "QORSG_IPMILogRecord"),
-                 "QORSG_IPMILogRecord") &&
+    return Added(NQORTQR20::fdrGetInstance(record.exported.output, kLogRecordClass),
+                 kLogRecordClass) &&
            // Compatibility: the class name of the log, not of the record
            // (SelExport.WritesThePropertiesOfEachRecordTypeInOrder).
            AddProperty(record, "CreationClassName", "QORSG_IPMILog") &&

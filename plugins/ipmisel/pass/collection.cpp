@@ -101,7 +101,7 @@ public:
             instances.insert(instances.end(), ofNode.begin(), ofNode.end());
         }
         collector.SetFruInstances(std::move(instances));
-        collector.GenerateCIMInstance(output, kFruClass.data());
+        collector.GenerateCIMInstance(output, kFruClass);
     }
 };
 

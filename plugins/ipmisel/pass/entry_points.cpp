@@ -57,7 +57,7 @@ TTQRStatusCode IPMISELGetData(TCPluginCallbacks* context, fdriIOHandle* output,
 NQORTQR20::fdrPluginInfo IPMISELGetInfo(TCPluginCallbacks* /*context*/) {
     return {.name = "IPMISEL",
             .version = "1.0",
-            .interfaceVersion = NQORTQR20::fdrPluginInterfaceVersion,
+            .interfaceVersion = "1.0",  // nothing of a later one is used
             .reserved1 = 0,
             .reserved2 = 0};
 }

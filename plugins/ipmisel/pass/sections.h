@@ -6,6 +6,7 @@
 #include <string_view>
 #include <vector>
 
+#include "plugins/ipmisel/class_names.h"
 #include "plugins/ipmisel/inventory/vpd_entry.h"
 #include "plugins/ipmisel/records/sdr_entry.h"
 #include "plugins/ipmisel/records/sel_entry.h"
@@ -79,19 +80,13 @@ void CollectCpldFirmware(Node& node);
 void CollectFpgaFirmware(Node& node);
 void CollectBackplaneFirmware(Node& node);
 
-inline constexpr std::string_view kFruClass = "QORSG_IPMIFRU";
-inline constexpr const char* kBmcFirmwareClass = "QORSG_IPMIFirmwareElement";
-inline constexpr const char* kCpldFirmwareClass = "QORSG_CPLDFirmwareElement";
-inline constexpr const char* kFpgaFirmwareClass = "QORSG_FPGAFirmwareElement";
-inline constexpr const char* kBackplaneFirmwareClass = "QORSG_AMIFirmwareElement";
-
 struct Section {
     std::string_view className;
     void (*collect)(Node& node);
 };
 inline constexpr Section kSections[] = {
-    {"QORSG_IPMILogRecord", CollectLogRecords},
-    {"QORSG_ZMCAuxDebugRecord", CollectAuxDebugRecords},
+    {kLogRecordClass, CollectLogRecords},
+    {kAuxDebugClass, CollectAuxDebugRecords},
     {kFruClass, CollectFru},
     {kBmcFirmwareClass, CollectBmcFirmware},
     {kCpldFirmwareClass, CollectCpldFirmware},

@@ -44,7 +44,7 @@ private:
     }
 
     // Not set to zero: every text of every record comes through here.
-    std::array<char, 1 << 17> room_;
+    std::array<char, kMaxTextFile + 1> room_;
     std::size_t have_ = 0;
     bool read_ = false;
 };

@@ -13,6 +13,8 @@ namespace ipmisel {
 
 /// Room that the decoders give a numbered text, its final NUL included.
 constexpr std::size_t kTextCapacity = 256;
+/// Bytes that the file may have; a larger one is none of ours.
+constexpr std::size_t kMaxTextFile = (1 << 17) - 1;
 
 /// The text of a number in the contents of the file, as it comes out of a buffer of `capacity`
 /// bytes. Empty when no line has the number.

@@ -40,7 +40,8 @@ TEST_F(EntryPoints, AreAllThatTheLibraryExports) {
     EXPECT_THAT(names,
                 UnorderedElementsAre("IPMISELInit", "IPMISELPluginInit", "IPMISELPluginDeInit",
                                      "IPMISELGetData", "IPMISELGetInfo", "IPMISELGetStatus",
-                                     "IPMISELGetDataZero", "ExportMessageLog", "ExportReferences"));
+                                     "IPMISELGetDataZero", "ExportMessageLog", "ExportReferences",
+                                     "fdrPluginClasses"));
 }
 
 TEST_F(EntryPoints, RefusedRegistrationIsOneErrorLine) {
