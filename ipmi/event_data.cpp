@@ -181,6 +181,23 @@ std::string_view At(Words words, std::size_t index) {
 constexpr std::uint8_t High(std::uint8_t byte) { return byte >> 4; }
 constexpr std::uint8_t Low(std::uint8_t byte) { return byte & 0x0F; }
 
+constexpr std::uint8_t kSelClock = 0;
+constexpr std::uint8_t kSdrClock = 1;
+constexpr std::uint8_t kAfterSetting = 0x80;
+
+// Event data 2 of sensor type 12h, offset 5. Many controllers give it without saying so in event
+// data 1; it is believed where it is one of the values that the standard has.
+std::optional<std::uint8_t> ClockByte(const SelRecord& record) {
+    const std::uint8_t byte = record.data[1];
+    const DataUse use = UseOfData2(record);
+    const bool defined = (byte & ~kAfterSetting) <= kSdrClock;
+    if (use == DataUse::kExtension ? byte != kUnspecifiedByte
+                                   : use == DataUse::kUnused && defined) {
+        return byte;
+    }
+    return std::nullopt;
+}
+
 // One decoding: the record's bytes, and where what they mean goes. Each rule takes the byte that it
 // explains, so that a byte which is used and which no rule takes is the vendor's.
 class Decoding {
@@ -293,31 +310,37 @@ private:
     }
 
     void SystemEvent() {
-        if (!Extends2()) return;
         switch (record_.offset()) {
             case 3: {
+                if (!Extends2()) break;
                 const std::uint8_t byte = Data2();
                 Say(At(kAuxiliaryLogs, Low(byte)));
                 Say(At(kAuxiliaryLogActions, High(byte)));
                 break;
             }
             case 4: {
+                if (!Extends2()) break;
                 const std::uint8_t actions = Data2();
                 for (std::size_t bit = 0; bit < kPefActions.size(); ++bit) {
                     if ((actions >> bit & 1) != 0) Say(kPefActions[bit]);
                 }
                 break;
             }
-            case 5: {
-                const std::uint8_t byte = Data2();
-                if (Low(byte) == 0) Say("event log clock");
-                if (Low(byte) == 1) Say("sensor repository clock");
-                Say((byte & 0x80) != 0 ? "time after the change" : "time before the change");
+            case 5:
+                ClockSetting();
                 break;
-            }
             default:
                 break;
         }
+    }
+
+    void ClockSetting() {
+        const std::optional<std::uint8_t> byte = ClockByte(record_);
+        if (!byte) return;
+        taken2_ = true;
+        if (Low(*byte) == kSelClock) Say("event log clock");
+        if (Low(*byte) == kSdrClock) Say("sensor repository clock");
+        Say((*byte & kAfterSetting) != 0 ? "time after the change" : "time before the change");
     }
 
     void Slot() {
@@ -477,17 +500,14 @@ EventData DecodeEventData(const SelRecord& record) {
 
 std::optional<ClockSet> ClockSetOf(const SelRecord& record) {
     constexpr std::uint8_t kClockSet = 5;
-    constexpr std::uint8_t kSdrClock = 1;
     if (record.kind != RecordKind::kSensorEvent || record.eventType != kSensorSpecificEvents ||
         record.sensorType != sensor_type::kSystemEvent || record.offset() != kClockSet) {
         return std::nullopt;
     }
-    const std::uint8_t byte = record.data[1];
-    if (UseOfData2(record) != DataUse::kExtension || byte == kUnspecifiedByte) {
-        return ClockSet::kUnspecified;
-    }
-    if (Low(byte) == kSdrClock) return std::nullopt;
-    return (byte & 0x80) != 0 ? ClockSet::kSecond : ClockSet::kFirst;
+    const std::optional<std::uint8_t> byte = ClockByte(record);
+    if (!byte) return ClockSet::kUnspecified;
+    if (Low(*byte) == kSdrClock) return std::nullopt;
+    return (*byte & kAfterSetting) != 0 ? ClockSet::kSecond : ClockSet::kFirst;
 }
 
 }  // namespace ipmi

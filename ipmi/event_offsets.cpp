@@ -75,7 +75,7 @@ constexpr auto kPowerSupply =
         "power supply input out of range, but present", "configuration error",
         "power supply inactive (standby)");
 constexpr auto kPowerUnit =
-    Row("power off", "power cycle", "power down by the 240 VA limit", "power down by an interlock",
+    Row("power off", "power cycle", "power-down by the 240 VA limit", "power-down by an interlock",
         "power input lost (AC)", "soft power control failed, no reaction to a power-on request",
         "power unit failed", "failure predicted");
 constexpr auto kMemory =
@@ -96,10 +96,10 @@ constexpr auto kLoggingDisabled =
         "log cleared", "all event logging disabled", "log full", "log almost full",
         "logging of correctable machine check errors disabled");
 constexpr auto kWatchdog1 =
-    Row("BIOS watchdog: reset", "OS watchdog: reset", "OS watchdog: shut down",
-        "OS watchdog: power down", "OS watchdog: power cycle",
-        "OS watchdog: NMI or diagnostic interrupt", "OS watchdog expired, status only",
-        "OS watchdog: pre-timeout interrupt, no NMI");
+    Row("reset by the BIOS watchdog", "reset by the OS watchdog", "shutdown by the OS watchdog",
+        "power-down by the OS watchdog", "power cycle by the OS watchdog",
+        "NMI or diagnostic interrupt by the OS watchdog", "OS watchdog expired, status only",
+        "pre-timeout interrupt by the OS watchdog, no NMI");
 constexpr auto kSystemEvent =
     Row("system reconfigured", "OEM system boot event", "undetermined system hardware failure",
         "auxiliary log", "platform event filter (PEF) action", "time stamp clock set");
@@ -143,9 +143,9 @@ constexpr auto kAcpiPowerState =
         "S4, suspended to disk", "S5/G2, soft off", "soft off, S4 or S5", "G3, mechanical off",
         "sleeping in S1, S2, or S3", "G1, sleeping in S1 to S4", "S5, entered by override",
         "legacy on", "legacy off", "", "power state unknown");
-constexpr auto kWatchdog2 =
-    Row("watchdog timer expired, status only", "watchdog: hard reset", "watchdog: power down",
-        "watchdog: power cycle", "", "", "", "", "watchdog timer interrupt");
+constexpr auto kWatchdog2 = Row("watchdog timer expired, status only", "hard reset by the watchdog",
+                                "power-down by the watchdog", "power cycle by the watchdog", "", "",
+                                "", "", "watchdog timer interrupt");
 constexpr auto kPlatformAlert = Row("page sent", "LAN alert sent", "platform event trap sent",
                                     "SNMP trap sent in the vendor's format");
 constexpr auto kEntityPresence = Row("present", "absent", "disabled");

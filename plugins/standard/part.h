@@ -3,7 +3,11 @@
 #include <string>
 #include <vector>
 
+#include "ipmi/sdr_record.h"
+
 namespace standard {
+
+struct Event;
 
 /// A part as a person orders it. What is not known is empty.
 struct Part {
@@ -21,6 +25,21 @@ struct PartEvidence {
     bool certain = false;  ///< of a single part: the evidence names it itself, no inference between
 
     bool operator==(const PartEvidence&) const = default;
+};
+
+class PartLookup {
+public:
+    virtual ~PartLookup() = default;
+    /// The event has record, sensor and data.
+    virtual PartEvidence OfEvent(const Event& event) const = 0;
+    virtual PartEvidence OfSensor(const ipmi::Sensor& sensor) const = 0;
+};
+
+/// Names parts by the entity of the sensor's record alone, where that is a physical one.
+class EntityParts : public PartLookup {
+public:
+    PartEvidence OfEvent(const Event& event) const override;
+    PartEvidence OfSensor(const ipmi::Sensor& sensor) const override;
 };
 
 }  // namespace standard

@@ -166,7 +166,9 @@ TEST(EventData, IsEmptyForARecordThatIsNoSensorEvent) {
 TEST(ClockSet, IsThePlaceInThePairOfAChangeOfTheLogsClock) {
     EXPECT_EQ(ClockSetOf(Event(0x12, 0x6F, {0xC5, 0x00, 0xFF})), ClockSet::kFirst);
     EXPECT_EQ(ClockSetOf(Event(0x12, 0x6F, {0xC5, 0x80, 0xFF})), ClockSet::kSecond);
-    EXPECT_EQ(ClockSetOf(Event(0x12, 0x6F, {0x05, 0x80, 0xFF})), ClockSet::kUnspecified);
+    EXPECT_EQ(ClockSetOf(Event(0x12, 0x6F, {0x05, 0x80, 0xFF})), ClockSet::kSecond);
+    EXPECT_EQ(ClockSetOf(Event(0x12, 0x6F, {0x05, 0x82, 0xFF})), ClockSet::kUnspecified);
+    EXPECT_EQ(ClockSetOf(Event(0x12, 0x6F, {0x85, 0x80, 0xFF})), ClockSet::kUnspecified);
     EXPECT_EQ(ClockSetOf(Event(0x12, 0x6F, {0xC5, 0xFF, 0xFF})), ClockSet::kUnspecified);
     EXPECT_EQ(ClockSetOf(Event(0x12, 0x6F, {0xC5, 0x81, 0xFF})), std::nullopt);
     EXPECT_EQ(ClockSetOf(Event(0x12, 0x6F, {0xC4, 0x80, 0xFF})), std::nullopt);

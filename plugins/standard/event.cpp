@@ -1,0 +1,46 @@
+#include "plugins/standard/event.h"
+
+#include "ipmi/event_types.h"
+#include "ipmi/sensor_types.h"
+
+namespace standard {
+
+std::string_view SeverityOriginName(SeverityOrigin origin) {
+    switch (origin) {
+        case SeverityOrigin::kPlatform:
+            return "platform";
+        case SeverityOrigin::kUser:
+            return "user";
+        default:
+            return "standard";
+    }
+}
+
+std::string_view EventStateName(EventState state) {
+    switch (state) {
+        case EventState::kOpen:
+            return "open";
+        case EventState::kResolved:
+            return "resolved";
+        default:
+            return "momentary";
+    }
+}
+
+ipmi::SensorKey Event::sensorKey() const {
+    constexpr std::size_t kOwner = 7;
+    return {
+        .owner = record.bytes[kOwner], .lun = record.generator.lun, .number = record.sensorNumber};
+}
+
+bool Event::IsAsserted(std::uint8_t sensorType, std::uint8_t offset) const {
+    return isSensorEvent() && !record.deassertion && record.sensorType == sensorType &&
+           record.eventType == ipmi::kSensorSpecificEvents && record.offset() == offset;
+}
+
+bool IsLogCleared(const Event& event) {
+    constexpr std::uint8_t kCleared = 2;
+    return event.IsAsserted(ipmi::sensor_type::kEventLoggingDisabled, kCleared);
+}
+
+}  // namespace standard

@@ -1,0 +1,199 @@
+#include "plugins/standard/event_state.h"
+
+#include <algorithm>
+#include <cstddef>
+#include <map>
+#include <tuple>
+#include <utility>
+#include <vector>
+
+#include "ipmi/entities.h"
+#include "ipmi/event_types.h"
+
+namespace standard {
+
+namespace {
+
+using SensorAndTypes = std::tuple<ipmi::SensorKey, std::uint8_t, std::uint8_t, std::uint8_t>;
+
+SensorAndTypes KeyOf(const Event& event) {
+    return {event.sensorKey(), event.record.generator.channel, event.record.sensorType,
+            event.record.eventType};
+}
+
+// The place where a part is put: an entity of the node, or of one controller where it is relative
+// to that; else the sensor itself.
+struct Place {
+    ipmi::Entity entity;
+    ipmi::SensorKey sensor;
+    auto operator<=>(const Place&) const = default;
+};
+
+Place PlaceOf(const Event& event) {
+    if (event.sensor == nullptr || !ipmi::IsPhysicalEntity(event.sensor->sensor.entity.id)) {
+        return {.entity = {}, .sensor = event.sensorKey()};
+    }
+    const ipmi::Entity& entity = event.sensor->sensor.entity;
+    Place place{.entity = entity, .sensor = {}};
+    if (entity.IsDeviceRelative()) place.sensor.owner = event.sensorKey().owner;
+    return place;
+}
+
+template <typename T>
+bool MayBeEqual(const std::optional<T>& a, const std::optional<T>& b) {
+    return !a || !b || *a == *b;
+}
+
+bool SameTarget(const Event& a, const Event& b) {
+    return MayBeEqual(a.data.memoryModule, b.data.memoryModule) &&
+           MayBeEqual(a.data.slotNumber, b.data.slotNumber) &&
+           MayBeEqual(a.data.processorInstance, b.data.processorInstance);
+}
+
+// Whether the later event of a sensor takes the earlier one back.
+bool TakesBack(const Event& later, const Event& earlier) {
+    const ipmi::SelRecord& now = later.record;
+    const ipmi::SelRecord& then = earlier.record;
+    if (now.offset() == then.offset()) return now.deassertion != then.deassertion;
+    return !now.deassertion && !then.deassertion &&
+           ipmi::Excludes(now.eventType, now.sensorType, now.offset(), then.offset());
+}
+
+std::optional<ipmi::Presence> PresenceToldBy(const Event& event) {
+    const ipmi::SelRecord& record = event.record;
+    const auto presence = ipmi::PresenceOf(record.eventType, record.sensorType, record.offset());
+    if (!presence || !record.deassertion) return presence;
+    return *presence == ipmi::Presence::kPresent ? ipmi::Presence::kAbsent
+                                                 : ipmi::Presence::kPresent;
+}
+
+class Pairing {
+public:
+    explicit Pairing(std::span<Event> events) : events_(events) {}
+
+    void Run() {
+        for (std::size_t i = 0; i < events_.size(); ++i) {
+            Event& event = events_[i];
+            if (IsLogCleared(event)) ResolveAll(i);
+            if (event.isSensorEvent()) {
+                Sensor(i);
+                PartReplaced(i);
+            }
+            SetOwnState(i);
+        }
+    }
+
+private:
+    void SetOwnState(std::size_t i) {
+        Event& event = events_[i];
+        if (event.continuationOf) return;
+        if (event.duration == ipmi::Duration::kMomentary) {
+            if (!event.record.deassertion || event.isFault()) event.state = EventState::kMomentary;
+        } else if (event.isFault()) {
+            event.state = EventState::kOpen;
+            open_.push_back(i);
+            if (event.isSensorEvent()) {
+                openOf_[KeyOf(event)].push_back(i);
+                openAt_[PlaceOf(event)].push_back(i);
+            }
+        }
+    }
+
+    bool IsOpen(std::size_t i) const { return events_[i].state == EventState::kOpen; }
+    void Resolve(std::size_t i, std::size_t by) {
+        events_[i].state = EventState::kResolved;
+        events_[i].resolvedBy = by;
+    }
+
+    void ResolveAll(std::size_t by) {
+        for (const std::size_t i : open_) {
+            if (IsOpen(i)) Resolve(i, by);
+        }
+        open_.clear();
+        openOf_.clear();
+        openAt_.clear();
+    }
+
+    void Sensor(std::size_t now) {
+        const auto found = openOf_.find(KeyOf(events_[now]));
+        if (found == openOf_.end()) return;
+        for (const std::size_t i : found->second) {
+            if (IsOpen(i) && SameTarget(events_[now], events_[i]) &&
+                TakesBack(events_[now], events_[i])) {
+                Resolve(i, now);
+            }
+        }
+        std::erase_if(found->second, [this](std::size_t i) { return !IsOpen(i); });
+    }
+
+    // What was open before a part went is over when one has come in its place.
+    void PartReplaced(std::size_t now) {
+        const auto presence = PresenceToldBy(events_[now]);
+        if (!presence) return;
+        const Place place = PlaceOf(events_[now]);
+        if (*presence == ipmi::Presence::kAbsent) {
+            goneAt_[place] = now;
+            return;
+        }
+        const auto gone = goneAt_.find(place);
+        if (gone == goneAt_.end()) return;
+        for (const std::size_t i : openAt_[place]) {
+            if (i <= gone->second && IsOpen(i) && SameTarget(events_[now], events_[i])) {
+                Resolve(i, now);
+            }
+        }
+        std::erase_if(openAt_[place], [this](std::size_t i) { return !IsOpen(i); });
+        goneAt_.erase(gone);
+    }
+
+    std::span<Event> events_;
+    std::vector<std::size_t> open_;
+    std::map<SensorAndTypes, std::vector<std::size_t>> openOf_;
+    std::map<Place, std::vector<std::size_t>> openAt_;
+    std::map<Place, std::size_t> goneAt_;
+};
+
+// The thresholds whose comparison Get Sensor Reading answers: bits 14..12 of the lower and of the
+// upper threshold reading mask (table 43-1, bytes 15 to 18).
+unsigned ComparisonMask(const ipmi::Sensor& sensor) {
+    return (sensor.assertionMask >> 12 & 7U) | (sensor.deassertionMask >> 12 & 7U) << 3;
+}
+
+// Whether what the event says holds by the sensor's present reading.
+std::optional<bool> IsPresent(const Event& event) {
+    const SensorFacts& facts = *event.sensor;
+    const ipmi::SelRecord& record = event.record;
+    if (!facts.reading || !facts.reading->Available() || !facts.reading->states ||
+        facts.sensor.eventType != record.eventType ||
+        facts.sensor.sensorType != record.sensorType) {
+        return std::nullopt;
+    }
+    // Two offsets for each threshold, down and up.
+    const bool isThreshold = record.eventType == ipmi::kThresholdEvents;
+    const unsigned bit = isThreshold ? record.offset() / 2 : record.offset();
+    const bool asserted = facts.reading->Asserted(bit);
+    const bool told =
+        isThreshold ? ComparisonMask(facts.sensor) >> bit & 1 : facts.sensor.readingMask >> bit & 1;
+    if (!asserted && !told) return std::nullopt;
+    return asserted != record.deassertion;
+}
+
+}  // namespace
+
+void SetStates(std::span<Event> events) { Pairing(events).Run(); }
+
+void SetPresentStates(std::span<Event> events) {
+    for (Event& event : events) {
+        if (event.state != EventState::kOpen || event.sensor == nullptr) continue;
+        const std::optional<bool> present = IsPresent(event);
+        if (!present) continue;
+        if (event.duration == ipmi::Duration::kState) {
+            event.stillPresent = present;
+            if (!*present) event.state = EventState::kResolved;
+        } else if (*present) {
+            event.stillPresent = true;
+        }
+    }
+}
+
+}  // namespace standard

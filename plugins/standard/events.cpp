@@ -1,0 +1,42 @@
+#include "plugins/standard/events.h"
+
+#include <map>
+
+#include "plugins/standard/event_key.h"
+#include "plugins/standard/event_severity.h"
+#include "plugins/standard/event_state.h"
+#include "plugins/standard/event_time.h"
+
+namespace standard {
+
+std::vector<Event> DeriveEvents(const NodeFacts& node, const DerivationTools& tools) {
+    std::map<ipmi::SensorKey, const SensorFacts*> sensors;
+    for (const SensorFacts& facts : node.sensors) sensors.emplace(facts.sensor.key, &facts);
+
+    const std::vector<std::uint8_t> identity = SystemIdentity(node);
+    std::vector<Event> events;
+    events.reserve(node.log.size());
+    for (const ipmi::SelRecord& record : node.log) {
+        Event& event = events.emplace_back();
+        event.record = record;
+        event.key = EventKey(identity, record);
+        event.data = ipmi::DecodeEventData(record);
+        if (event.isSensorEvent()) {
+            const auto sensor = sensors.find(event.sensorKey());
+            if (sensor != sensors.end()) event.sensor = sensor->second;
+        }
+        SetReading(tools.convert, &event);
+        SetSeverity(node.filters, tools.rules, &event);
+        event.part = tools.parts.OfEvent(event);
+    }
+    SetTimes(node, events);
+    JoinPanics(events);
+    for (Event& event : events) {
+        SetText(&event);
+        SetSentence(&event);
+    }
+    SetStates(events);
+    return events;
+}
+
+}  // namespace standard

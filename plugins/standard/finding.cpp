@@ -1,0 +1,340 @@
+#include "plugins/standard/finding.h"
+
+#include <algorithm>
+#include <array>
+#include <map>
+#include <set>
+#include <utility>
+
+#include "base/text.h"
+#include "ipmi/event_types.h"
+#include "ipmi/sensor_types.h"
+#include "ipmi/units.h"
+#include "plugins/standard/event_severity.h"
+#include "plugins/standard/event_text.h"
+#include "plugins/standard/time_text.h"
+
+namespace standard {
+
+namespace {
+
+constexpr std::int64_t kBurstGap = 300;
+constexpr std::int64_t kRecent = 7 * 24 * 3600;
+constexpr std::size_t kRecentRecords = 64;
+
+bool IsOf(const Event& event, std::uint8_t sensorType, std::uint16_t offsets) {
+    const ipmi::SelRecord& record = event.record;
+    return event.isSensorEvent() && record.eventType == ipmi::kSensorSpecificEvents &&
+           record.sensorType == sensorType && (offsets >> record.offset() & 1) != 0;
+}
+
+constexpr std::uint16_t kAnyOffset = 0xFFFF;
+
+bool IsMemoryError(const Event& event) {
+    // Correctable, uncorrectable, parity, scrub, and the logging limit of correctable ones.
+    return IsOf(event, ipmi::sensor_type::kMemory, 0b101111);
+}
+bool IsThermalTrip(const Event& event) {
+    return IsOf(event, ipmi::sensor_type::kProcessor, 0b10) ||
+           IsOf(event, ipmi::sensor_type::kChipSet, 0b10);
+}
+bool IsSystemStop(const Event& event) {
+    return event.record.kind == ipmi::RecordKind::kLinuxPanic ||
+           IsOf(event, ipmi::sensor_type::kOsStop, kAnyOffset) ||
+           IsOf(event, ipmi::sensor_type::kWatchdog1, kAnyOffset) ||
+           IsOf(event, ipmi::sensor_type::kWatchdog2, kAnyOffset) ||
+           IsOf(event, ipmi::sensor_type::kBootError, kAnyOffset);
+}
+bool IsPcieError(const Event& event) { return ipmi::ParsePcieError(event.record).has_value(); }
+bool IsAny(const Event&) { return true; }
+
+/// Which events are one finding.
+enum class Scope : std::uint8_t {
+    kModule,        ///< of one memory module, whichever sensor told of it
+    kBurst,         ///< of one burst
+    kDevice,        ///< of one PCI Express device
+    kSensorOffset,  ///< of one offset of a sensor
+    kSensor,        ///< of one sensor
+};
+struct Rule {
+    bool (*applies)(const Event&);
+    Scope scope;
+};
+// The first rule that applies to an open or momentary fault says with which others it is one
+// finding.
+constexpr std::array kRules = std::to_array<Rule>({
+    {IsMemoryError, Scope::kModule},
+    {IsSystemStop, Scope::kBurst},
+    {IsPcieError, Scope::kDevice},
+    {IsThermalTrip, Scope::kSensorOffset},
+    {IsAny, Scope::kSensor},
+});
+
+std::string SensorId(const Event& event) {
+    return ipmisel::Format("%02x/%d/%02x/%02x", event.sensorKey().owner, event.sensorKey().lun,
+                           event.sensorKey().number, event.record.sensorType);
+}
+
+std::string ModuleId(const Event& event) {
+    if (event.part.parts.size() == 1 && event.data.memoryModule) return event.part.parts[0].name;
+    if (event.data.memoryModule) {
+        return ipmisel::Format("%02x module %d", event.sensorKey().owner, *event.data.memoryModule);
+    }
+    return SensorId(event);
+}
+
+// What the finding of an event is called among those of the node.
+std::string GroupOf(const Event& event, std::size_t burst) {
+    const auto* const rule = std::ranges::find_if(
+        kRules, [&event](const Rule& candidate) { return candidate.applies(event); });
+    const std::string prefix = std::to_string(rule - kRules.begin()) + ' ';
+    switch (rule->scope) {
+        case Scope::kModule:
+            return prefix + ModuleId(event);
+        case Scope::kBurst:
+            return prefix + std::to_string(burst);
+        case Scope::kDevice: {
+            const ipmi::PcieError error = ipmi::ParsePcieError(event.record).value();
+            return prefix + ipmisel::Format("%x:%x:%x.%x", error.segment, error.bus, error.device,
+                                            error.function);
+        }
+        case Scope::kSensorOffset:
+            return prefix + SensorId(event) + ' ' + std::to_string(event.record.offset());
+        default:
+            return prefix + SensorId(event);
+    }
+}
+
+// Whether a momentary fault is recent: within seven days of the newest record, or, without a time,
+// among the last records of the log.
+class Recency {
+public:
+    explicit Recency(std::span<const Event> events) : count_(events.size()) {
+        for (const Event& event : events) {
+            if (event.time) newest_ = event.time;
+        }
+    }
+    bool IsRecent(const Event& event, std::size_t at) const {
+        if (event.time && newest_) return *event.time >= *newest_ - kRecent;
+        return at + kRecentRecords >= count_;
+    }
+
+private:
+    std::size_t count_;
+    std::optional<std::int64_t> newest_;
+};
+
+std::string EvidenceText(const Event& event) {
+    return event.time ? TimeText(*event.time) + ": " + event.sentence : event.sentence;
+}
+
+std::string Subject(const Event& event) {
+    std::string subject = PartText(event.part);
+    const std::string sensor = SensorText(event);
+    if (!sensor.empty()) subject += (subject.empty() ? "" : ", ") + sensor;
+    return subject;
+}
+
+std::string TitleOf(const Event& worst, std::size_t count) {
+    std::string title = Subject(worst);
+    if (!title.empty()) title += ": ";
+    title += worst.text;
+    if (count > 1) title += " (" + std::to_string(count) + " events)";
+    return title;
+}
+
+// "CPU1 Temp reads 96 degrees C now".
+std::string PresentText(const SensorFacts& facts, const Converter& convert) {
+    if (!facts.reading || !facts.reading->Available()) return {};
+    const auto value = convert(facts.sensor, facts.reading->raw);
+    if (!value) return {};
+    const std::string unit = ipmi::UnitText(facts.sensor.units);
+    return facts.sensor.name + " reads " + NumberText(*value) + (unit.empty() ? "" : ' ' + unit) +
+           " now";
+}
+
+void AddOrigin(const Event& event, Finding* finding) {
+    if (event.severityFrom == SeverityOrigin::kPlatform) {
+        finding->evidence.emplace_back("severity by the controller's own event filters");
+    } else if (event.severityFrom == SeverityOrigin::kUser) {
+        finding->evidence.emplace_back("severity by the user's rules");
+    }
+}
+
+Finding FindingOf(std::span<const Event> events, std::vector<std::size_t> indices,
+                  const Converter& convert) {
+    Finding finding;
+    finding.events = std::move(indices);
+    // Of equals the last, whose reading is the newest.
+    const std::size_t worst =
+        *std::ranges::max_element(finding.events, [&events](std::size_t a, std::size_t b) {
+            return std::pair(*events[a].severity, a) < std::pair(*events[b].severity, b);
+        });
+    const Event& event = events[worst];
+    finding.severity = *event.severity;
+    finding.isOpen = event.state == EventState::kOpen;
+    finding.part = event.part;
+    finding.title = TitleOf(event, finding.events.size());
+
+    const std::set<std::size_t> shown{finding.events.front(), worst, finding.events.back()};
+    for (const std::size_t i : shown) finding.evidence.push_back(EvidenceText(events[i]));
+    const std::size_t others = finding.events.size() - shown.size();
+    if (others > 0) finding.evidence.push_back(std::to_string(others) + " more events like these");
+    for (const std::size_t i : finding.events) {
+        if (events[i].stillPresent) finding.stillPresent = events[i].stillPresent;
+    }
+    if (finding.stillPresent == true && event.sensor != nullptr) {
+        std::string present = PresentText(*event.sensor, convert);
+        if (present.empty()) present = SensorText(event) + " still says so";
+        finding.evidence.push_back(std::move(present));
+    }
+    AddOrigin(event, &finding);
+    return finding;
+}
+
+// What a sensor says now as the event that it would have sent.
+Event PresentEvent(const SensorFacts& facts, std::uint8_t offset, const Converter& convert) {
+    const ipmi::Sensor& sensor = facts.sensor;
+    std::uint8_t data1 = offset;
+    std::uint8_t reading = 0xFF;
+    std::uint8_t threshold = 0xFF;
+    if (sensor.IsThreshold()) {
+        data1 |= 0x40;  // event data 2 is the reading
+        reading = facts.reading->raw;
+        const auto limit = facts.thresholds
+                               ? facts.thresholds->Get(static_cast<ipmi::Threshold>(offset / 2))
+                               : std::nullopt;
+        if (limit) {
+            data1 |= 0x10;  // event data 3 is the threshold
+            threshold = *limit;
+        }
+    }
+    Event event;
+    event.record = *ipmi::ParseSelRecord(ipmi::SelBytes{
+        0, 0, ipmi::kSystemEventType, 0xFF, 0xFF, 0xFF, 0xFF, sensor.key.owner, sensor.key.lun, 4,
+        sensor.sensorType, sensor.key.number, sensor.eventType, data1, reading, threshold});
+    event.sensor = &facts;
+    event.data = ipmi::DecodeEventData(event.record);
+    SetReading(convert, &event);
+    return event;
+}
+
+// The offsets that hold now by the sensor's reading and are no bare statement of presence.
+std::vector<std::uint8_t> PresentOffsets(const SensorFacts& facts) {
+    const ipmi::Sensor& sensor = facts.sensor;
+    std::vector<std::uint8_t> offsets;
+    if (!facts.reading || !facts.reading->Available()) return offsets;
+    if (sensor.IsThreshold()) {
+        // Of each threshold the offset that stands for being past it.
+        constexpr std::array<std::uint8_t, ipmi::kThresholdCount> kPast{0, 2, 4, 7, 9, 11};
+        for (unsigned i = 0; i < kPast.size(); ++i) {
+            if (facts.reading->Asserted(i)) offsets.push_back(kPast[i]);
+        }
+        return offsets;
+    }
+    for (std::uint8_t offset = 0; offset < 15; ++offset) {
+        if (facts.reading->Asserted(offset) && (sensor.readingMask >> offset & 1) != 0 &&
+            !ipmi::PresenceOf(sensor.eventType, sensor.sensorType, offset)) {
+            offsets.push_back(offset);
+        }
+    }
+    return offsets;
+}
+
+std::optional<Finding> FindingOfSensor(const NodeFacts& node, const SensorFacts& facts,
+                                       const DerivationTools& tools) {
+    std::optional<Event> worst;
+    for (const std::uint8_t offset : PresentOffsets(facts)) {
+        Event event = PresentEvent(facts, offset, tools.convert);
+        SetSeverity(node.filters, tools.rules, &event);
+        const bool lasts = event.duration == ipmi::Duration::kState;
+        if (!lasts || !event.isFault() || (worst && *worst->severity >= *event.severity)) continue;
+        worst = std::move(event);
+    }
+    if (!worst) return std::nullopt;
+    worst->part = tools.parts.OfSensor(facts.sensor);
+    SetText(&*worst);
+    SetSentence(&*worst);
+    Finding finding;
+    finding.severity = *worst->severity;
+    finding.part = worst->part;
+    finding.title = TitleOf(*worst, 1);
+    finding.evidence.push_back("now: " + worst->sentence);
+    finding.evidence.emplace_back("no event of it in the log");
+    AddOrigin(*worst, &finding);
+    finding.stillPresent = true;
+    return finding;
+}
+
+}  // namespace
+
+std::vector<std::size_t> BurstsOf(std::span<const Event> events) {
+    std::vector<std::size_t> bursts;
+    bursts.reserve(events.size());
+    std::size_t burst = 0;
+    const Event* before = nullptr;  // the last one with a time
+    for (const Event& event : events) {
+        const ipmi::TimeKind kind = event.timeKind();
+        if (kind != ipmi::TimeKind::kNone) {
+            if (before != nullptr &&
+                (before->timeKind() != kind || event.clockChanged ||
+                 std::int64_t{event.record.time} - before->record.time > kBurstGap)) {
+                ++burst;
+            }
+            before = &event;
+        }
+        if (IsLogCleared(event) && !bursts.empty() && bursts.back() == burst) ++burst;
+        bursts.push_back(burst);
+    }
+    return bursts;
+}
+
+std::vector<Finding> DeriveFindings(const NodeFacts& node, std::span<const Event> events,
+                                    const DerivationTools& tools) {
+    const std::vector<std::size_t> bursts = BurstsOf(events);
+    const Recency recency(events);
+    std::map<std::string, std::vector<std::size_t>> groups;
+    std::map<std::size_t, std::size_t> causeOf;  // by burst
+    std::set<ipmi::SensorKey> told;
+    for (std::size_t i = 0; i < events.size(); ++i) {
+        const Event& event = events[i];
+        if (IsLogCleared(event)) {
+            // What stood before it is done with; open events are resolved by it anyway.
+            std::erase_if(groups, [&events](const auto& group) {
+                return events[group.second.front()].state != EventState::kOpen;
+            });
+        }
+        if (!event.isFault() || event.continuationOf) continue;
+        causeOf.emplace(bursts[i], i);
+        const bool isOpen = event.state == EventState::kOpen;
+        if (!isOpen && !(event.state == EventState::kMomentary && recency.IsRecent(event, i))) {
+            continue;
+        }
+        groups[(isOpen ? "open " : "momentary ") + GroupOf(event, bursts[i])].push_back(i);
+        if (isOpen && event.sensor != nullptr) told.insert(event.sensorKey());
+    }
+
+    std::vector<Finding> findings;
+    for (auto& [name, indices] : groups) {
+        Finding& finding =
+            findings.emplace_back(FindingOf(events, std::move(indices), tools.convert));
+        finding.firstCause = causeOf.at(bursts[finding.events.front()]);
+    }
+    for (const SensorFacts& facts : node.sensors) {
+        if (told.contains(facts.sensor.key)) continue;
+        if (auto finding = FindingOfSensor(node, facts, tools)) {
+            findings.push_back(std::move(*finding));
+        }
+    }
+    std::ranges::stable_sort(findings, [&events](const Finding& a, const Finding& b) {
+        const auto place = [&events](const Finding& finding) {
+            return finding.events.empty() ? events.size() : finding.events.front();
+        };
+        if (a.severity != b.severity) return a.severity > b.severity;
+        if (a.isOpen != b.isOpen) return a.isOpen;
+        return place(a) < place(b);
+    });
+    return findings;
+}
+
+}  // namespace standard

@@ -1,0 +1,176 @@
+#include "plugins/standard/finding.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "tests/plugins/standard/log_builder.h"
+
+namespace standard {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+std::vector<Finding> Findings(const LogBuilder& log) {
+    return DeriveFindings(log.node, log.Derive(), log.tools);
+}
+std::vector<std::string> Titles(const LogBuilder& log) {
+    std::vector<std::string> titles;
+    for (const Finding& finding : Findings(log)) titles.push_back(finding.title);
+    return titles;
+}
+
+constexpr std::array<std::uint8_t, 3> Offset(std::uint8_t offset) { return {offset, 0xFF, 0xFF}; }
+
+TEST(Finding, TenCorrectedErrorsOfOneModuleAreOneWithACount) {
+    LogBuilder log;
+    for (unsigned i = 0; i < 10; ++i) {
+        log.At(kNoon + i).Event(kMemory, 0x80, kAsserted, {0x30, 0xFF, 0x04});
+    }
+    log.At(kNoon + 20).Event(kMemory, 0x80, kAsserted, {0x30, 0xFF, 0x05});
+    log.At(kNoon + 30).Event(kMemory, 0x82, kAsserted, {0x31, 0xFF, 0x04});  // another sensor
+    const auto findings = Findings(log);
+    ASSERT_EQ(findings.size(), 2u);
+    EXPECT_EQ(findings[0].severity, ipmi::Severity::kCritical);
+    EXPECT_EQ(findings[0].title,
+              "Memory sensor 82h: uncorrectable ECC or other uncorrectable memory error, memory "
+              "module 4 (11 events)");
+    EXPECT_EQ(findings[0].events.size(), 11u);
+    EXPECT_THAT(findings[0].evidence,
+                ElementsAre("2026-03-09T12:00:00Z: Memory sensor 80h: correctable ECC or other "
+                            "correctable memory error, memory module 4",
+                            "2026-03-09T12:00:30Z: Memory sensor 82h: uncorrectable ECC or other "
+                            "uncorrectable memory error, memory module 4",
+                            "9 more events like these"));
+    EXPECT_THAT(findings[1].events, ElementsAre(10));
+}
+
+TEST(Finding, EventsOfOneSensorAreOneAndAThermalTripIsOneOfItsOwn) {
+    LogBuilder log;
+    log.Event(0x01, 0x30, 0x01, Offset(7))
+        .Event(0x01, 0x30, 0x01, Offset(9))
+        .Event(0x07, 0x91, kAsserted, Offset(0))
+        .Event(0x07, 0x91, kAsserted, Offset(1));
+    EXPECT_THAT(Titles(log),
+                ElementsAre("Temperature sensor 30h: above the upper critical threshold (2 events)",
+                            "Processor sensor 91h: internal error (IERR)",
+                            "Processor sensor 91h: thermal trip"));
+}
+
+TEST(Finding, WhatIsTakenBackIsNone) {
+    LogBuilder log;
+    log.Event(kPowerSupply, 0x71, kAsserted, Offset(1))
+        .Event(kPowerSupply, 0x71, kDeasserted, Offset(1))
+        .Event(0x23, 0x03, kAsserted, Offset(1))
+        .Cleared();
+    EXPECT_THAT(Findings(log), IsEmpty());
+}
+
+TEST(Finding, StopsOfOneBurstAreOneAndComeAfterOpenProblemsOfTheirSeverity) {
+    LogBuilder log;
+    log.Event(0x23, 0x03, kAsserted, Offset(8))
+        .At(kNoon + 10)
+        .Event(0x20, 0x01, kAsserted, Offset(1))
+        .At(kNoon + 300)
+        .Event(0x23, 0x03, kAsserted, Offset(1))
+        .At(kNoon + 601)
+        .Event(0x23, 0x03, kAsserted, Offset(2))
+        .At(kNoon + 2000)
+        .Event(kPowerSupply, 0x71, kAsserted, Offset(1));
+    const auto findings = Findings(log);
+    ASSERT_EQ(findings.size(), 3u);
+    EXPECT_TRUE(findings[0].isOpen);
+    EXPECT_FALSE(findings[1].isOpen);
+    EXPECT_THAT(findings[1].events, ElementsAre(0, 1, 2));
+    EXPECT_EQ(findings[1].title, "Watchdog 2 sensor 03h: hard reset by the watchdog (3 events)");
+    EXPECT_THAT(findings[2].events, ElementsAre(3));
+}
+
+TEST(Finding, AMomentaryFaultIsOneForSevenDaysOfTheLogsOwnTime) {
+    constexpr std::uint32_t kWeek = 7 * 24 * 3600;
+    for (const std::uint32_t age : {kWeek, kWeek + 1}) {
+        LogBuilder log;
+        log.Event(0x23, 0x03, kAsserted, Offset(1))
+            .At(kNoon + age)
+            .Event(0x14, 1, kAsserted, Offset(0));
+        EXPECT_EQ(Findings(log).size(), age == kWeek ? 1u : 0u);
+    }
+}
+
+TEST(Finding, AMomentaryFaultWithoutATimeIsOneAmongTheLastRecords) {
+    for (const unsigned later : {63U, 64U}) {
+        LogBuilder log;
+        log.At(0xFFFFFFFF).Event(0x23, 0x03, kAsserted, Offset(1));
+        for (unsigned i = 0; i < later; ++i) log.Event(0x14, 1, kAsserted, Offset(0));
+        EXPECT_EQ(Findings(log).size(), later == 63 ? 1u : 0u);
+    }
+}
+
+TEST(Finding, NamesTheEventThatBeganItsBurst) {
+    LogBuilder log;
+    log.Event(0x14, 1, kAsserted, Offset(0))
+        .Event(0x04, 0x52, 0x01, Offset(2))  // a fan stops
+        .At(kNoon + 200)
+        .Event(0x01, 0x33, 0x01, Offset(9))
+        .At(kNoon + 501)
+        .Event(0x01, 0x34, 0x01, Offset(9));
+    const auto findings = Findings(log);
+    ASSERT_EQ(findings.size(), 3u);
+    EXPECT_EQ(findings[0].firstCause, 1u);
+    EXPECT_EQ(findings[1].firstCause, 1u);
+    EXPECT_EQ(findings[2].firstCause, 3u);
+}
+
+TEST(Finding, ASensorThatIsBadNowIsOneWithoutAnEvent) {
+    LogBuilder log;
+    SensorFacts& temperature = log.Temperature(0x30, "CPU1 Temp", {.id = 0x03, .instance = 1});
+    LogBuilder::Reads(&temperature, 96, 0b011000);
+    temperature.thresholds.emplace();
+    temperature.thresholds->readable = 0b010000;
+    temperature.thresholds->raw[4] = 95;
+    SensorFacts& absent = log.Sensor(0x40, 0x0D, 0x08, "Bay 1");
+    LogBuilder::Reads(&absent, 0, 0b01);
+    SensorFacts& off = log.Sensor(0x41, kPowerSupply, 0x6F, "PS1 Status");
+    LogBuilder::Reads(&off, 0, 0b10);
+    off.reading->unavailable = true;
+    SensorFacts& latched = log.Sensor(0x42, kMemory, 0x6F, "Mem");
+    LogBuilder::Reads(&latched, 0, 0b10);
+    const auto findings = Findings(log);
+    ASSERT_EQ(findings.size(), 1u);
+    EXPECT_EQ(findings[0].severity, ipmi::Severity::kCritical);
+    EXPECT_EQ(findings[0].title, "Processor 1, CPU1 Temp: above the upper critical threshold");
+    EXPECT_EQ(findings[0].stillPresent, true);
+    EXPECT_THAT(findings[0].events, IsEmpty());
+    EXPECT_THAT(findings[0].evidence,
+                ElementsAre("now: Processor 1, CPU1 Temp: above the upper critical threshold "
+                            "(reading 96 degrees C, threshold 95 degrees C)",
+                            "no event of it in the log"));
+}
+
+TEST(Finding, OfAnOpenEventSaysWhatTheSensorReadsNow) {
+    LogBuilder log;
+    SensorFacts& temperature = log.Temperature(0x30, "CPU1 Temp");
+    LogBuilder::Reads(&temperature, 97, 0b010000);
+    log.Event(0x01, 0x30, 0x01, Offset(9));
+    const auto findings = Findings(log);
+    ASSERT_EQ(findings.size(), 1u);
+    EXPECT_EQ(findings[0].evidence.back(), "CPU1 Temp reads 97 degrees C now");
+    EXPECT_EQ(findings[0].stillPresent, true);
+}
+
+TEST(Burst, EndsWithAGapASetClockAnotherKindOfTimeAndAClearedLog) {
+    LogBuilder log;
+    const auto press = [&log](std::uint32_t time) {
+        log.At(time).Event(0x14, 1, kAsserted, Offset(0));
+    };
+    press(10);
+    press(kNoon);
+    press(kNoon + 300);
+    log.Record(0xE0, {});
+    press(kNoon + 601);
+    press(kNoon + 500);  // the clock went back
+    log.Cleared();
+    press(kNoon + 500);
+    EXPECT_THAT(BurstsOf(log.Derive()), ElementsAre(0, 1, 1, 1, 2, 3, 4, 4));
+}
+
+}  // namespace standard
