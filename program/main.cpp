@@ -1,3 +1,3 @@
-#include "program/commands/collect.h"
+#include "program/run_program.h"
 
 int main(int argc, char** argv) { return ipmisel::RunProgram(argc, argv); }

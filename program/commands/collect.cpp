@@ -1,21 +1,14 @@
 #include "program/commands/collect.h"
 
-#include <unistd.h>
-
+#include <CLI/CLI.hpp>
 #include <algorithm>
-#include <charconv>
 #include <chrono>
-#include <csignal>
 #include <cstdint>
-#include <filesystem>
-#include <limits>
-#include <map>
 #include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
 #include <utility>
-#include <variant>
 #include <vector>
 
 #include "host/core/host.h"
@@ -24,14 +17,16 @@
 #include "host/spdriver/completeness.h"
 #include "host/spdriver/source.h"
 #include "host/spdriver/stop.h"
+#include "program/commands/access.h"
+#include "program/commands/arguments.h"
 #include "program/commands/failure.h"
 #include "program/commands/log_lines.h"
-#include "program/commands/password.h"
+#include "program/commands/plugins.h"
 #include "program/commands/stop_signals.h"
 #include "program/reports/output_file.h"
 #include "program/reports/report.h"
+#include "program/reports/report_sink.h"
 #include "program/reports/terminal_text.h"
-#include "tqr/classes.h"
 #include "tqr/datetime.h"
 #include "tqr/splibrary.h"
 
@@ -41,89 +36,17 @@ namespace {
 constexpr std::int64_t kMicrosecondsPerSecond = 1000000;
 constexpr std::uint8_t kIpmiDeviceStructure = 38;  // SMBIOS, IPMI device information
 
-/// The node of an instance, from 0; empty when it belongs to none.
-std::optional<std::size_t> NodeOf(const tqrhost::Instance& instance, std::string_view property) {
-    for (const auto& [name, value] : instance.properties) {
-        if (property.empty() || name != property) continue;
-        std::int64_t node = 0;
-        if (const auto* const text = std::get_if<std::string>(&value)) {
-            std::from_chars(text->data(), text->data() + text->size(), node);
-        } else if (const auto* const number = std::get_if<std::int64_t>(&value)) {
-            node = *number;
-        }
-        if (node >= 1) return static_cast<std::size_t>(node - 1);
-    }
-    return std::nullopt;
-}
-
-/// Counts log records by node on their way to the report. Once the report cannot be written, it
-/// takes nothing any more.
-class ReportSink : public tqrhost::WholeInstanceSink {
-public:
-    ReportSink(ReportWriter& report, const tqrhost::PluginSet& plugins,
-               const std::vector<std::string>& wanted, std::size_t nodes)
-        : report_(report), nodes_(nodes) {
-        for (const std::string& name : wanted) {
-            const tqrhost::ClassInfo* const info = plugins.FindClass(name);
-            if (info == nullptr || !info->Is(NQORTQR20::kPerLogRecord)) continue;
-            Counted& counted = counted_[name];
-            counted.nodeProperty = info->nodeProperty;
-            counted.byNode.resize(nodes);
-            ++counted.times;
-        }
-    }
-
-    /// As ReportEnd::exported.
-    std::vector<unsigned> Exported() const {
-        if (counted_.empty()) return {};
-        std::vector<unsigned> fewest(nodes_, std::numeric_limits<unsigned>::max());
-        for (const auto& [name, counted] : counted_) {
-            for (std::size_t node = 0; node < nodes_; ++node) {
-                fewest[node] = std::min(fewest[node], counted.byNode[node] / counted.times);
-            }
-        }
-        return fewest;
-    }
-    /// Throws what has kept the report from being written. No exception goes through the plug-in.
-    void Check() const {
-        if (failure_) throw Failure(*failure_);
-    }
-
-protected:
-    bool Take(const tqrhost::Instance& instance) override {
-        if (failure_) return false;
-        try {
-            report_.Add(instance);
-        } catch (const Failure& failure) {
-            failure_ = failure;
-            return false;
-        }
-        if (const auto counted = counted_.find(instance.className); counted != counted_.end()) {
-            const auto node = NodeOf(instance, counted->second.nodeProperty);
-            if (node && *node < nodes_) ++counted->second.byNode[*node];
-        }
-        return true;
-    }
-
-private:
-    /// A class with one instance for each log record.
-    struct Counted {
-        std::string nodeProperty;
-        std::vector<unsigned> byNode;
-        unsigned times = 0;  ///< that the user named it: it is collected so often
-    };
-
-    ReportWriter& report_;
-    std::size_t nodes_;
-    std::map<std::string, Counted, std::less<>> counted_;
-    std::optional<Failure> failure_;
+/// What the user asked for.
+struct CollectOptions {
+    AccessOptions access;
+    std::vector<std::string> classes;  ///< empty: the default ones
+    std::string format = "table";
+    std::optional<std::string> output;  ///< empty: standard output
+    std::optional<std::string> record;
+    LogOptions log;
+    std::vector<std::string> plugins;  ///< further plug-in files
+    std::optional<double> deadlineSeconds;
 };
-
-std::filesystem::path PluginFolder() {
-    std::error_code error;
-    const auto program = std::filesystem::read_symlink("/proc/self/exe", error);
-    return program.parent_path().parent_path() / "lib/ipmisel";
-}
 
 std::string Joined(const std::vector<std::string>& parts) {
     std::string text;
@@ -150,20 +73,8 @@ struct Machine {
 
 bool GoesOn() { return tqrhost::Stopped() == tqrhost::StopReason::kNone; }
 
-tqrhost::Source OpenSource(const Options& options) {
-    tqrhost::SourceOptions access = options.source;
-    access.password = [&options] { return ReadPassword(options.passwordFile); };
-    access.kg = [&options] { return ReadKg(options.kgFile); };
-    try {
-        return tqrhost::OpenSources(options.sources, access);
-    } catch (const tqrhost::SourceUsageError& error) {
-        throw Failure(kExitUsage, error.what());
-    } catch (const tqrhost::SourceError& error) {
-        throw Failure(kExitNoSource, error.what());
-    }
-}
-
-std::shared_ptr<tqrhost::CaptureWriter> Record(const Options& options, tqrhost::Source& source) {
+std::shared_ptr<tqrhost::CaptureWriter> Record(const CollectOptions& options,
+                                               tqrhost::Source& source) {
     if (!options.record) return nullptr;
     try {
         return tqrhost::RecordTo(*options.record, source);
@@ -172,44 +83,13 @@ std::shared_ptr<tqrhost::CaptureWriter> Record(const Options& options, tqrhost::
     }
 }
 
-/// Does something with plug-ins; what they are refused for is wrong usage.
-template <typename Work>
-auto WithPlugins(Work work) {
-    try {
-        return work();
-    } catch (const tqrhost::PluginError& error) {
-        throw Failure(kExitUsage, error.what());
-    }
-}
-
-std::unique_ptr<tqrhost::PluginSet> LoadPlugins(const Options& options) {
-    return WithPlugins([&] {
-        return std::make_unique<tqrhost::PluginSet>(
-            PluginFolder(),
-            std::vector<std::filesystem::path>(options.plugins.begin(), options.plugins.end()));
-    });
-}
-
-/// The classes that are to be collected.
-std::vector<std::string> WantedClasses(const Options& options, const tqrhost::PluginSet& plugins) {
-    for (const std::string& name : options.classes) {
-        if (plugins.FindClass(name) != nullptr) continue;
-        std::string known;
-        for (const tqrhost::ClassInfo& info : plugins.Classes()) {
-            known += (known.empty() ? "" : ", ") + info.name;
-        }
-        throw Failure(kExitUsage, "there is no class \"" + name + "\"; use one of " + known);
-    }
-    return options.classes.empty() ? plugins.DefaultClasses() : options.classes;
-}
-
 /// One for each node. The nodes of lan: sources follow each other as they were named.
-std::vector<SystemInfo> SystemsOf(const Options& options, std::size_t nodes) {
+std::vector<SystemInfo> SystemsOf(const std::vector<std::string>& sources, std::size_t nodes) {
     std::vector<SystemInfo> systems(nodes);
     for (std::size_t node = 0; node < nodes; ++node) {
-        const bool oneEach = options.sources.size() == nodes;
+        const bool oneEach = sources.size() == nodes;
         SystemInfo& system = systems[node];
-        system.source = options.sources[oneEach ? node : 0];
+        system.source = sources[oneEach ? node : 0];
         const auto colon = system.source.find(':');
         system.name = colon == std::string::npos ? system.source : system.source.substr(colon + 1);
     }
@@ -231,12 +111,11 @@ std::vector<std::string> TellNotices() {
     return texts;
 }
 
-int CollectTo(const Options& options, OutputFile& output) {
+int CollectTo(const CollectOptions& options, OutputFile& output) {
     // The plug-ins first: without them nobody is asked for a password.
-    const std::unique_ptr<tqrhost::PluginSet> plugins = LoadPlugins(options);
-    const std::vector<std::string> wanted = WantedClasses(options, *plugins);
-    WithPlugins([&] { plugins->CheckNeededFiles(wanted); });
-    tqrhost::Source source = OpenSource(options);
+    const std::unique_ptr<tqrhost::PluginSet> plugins = LoadPlugins(options.plugins);
+    const std::vector<std::string> wanted = ClassesToCollect(options.classes, *plugins);
+    tqrhost::Source source = OpenSource(options.access);
     const std::shared_ptr<tqrhost::CaptureWriter> capture = Record(options, source);
     const Machine machine(std::move(source));
 
@@ -244,11 +123,11 @@ int CollectTo(const Options& options, OutputFile& output) {
     const auto format = std::find_if(formats.begin(), formats.end(),
                                      [&](const FormatInfo& f) { return f.name == options.format; });
     const auto nodes = static_cast<std::size_t>(NQORTQR20::SPLibrary::GetNumberBMCNode());
-    const ReportHead head{.source = Joined(options.sources),
+    const ReportHead head{.source = Joined(options.access.Sources()),
                           .plugin = plugins->Plugins().front()->Info(),
                           .machineType = tqrhost::GetMachineFacts().machineType,
                           .nodes = nodes,
-                          .systems = SystemsOf(options, nodes),
+                          .systems = SystemsOf(options.access.Sources(), nodes),
                           .collected = {NQORTQR20::TOSSpecific::GetLocalTime().TotalMicroseconds() /
                                         kMicrosecondsPerSecond},
                           .classes = plugins->Classes(),
@@ -285,21 +164,7 @@ int CollectTo(const Options& options, OutputFile& output) {
     return outcome.exitStatus;
 }
 
-}  // namespace
-
-int ListClasses(const Options& options) {
-    const std::vector<tqrhost::ClassInfo> classes = LoadPlugins(options)->Classes();
-    std::size_t width = 0;
-    for (const tqrhost::ClassInfo& info : classes) width = std::max(width, info.name.size());
-    OutputFile output(std::nullopt);
-    for (const tqrhost::ClassInfo& info : classes) {
-        output.Write(Fit(info.name, width) + "  " + info.description + "\n");
-    }
-    output.Commit();
-    return kExitCollected;
-}
-
-int Collect(const Options& options) {
+int Collect(const CollectOptions& options) {
     const StopSignals signals;
     if (options.deadlineSeconds) {
         using Clock = std::chrono::steady_clock;
@@ -307,28 +172,49 @@ int Collect(const Options& options) {
                         std::chrono::duration_cast<Clock::duration>(
                             std::chrono::duration<double>(*options.deadlineSeconds)));
     }
-    LogLines log(options.logLevel, options.logFile);
+    LogLines log(options.log);
     OutputFile output(options.output);
     const int status = CollectTo(options, output);
     log.Finish();
     return status;
 }
 
-int RunProgram(int argc, char** argv) {
-    std::signal(SIGPIPE, SIG_IGN);  // a reader that leaves shows as a write error
-    try {
-        int exitStatus = kExitCollected;
-        const auto options = ParseOptions(argc, argv, &exitStatus);
-        if (!options) return exitStatus;
-        return options->command == Options::Command::kClasses ? ListClasses(*options)
-                                                              : Collect(*options);
-    } catch (const Failure& failure) {
-        Say(failure.what());
-        return failure.exitStatus;
-    } catch (const std::exception& error) {
-        Say(std::string("ended by an error of its own: ") + error.what());
-        return kExitPassFailed;
-    }
+constexpr const char* kExitStatusHelp =
+    "Exit status:\n"
+    "  0  collected\n"
+    "  1  the plug-in ended the pass with another status than 0\n"
+    "  2  wrong usage, or a file that it names cannot be used\n"
+    "  3  the source could not be opened, or the machine has no BMC\n"
+    "  4  collected in part; the report's completeness says what is missing\n";
+
+}  // namespace
+
+Command AddCollectCommand(CLI::App* program) {
+    CLI::App* const command = program->add_subcommand("collect", "Collect and write a report");
+    const auto options = std::make_shared<CollectOptions>();
+    command->add_option("--class", options->classes, "Class to collect; see \"ipmisel classes\"")
+        ->type_name("CLASS")
+        ->allow_extra_args(false);
+    command->add_option("--format", options->format, "Form of the report")
+        ->type_name("FORMAT")
+        ->capture_default_str()
+        ->check(OneOf(Names(KnownFormats())));
+    command->add_option("--output", options->output, "Write the report here, whole or not at all")
+        ->type_name("FILE")
+        ->check(FileName());
+    command->add_option("--record", options->record, "Write a capture of every exchange here")
+        ->type_name("FILE")
+        ->check(FileName());
+    AddLogOptions(command, &options->log);
+    AddPluginOption(command, &options->plugins);
+    AddAccessOptions(command, &options->access);
+    command
+        ->add_option("--deadline", options->deadlineSeconds,
+                     "Seconds that the whole collection may take")
+        ->type_name("SECONDS")
+        ->check(Seconds(365 * kSecondsPerDay));
+    command->footer(WorkaroundHelp() + kExitStatusHelp);
+    return {command, [options] { return Collect(*options); }};
 }
 
 }  // namespace ipmisel

@@ -3,7 +3,9 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <iterator>
 
+#include "program/commands/arguments.h"
 #include "program/commands/failure.h"
 #include "program/reports/json_text.h"
 #include "program/reports/terminal_text.h"
@@ -13,6 +15,7 @@ namespace {
 
 using NQORTQR20::ILogger;
 
+// In the order of the host's severities.
 constexpr const char* kSeverityNames[] = {"error", "warning", "notice", "info", "trace"};
 
 void WriteToTerminal(ILogger::ETQRLogSeverity severity, std::string_view text) {
@@ -27,9 +30,27 @@ void WriteToTerminal(ILogger::ETQRLogSeverity severity, std::string_view text) {
 
 }  // namespace
 
-LogLines::LogLines(ILogger::ETQRLogSeverity upTo, const std::optional<std::string>& file)
-    : name_(file.value_or("")) {
-    if (file) {
+void AddLogOptions(CLI::App* command, LogOptions* options) {
+    command
+        ->add_option_function<std::string>(
+            "--log-level",
+            [options](const std::string& name) {
+                const auto* const place =
+                    std::find(std::begin(kSeverityNames), std::end(kSeverityNames), name);
+                options->level = static_cast<ILogger::ETQRLogSeverity>(
+                    std::distance(std::begin(kSeverityNames), place));
+            },
+            "What goes to standard error")
+        ->type_name("LEVEL")
+        ->default_str(kSeverityNames[options->level])
+        ->check(OneOf({std::begin(kSeverityNames), std::end(kSeverityNames)}));
+    command->add_option("--log-file", options->file, "Every log line as a JSON object a line")
+        ->type_name("FILE")
+        ->check(FileName());
+}
+
+LogLines::LogLines(const LogOptions& options) : name_(options.file.value_or("")) {
+    if (options.file) {
         file_.reset(std::fopen(name_.c_str(), "we"));
         if (!file_) Fail(name_, errno);
         toFile_ = tqrhost::AddLogConsumer(
@@ -37,7 +58,7 @@ LogLines::LogLines(ILogger::ETQRLogSeverity upTo, const std::optional<std::strin
                 WriteToFile(severity, text);
             });
     }
-    toTerminal_ = tqrhost::AddLogConsumer(upTo, WriteToTerminal);
+    toTerminal_ = tqrhost::AddLogConsumer(options.level, WriteToTerminal);
 }
 
 LogLines::~LogLines() {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <CLI/CLI.hpp>
 #include <cstdio>
 #include <memory>
 #include <optional>
@@ -11,11 +12,19 @@
 
 namespace ipmisel {
 
+struct LogOptions {
+    NQORTQR20::ILogger::ETQRLogSeverity level =
+        NQORTQR20::ILogger::kWarning;  ///< on standard error
+    std::optional<std::string> file;
+};
+/// Adds --log-level and --log-file to a command.
+void AddLogOptions(CLI::App* command, LogOptions* options);
+
 /// Where the log goes while it lives: lines up to a severity to standard error, every line to a
 /// file if one is named. Throws Failure when the file cannot be written.
 class LogLines {
 public:
-    LogLines(NQORTQR20::ILogger::ETQRLogSeverity upTo, const std::optional<std::string>& file);
+    explicit LogLines(const LogOptions& options);
     ~LogLines();
     LogLines(const LogLines&) = delete;
     LogLines& operator=(const LogLines&) = delete;

@@ -1,0 +1,86 @@
+#include "program/commands/access.h"
+
+#include <algorithm>
+
+#include "program/commands/arguments.h"
+#include "program/commands/failure.h"
+#include "program/commands/password.h"
+
+namespace ipmisel {
+
+std::vector<std::string> AccessOptions::Sources() const {
+    return sources.empty() ? std::vector<std::string>{"inband"} : sources;
+}
+
+std::string WorkaroundHelp() {
+    std::string text = "Known deviations of a BMC to put up with (--workaround):\n";
+    for (const tqrhost::WorkaroundInfo& info : tqrhost::KnownWorkarounds()) {
+        text += "  " + std::string(info.name) +
+                std::string(22 - std::min<std::size_t>(20, info.name.size()), ' ') +
+                std::string(info.description) + "\n";
+    }
+    return text;
+}
+
+void AddAccessOptions(CLI::App* command, AccessOptions* options) {
+    command
+        ->add_option("--from", options->sources,
+                     "inband (this machine's BMC, the default), lan:HOST[:PORT], sim:FILE, "
+                     "replay:FILE; several lan: sources are several nodes")
+        ->type_name("SOURCE")
+        ->allow_extra_args(false);
+    command->add_option("--user", options->source.user, "User name at the BMC")->type_name("NAME");
+    command
+        ->add_option("--password-file", options->passwordFile,
+                     "File with the password in its first line; else the environment variable "
+                     "IPMISEL_PASSWORD, else a prompt")
+        ->type_name("FILE")
+        ->check(FileName());
+    command
+        ->add_option("--kg-file", options->kgFile,
+                     "File with the BMC's own key (Kg) in its first line, as text or 0x and "
+                     "hexadecimal digits; else IPMISEL_KG, else none")
+        ->type_name("FILE")
+        ->check(FileName());
+    command
+        ->add_option("--cipher-suite", options->source.cipherSuite,
+                     "Cipher suite by number; 17, else 3 when left out")
+        ->type_name("N")
+        ->check(Number(0, 255));
+    command->add_option("--privilege", options->source.privilege, "Privilege of the session")
+        ->type_name("LEVEL")
+        ->capture_default_str()
+        ->check(OneOf({"user", "operator", "admin"}));
+    command
+        ->add_option("--workaround", options->source.workarounds,
+                     "Deviation of the BMC to put up with; see below")
+        ->type_name("NAME")
+        ->allow_extra_args(false)
+        ->check(OneOf(Names(tqrhost::KnownWorkarounds()), false));
+    command
+        ->add_option("--window", options->source.window,
+                     "Most requests outstanding; adaptive when left out")
+        ->type_name("N")
+        ->check(Number(1, 15));
+    command
+        ->add_option("--timeout", options->source.timeoutSeconds,
+                     "Seconds that one request may go unanswered")
+        ->type_name("SECONDS")
+        ->capture_default_str()
+        ->check(Seconds(kSecondsPerDay));
+}
+
+tqrhost::Source OpenSource(const AccessOptions& options) {
+    tqrhost::SourceOptions access = options.source;
+    access.password = [&options] { return ReadPassword(options.passwordFile); };
+    access.kg = [&options] { return ReadKg(options.kgFile); };
+    try {
+        return tqrhost::OpenSources(options.Sources(), access);
+    } catch (const tqrhost::SourceUsageError& error) {
+        throw Failure(kExitUsage, error.what());
+    } catch (const tqrhost::SourceError& error) {
+        throw Failure(kExitNoSource, error.what());
+    }
+}
+
+}  // namespace ipmisel

@@ -1,0 +1,30 @@
+#pragma once
+
+#include <CLI/CLI.hpp>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "host/spdriver/source.h"
+
+namespace ipmisel {
+
+/// Where the BMCs are and how they are accessed.
+struct AccessOptions {
+    std::vector<std::string> sources;  ///< empty: this machine's BMC
+    std::optional<std::string> passwordFile;
+    std::optional<std::string> kgFile;
+    tqrhost::SourceOptions source;
+
+    /// As the user named them, or the default one.
+    std::vector<std::string> Sources() const;
+};
+
+/// Adds the options to a command, and what there is to say of them at the end of its help.
+void AddAccessOptions(CLI::App* command, AccessOptions* options);
+std::string WorkaroundHelp();
+
+/// Opens the sources; asks for a password where one is needed and not given. Throws Failure.
+tqrhost::Source OpenSource(const AccessOptions& options);
+
+}  // namespace ipmisel

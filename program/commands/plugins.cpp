@@ -1,0 +1,59 @@
+#include "program/commands/plugins.h"
+
+#include <filesystem>
+#include <system_error>
+
+#include "program/commands/arguments.h"
+#include "program/commands/failure.h"
+
+namespace ipmisel {
+namespace {
+
+std::filesystem::path PluginFolder() {
+    std::error_code error;
+    const auto program = std::filesystem::read_symlink("/proc/self/exe", error);
+    return program.parent_path().parent_path() / "lib/ipmisel";
+}
+
+/// Does something with plug-ins; what they are refused for is wrong usage.
+template <typename Work>
+auto WithPlugins(Work work) {
+    try {
+        return work();
+    } catch (const tqrhost::PluginError& error) {
+        throw Failure(kExitUsage, error.what());
+    }
+}
+
+}  // namespace
+
+void AddPluginOption(CLI::App* command, std::vector<std::string>* files) {
+    command->add_option("--plugin", *files, "A plug-in file in addition")
+        ->type_name("FILE")
+        ->allow_extra_args(false)
+        ->check(FileName());
+}
+
+std::unique_ptr<tqrhost::PluginSet> LoadPlugins(const std::vector<std::string>& files) {
+    return WithPlugins([&] {
+        return std::make_unique<tqrhost::PluginSet>(
+            PluginFolder(), std::vector<std::filesystem::path>(files.begin(), files.end()));
+    });
+}
+
+std::vector<std::string> ClassesToCollect(const std::vector<std::string>& named,
+                                          const tqrhost::PluginSet& plugins) {
+    for (const std::string& name : named) {
+        if (plugins.FindClass(name) != nullptr) continue;
+        std::string known;
+        for (const tqrhost::ClassInfo& info : plugins.Classes()) {
+            known += (known.empty() ? "" : ", ") + info.name;
+        }
+        throw Failure(kExitUsage, "there is no class \"" + name + "\"; use one of " + known);
+    }
+    std::vector<std::string> wanted = named.empty() ? plugins.DefaultClasses() : named;
+    WithPlugins([&] { plugins.CheckNeededFiles(wanted); });
+    return wanted;
+}
+
+}  // namespace ipmisel

@@ -1,0 +1,23 @@
+#pragma once
+
+#include <CLI/CLI.hpp>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "host/core/plugin_set.h"
+
+namespace ipmisel {
+
+/// Adds --plugin to a command.
+void AddPluginOption(CLI::App* command, std::vector<std::string>* files);
+
+/// The plug-ins of the program's own folder, and these files. Throws Failure.
+std::unique_ptr<tqrhost::PluginSet> LoadPlugins(const std::vector<std::string>& files);
+
+/// The classes to collect: those that are named, else the default ones; the files that their
+/// plug-ins need are there. Throws Failure.
+std::vector<std::string> ClassesToCollect(const std::vector<std::string>& named,
+                                          const tqrhost::PluginSet& plugins);
+
+}  // namespace ipmisel

@@ -1,0 +1,70 @@
+#include "program/reports/report_sink.h"
+
+#include <algorithm>
+#include <charconv>
+#include <cstdint>
+#include <limits>
+#include <variant>
+
+#include "tqr/classes.h"
+
+namespace ipmisel {
+
+std::optional<std::size_t> NodeOf(const tqrhost::Instance& instance, std::string_view property) {
+    for (const auto& [name, value] : instance.properties) {
+        if (property.empty() || name != property) continue;
+        std::int64_t node = 0;
+        if (const auto* const text = std::get_if<std::string>(&value)) {
+            std::from_chars(text->data(), text->data() + text->size(), node);
+        } else if (const auto* const number = std::get_if<std::int64_t>(&value)) {
+            node = *number;
+        }
+        if (node >= 1) return static_cast<std::size_t>(node - 1);
+    }
+    return std::nullopt;
+}
+
+ReportSink::ReportSink(ReportWriter& report, const tqrhost::PluginSet& plugins,
+                       const std::vector<std::string>& wanted, std::size_t nodes)
+    : report_(report), nodes_(nodes) {
+    for (const std::string& name : wanted) {
+        const tqrhost::ClassInfo* const info = plugins.FindClass(name);
+        if (info == nullptr || !info->Is(NQORTQR20::kPerLogRecord)) continue;
+        Counted& counted = counted_[name];
+        counted.nodeProperty = info->nodeProperty;
+        counted.byNode.resize(nodes);
+        ++counted.times;
+    }
+}
+
+std::vector<unsigned> ReportSink::Exported() const {
+    if (counted_.empty()) return {};
+    std::vector<unsigned> fewest(nodes_, std::numeric_limits<unsigned>::max());
+    for (const auto& [name, counted] : counted_) {
+        for (std::size_t node = 0; node < nodes_; ++node) {
+            fewest[node] = std::min(fewest[node], counted.byNode[node] / counted.times);
+        }
+    }
+    return fewest;
+}
+
+void ReportSink::Check() const {
+    if (failure_) throw Failure(*failure_);
+}
+
+bool ReportSink::Take(const tqrhost::Instance& instance) {
+    if (failure_) return false;
+    try {
+        report_.Add(instance);
+    } catch (const Failure& failure) {
+        failure_ = failure;
+        return false;
+    }
+    if (const auto counted = counted_.find(instance.className); counted != counted_.end()) {
+        const auto node = NodeOf(instance, counted->second.nodeProperty);
+        if (node && *node < nodes_) ++counted->second.byNode[*node];
+    }
+    return true;
+}
+
+}  // namespace ipmisel

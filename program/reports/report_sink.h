@@ -1,0 +1,50 @@
+#pragma once
+
+#include <cstddef>
+#include <functional>
+#include <map>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "host/core/plugin_set.h"
+#include "host/core/sink.h"
+#include "program/commands/failure.h"
+#include "program/reports/report.h"
+
+namespace ipmisel {
+
+/// Takes the instances of a collection to the report and counts log records by node on their way.
+/// Once the report cannot be written, it takes nothing any more.
+class ReportSink : public tqrhost::WholeInstanceSink {
+public:
+    ReportSink(ReportWriter& report, const tqrhost::PluginSet& plugins,
+               const std::vector<std::string>& wanted, std::size_t nodes);
+
+    /// As ReportEnd::exported.
+    std::vector<unsigned> Exported() const;
+    /// Throws what has kept the report from being written. No exception goes through the plug-in.
+    void Check() const;
+
+protected:
+    bool Take(const tqrhost::Instance& instance) override;
+
+private:
+    /// A class with one instance for each log record.
+    struct Counted {
+        std::string nodeProperty;
+        std::vector<unsigned> byNode;
+        unsigned times = 0;  ///< that the user named it: it is collected so often
+    };
+
+    ReportWriter& report_;
+    std::size_t nodes_;
+    std::map<std::string, Counted, std::less<>> counted_;
+    std::optional<Failure> failure_;
+};
+
+/// The node of an instance, from 0, by the property that holds its number from 1; empty when it
+/// belongs to none.
+std::optional<std::size_t> NodeOf(const tqrhost::Instance& instance, std::string_view property);
+
+}  // namespace ipmisel
