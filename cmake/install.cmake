@@ -5,7 +5,7 @@ set_target_properties(tqrcore spdriver smbios PROPERTIES BUILD_WITH_INSTALL_RPAT
 
 install(TARGETS ipmisel RUNTIME DESTINATION bin)
 install(TARGETS tqrcore spdriver smbios LIBRARY DESTINATION lib)
-install(TARGETS ipmisel_plugin LIBRARY DESTINATION lib/ipmisel)
+install(TARGETS ipmisel_plugin ipmistandard_plugin LIBRARY DESTINATION lib/ipmisel)
 install(FILES plugins/ipmisel/texts/ipmisel.INI DESTINATION lib/ipmisel)
 install(FILES README.md CHANGELOG.md LICENSE NOTICE DESTINATION share/doc/ipmisel)
 install(DIRECTORY examples DESTINATION share/doc/ipmisel FILES_MATCHING PATTERN "*.json")

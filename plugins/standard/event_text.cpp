@@ -139,9 +139,7 @@ void SetText(Event* event) {
 }
 
 void SetSentence(Event* event) {
-    std::string subject = PartText(event->part);
-    const std::string sensor = SensorText(*event);
-    if (!sensor.empty()) subject += (subject.empty() ? "" : ", ") + sensor;
+    const std::string subject = SubjectText(*event);
     event->sentence = subject.empty() ? event->text : subject + ": " + event->text;
     const std::string reading = ReadingText(*event);
     if (!reading.empty()) event->sentence += " (" + reading + ')';
@@ -169,6 +167,13 @@ std::string SensorText(const Event& event) {
     const std::string_view type = ipmi::SensorTypeName(event.record.sensorType);
     return std::string(type) + (type.empty() ? "sensor " : " sensor ") +
            ipmisel::HexByte(event.record.sensorNumber);
+}
+
+std::string SubjectText(const Event& event) {
+    const std::string part = PartText(event.part);
+    const std::string sensor = SensorText(event);
+    if (part.empty() || part == sensor) return sensor;
+    return sensor.empty() ? part : part + ", " + sensor;
 }
 
 }  // namespace standard

@@ -36,5 +36,7 @@ std::string PartText(const PartEvidence& evidence);
 /// What an event's sensor is called: its name, else its type and number; empty for a record that is
 /// no sensor event.
 std::string SensorText(const Event& event);
+/// Part and sensor, which stand before what happened; a name that both have once.
+std::string SubjectText(const Event& event);
 
 }  // namespace standard

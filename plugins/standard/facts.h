@@ -21,7 +21,6 @@ struct SensorFacts {
     ipmi::Sensor sensor;
     std::optional<ipmi::SensorReading> reading;
     std::optional<ipmi::SensorThresholds> thresholds;
-    std::optional<ipmi::ReadingFactors> factors;  ///< of a non-linear sensor, at `reading`
 };
 
 /// The controller's clock against the collector's, in seconds.

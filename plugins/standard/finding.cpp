@@ -128,15 +128,8 @@ std::string EvidenceText(const Event& event) {
     return event.time ? TimeText(*event.time) + ": " + event.sentence : event.sentence;
 }
 
-std::string Subject(const Event& event) {
-    std::string subject = PartText(event.part);
-    const std::string sensor = SensorText(event);
-    if (!sensor.empty()) subject += (subject.empty() ? "" : ", ") + sensor;
-    return subject;
-}
-
 std::string TitleOf(const Event& worst, std::size_t count) {
-    std::string title = Subject(worst);
+    std::string title = SubjectText(worst);
     if (!title.empty()) title += ": ";
     title += worst.text;
     if (count > 1) title += " (" + std::to_string(count) + " events)";
@@ -179,7 +172,10 @@ Finding FindingOf(std::span<const Event> events, std::vector<std::size_t> indice
     const std::set<std::size_t> shown{finding.events.front(), worst, finding.events.back()};
     for (const std::size_t i : shown) finding.evidence.push_back(EvidenceText(events[i]));
     const std::size_t others = finding.events.size() - shown.size();
-    if (others > 0) finding.evidence.push_back(std::to_string(others) + " more events like these");
+    if (others > 0) {
+        finding.evidence.push_back(std::to_string(others) + " more event" +
+                                   (others == 1 ? "" : "s"));
+    }
     for (const std::size_t i : finding.events) {
         if (events[i].stillPresent) finding.stillPresent = events[i].stillPresent;
     }

@@ -76,6 +76,19 @@ TEST(EventText, NamesPartSensorReadingAndThreshold) {
     EXPECT_EQ(events[1].threshold, std::nullopt);
 }
 
+TEST(EventText, NamesAPartThatIsCalledAsItsSensorOnceAndNoneOfASoftwareEvent) {
+    LogBuilder log;
+    log.Sensor(0x53, 0x04, 0x04, "Fan 3", {.id = 0x1D, .instance = 3});
+    log.Sensor(0x03, 0x23, 0x6F, "Watchdog", {.id = 0x06, .instance = 1});
+    log.Event(0x04, 0x53, 0x04, {0x01, 0xFF, 0xFF})
+        .Event(0x23, 0x03, kAsserted, {0x01, 0xFF, 0xFF});
+    const auto events = log.Derive();
+    EXPECT_EQ(events[0].sentence, "Fan 3: failure predicted");
+    EXPECT_EQ(events[0].part.parts.size(), 1u);
+    EXPECT_EQ(events[1].sentence, "Watchdog: hard reset by the watchdog");
+    EXPECT_TRUE(events[1].part.parts.empty());
+}
+
 TEST(EventText, TakesASensorByOwnerLunAndNumberNeverByItsNumberAlone) {
     for (const bool otherLun : {false, true}) {
         LogBuilder log;

@@ -40,7 +40,7 @@ TEST(Finding, TenCorrectedErrorsOfOneModuleAreOneWithACount) {
                             "correctable memory error, memory module 4",
                             "2026-03-09T12:00:30Z: Memory sensor 82h: uncorrectable ECC or other "
                             "uncorrectable memory error, memory module 4",
-                            "9 more events like these"));
+                            "9 more events"));
     EXPECT_THAT(findings[1].events, ElementsAre(10));
 }
 

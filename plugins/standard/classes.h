@@ -1,0 +1,29 @@
+#pragma once
+
+#include <string>
+
+#include "plugins/standard/node_pass.h"
+#include "plugins/standard/output.h"
+#include "tqr/classes.h"
+
+namespace standard {
+
+/// A class: how it is declared, and what writes its instances of one node.
+struct ClassEntry {
+    NQORTQR20::fdrClassInfo info;
+    void (*write)(NodePass& pass, Output& output);
+};
+
+/// Null for a class that the plug-in does not have.
+const ClassEntry* FindClass(std::string_view name);
+
+/// Writes Part, PartNumber, SerialNumber and PartCertain, or PartCandidates.
+void WritePart(const PartEvidence& evidence, Output& output);
+/// Name, part number and serial number as far as they are known.
+std::string CandidateText(const Part& part);
+
+// Each stands with the code that writes it.
+extern const ClassEntry kEventClass;
+extern const ClassEntry kFindingClass;
+
+}  // namespace standard

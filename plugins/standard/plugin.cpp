@@ -1,0 +1,90 @@
+#include "plugins/standard/plugin.h"
+
+#include <memory>
+#include <span>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "plugins/standard/classes.h"
+#include "plugins/standard/node_pass.h"
+#include "plugins/standard/output.h"
+#include "tqr/log.h"
+#include "tqr/splibrary.h"
+
+namespace standard {
+
+namespace {
+
+using NQORTQR20::kStatusFailed;
+using NQORTQR20::kStatusOk;
+using NQORTQR20::TCPluginCallbacks;
+using NQORTQR20::TTQRStatusCode;
+
+// The user's own severities, as the host hands them on.
+bool ReadRules(TCPluginCallbacks* context, SeverityRules* rules) {
+    const char* text = nullptr;
+    NQORTQR20::fdrGetOption(context, "severities", &text);
+    if (text == nullptr) return true;
+    const auto problem = SeverityRules::Parse(text, rules);
+    if (!problem) return true;
+    const std::string line =
+        "severities, line " + std::to_string(problem->line) + ": " + problem->text;
+    NQORTQR20::fdrWriteLog(NQORTQR20::ILogger::kError, line.c_str());
+    return false;
+}
+
+std::vector<std::unique_ptr<NodePass>> Nodes(TCPluginCallbacks* context,
+                                             const SeverityRules& rules) {
+    std::vector<std::unique_ptr<NodePass>> nodes;
+    const int count = NQORTQR20::SPLibrary::GetNumberBMCNode();
+    for (int i = 0; i < count; ++i) {
+        NQORTQR20::SPLibrary* const library = NQORTQR20::SPLibrary::GetSplibraryInstance(i);
+        if (library == nullptr) continue;
+        const char* name = nullptr;
+        NQORTQR20::fdrGetSystemName(context, i, &name);
+        nodes.push_back(std::make_unique<NodePass>(static_cast<unsigned>(i) + 1,
+                                                   name == nullptr ? "" : name, *library, rules));
+    }
+    return nodes;
+}
+
+TTQRStatusCode Collect(TCPluginCallbacks* context, Output output,
+                       std::span<const char* const> classNames) {
+    SeverityRules rules;
+    if (!ReadRules(context, &rules)) return {kStatusFailed};
+    const std::vector<std::unique_ptr<NodePass>> nodes = Nodes(context, rules);
+    for (const std::string_view name : classNames) {
+        const ClassEntry* const entry = FindClass(name);
+        if (entry == nullptr) continue;
+        for (const std::unique_ptr<NodePass>& node : nodes) entry->write(*node, output);
+    }
+    return {output.failed() ? kStatusFailed : kStatusOk};
+}
+
+}  // namespace
+
+TTQRStatusCode Initialise(TCPluginCallbacks* /*context*/) { return {kStatusOk}; }
+
+TTQRStatusCode Deinitialise(TCPluginCallbacks* /*context*/) { return {kStatusOk}; }
+
+TTQRStatusCode GetData(TCPluginCallbacks* context, NQORTQR20::fdriIOHandle* output,
+                       const char** classNames, int classCount) {
+    try {
+        const std::size_t count =
+            classNames == nullptr || classCount <= 0 ? 0 : static_cast<std::size_t>(classCount);
+        return Collect(context, Output(output), std::span<const char* const>(classNames, count));
+    } catch (...) {
+        return {kStatusFailed};
+    }
+}
+
+NQORTQR20::fdrPluginInfo GetInfo(TCPluginCallbacks* /*context*/) {
+    return {.name = "IPMISTANDARD",
+            .version = "1.0",
+            .interfaceVersion = "1.1",  // typed properties, options, names of systems
+            .reserved1 = 0,
+            .reserved2 = 0};
+}
+
+}  // namespace standard
