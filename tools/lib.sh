@@ -31,5 +31,7 @@ install_packages() {
         apt-get -qq install --no-install-recommends -y "${missing[@]}" >/dev/null
 }
 
+# What the build needs, its tests need on top, and the tests that compare with other people's programs.
 build_packages=(g++ cmake ninja-build pkg-config libfreeipmi-dev libcli11-dev nlohmann-json3-dev)
-test_packages=(ccache googletest libgcrypt20-dev openipmi ipmitool freeipmi-tools file python3)
+test_packages=(googletest libgcrypt20-dev openipmi python3)
+peer_packages=(ipmitool freeipmi-tools file)
