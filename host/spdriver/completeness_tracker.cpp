@@ -6,9 +6,13 @@
 #include "base/bytes.h"
 #include "base/text.h"
 #include "host/spdriver/stop.h"
+#include "ipmi/sel_info.h"
 
 namespace tqrhost {
 namespace {
+
+/// The log, between two answers of Get SEL Info.
+constexpr const char* kChanged = "the log has changed while it was read";
 
 constexpr std::size_t kMaxFaults = 1000;
 
@@ -96,15 +100,25 @@ void CompletenessTracker::NoteInfo(Source* source, bool askedAgain,
     }
     // A question that was asked again at once and then answered left nothing out.
     if (askedAgain) {
-        std::erase_if(account_.faults,
-                      [&what](const ReadFault& fault) { return fault.what == what; });
+        std::erase_if(account_.faults, [&what](const ReadFault& fault) {
+            return fault.what == what && fault.problem != kChanged;
+        });
     }
+    if (source->isLog) NoteLogState(*response);
     // By the count as it was then; the inventory's walk comes before anybody has asked for it.
     if (source->account->announced) FinishWalk(source);
     ipmisel::ByteReader in(*response);
     in.Skip(kCountAt);
     source->account->announced = in.U16();
     FinishWalk(source);
+}
+
+void CompletenessTracker::NoteLogState(const Response& response) {
+    const auto info = ipmi::ParseSelInfo(std::span(response).subspan(1));
+    if (!info) return;
+    const LogState state{info->records, info->lastAddition, info->lastErase};
+    if (logState_.value_or(state) != state) AddFault({"Get SEL Info", "", kChanged, true});
+    logState_ = state;
 }
 
 void CompletenessTracker::FinishWalk(Source* source) {
@@ -154,8 +168,15 @@ void CompletenessTracker::NoteRecord(Source* source, const RequestFrame& request
     }
     if (offset != 0) return;
     if (source->counted.empty()) source->counted.resize(0x10000);
-    if (!source->counted[record]) ++source->account->read;
-    source->counted[record] = true;
+    // The first and the last record can be asked for without their IDs; each counts once.
+    std::uint16_t own = record;
+    if ((record == ipmi::kFirstRecordId || record == ipmi::kLastRecordId) &&
+        response->size() >= kRecordAt + 2) {
+        own =
+            static_cast<std::uint16_t>(response->at(kRecordAt) | response->at(kRecordAt + 1) << 8);
+    }
+    if (!source->counted[own]) ++source->account->read;
+    source->counted[own] = true;
     if (record == 0) source->walk.fromFirst = true;
     ++source->walk.count;
     // An ID with a byte of 0xFF ends the one walk or the other.

@@ -43,6 +43,7 @@ private:
     };
 
     void NoteInfo(Source* source, bool askedAgain, const std::optional<Response>& response);
+    void NoteLogState(const Response& response);
     /// Judges a walk that is over: a second one that was whole does not make up for it.
     void FinishWalk(Source* source);
     void NoteRecord(Source* source, const RequestFrame& request,
@@ -60,6 +61,13 @@ private:
     Source log_;
     Source sensors_;
     std::uint8_t lastCommand_ = 0;  ///< Storage command
+    /// What of Get SEL Info tells that the log has changed.
+    struct LogState {
+        std::uint16_t records;
+        std::uint32_t lastAddition, lastErase;
+        bool operator==(const LogState&) const = default;
+    };
+    std::optional<LogState> logState_;
 };
 
 }  // namespace tqrhost

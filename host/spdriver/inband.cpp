@@ -38,7 +38,7 @@ std::unique_ptr<Transport> OpenDevice(const std::filesystem::path& device) {
                              IPMI_WORKAROUND_FLAGS_DEFAULT, IPMI_FLAGS_DEFAULT) < 0) {
         throw SourceError(ErrorAdvice(device.string(), ipmi_ctx_errnum(context.get())));
     }
-    return std::make_unique<StopGate>(std::make_unique<FreeIpmiTransport>(std::move(context)));
+    return std::make_unique<FreeIpmiTransport>(std::move(context));
 }
 
 }  // namespace
@@ -53,7 +53,8 @@ Source OpenInbandDevice(const std::vector<std::filesystem::path>& devices,
         return std::filesystem::exists(path, error);
     });
     if (device != devices.end()) {
-        source.nodes.push_back({"inband", OpenDevice(*device), nullptr});
+        source.nodes.push_back(
+            {"inband", nullptr, std::make_unique<SerialPipeline>(OpenDevice(*device))});
     } else if (HasIpmiDevice(source.facts.smbios)) {
         source.facts.ipmiDriver = false;
         source.nodes.push_back({"inband", std::make_unique<SilentTransport>(), nullptr});

@@ -14,7 +14,6 @@
 #include "host/spdriver/freeipmi_context.h"
 #include "host/spdriver/kinds.h"
 #include "host/spdriver/lan_session.h"
-#include "host/spdriver/stop_gate.h"
 
 namespace tqrhost {
 namespace {
@@ -209,7 +208,7 @@ std::unique_ptr<Transport> OpenWithFreeIpmi(const Session& session) {
         if (!SuiteIsMissing(error)) break;
     }
     if (error != IPMI_ERR_SUCCESS) throw SourceError(ErrorAdvice("lan:" + session.place, error));
-    return std::make_unique<StopGate>(std::make_unique<FreeIpmiTransport>(std::move(context)));
+    return std::make_unique<FreeIpmiTransport>(std::move(context));
 }
 
 /// Our own session, which keeps several requests outstanding.
@@ -260,14 +259,15 @@ Source OpenLan(const std::vector<std::string>& places, const SourceOptions& opti
     for (const std::string& place : places) {
         const Session session = MakeSession(place, options);
         if (NeedsFreeIpmi(session)) {
-            source.nodes.push_back({"lan:" + place, OpenWithFreeIpmi(session), nullptr});
+            source.nodes.push_back({"lan:" + place, nullptr,
+                                    std::make_unique<SerialPipeline>(OpenWithFreeIpmi(session))});
             continue;
         }
         std::unique_ptr<LanSession> own = BeginOwn(session);
         opening.push_back(own.get());
         source.nodes.push_back(
-            {"lan:" + place,
-             std::make_unique<StopGate>(std::make_unique<LanTransport>(std::move(own))), nullptr});
+            {"lan:" + place, nullptr,
+             std::make_unique<SerialPipeline>(std::make_unique<LanTransport>(std::move(own)))});
     }
     LanSession::OpenAll(opening);
     return source;

@@ -54,6 +54,9 @@ struct SourceNode {
     std::string name;                           ///< the source as the user wrote it
     std::unique_ptr<Transport> transport;       ///< each request is answered by itself
     std::unique_ptr<RequestPipeline> pipeline;  ///< a live BMC, which is read ahead
+    /// The pass is over; whether Get SEL Info is to be asked a last time, since the log is known to
+    /// have changed after it was read. Null for never.
+    std::function<bool()> endPass = {};
 };
 
 /// A node that could not be opened.
@@ -78,6 +81,8 @@ Source OpenSources(const std::vector<std::string>& sources, const SourceOptions&
 /// Makes the nodes and facts of a source the machine that SPLibrary and the core speak of; until
 /// the next call, or CloseMachine.
 void OpenMachine(Source source);
+/// The pass over the open machine is over: what is still to be seen of its nodes is asked for.
+void EndPass();
 void CloseMachine();
 
 }  // namespace tqrhost

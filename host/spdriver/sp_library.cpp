@@ -36,7 +36,15 @@ constexpr std::size_t kResponseAt = 8;
 struct OpenNode {
     std::string source;
     std::unique_ptr<NQORTQR20::SPLibrary> library;
+    std::function<bool()> endPass;
 };
+constexpr std::size_t kTransferBuffer = 256;
+
+std::vector<unsigned char> FrameOf(const ipmi::Command& command) {
+    const RequestFrame frame(command);
+    return {frame.bytes().begin(), frame.bytes().end()};
+}
+
 std::vector<OpenNode>& Nodes() {
     static std::vector<OpenNode> nodes;
     return nodes;
@@ -51,9 +59,20 @@ void OpenMachine(Source source) {
         if (node.pipeline) {
             node.transport = std::make_unique<PipelineTransport>(std::move(node.pipeline));
         }
-        Nodes().push_back({std::move(node.name),
-                           std::make_unique<NQORTQR20::SPLibrary>(
-                               std::move(node.transport), GetMachineFacts().integratedBmc)});
+        auto library = std::make_unique<NQORTQR20::SPLibrary>(std::move(node.transport),
+                                                              GetMachineFacts().integratedBmc);
+        Nodes().push_back({std::move(node.name), std::move(library), std::move(node.endPass)});
+    }
+}
+
+void EndPass() {
+    for (const OpenNode& node : Nodes()) {
+        if (!node.endPass || !node.endPass()) continue;
+        std::vector<unsigned char> buffer = FrameOf(ipmi::GetSelInfo());
+        buffer.resize(kTransferBuffer);
+        int length = 0;
+        node.library->sendIPMICommand(buffer.data(), &length, static_cast<int>(buffer.size()),
+                                      true);
     }
 }
 

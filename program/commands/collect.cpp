@@ -15,6 +15,7 @@
 #include "host/core/plugin_set.h"
 #include "host/spdriver/capture.h"
 #include "host/spdriver/completeness.h"
+#include "host/spdriver/reading.h"
 #include "host/spdriver/source.h"
 #include "host/spdriver/stop.h"
 #include "program/commands/access.h"
@@ -71,8 +72,6 @@ struct Machine {
     Machine& operator=(const Machine&) = delete;
 };
 
-bool GoesOn() { return tqrhost::Stopped() == tqrhost::StopReason::kNone; }
-
 std::shared_ptr<tqrhost::CaptureWriter> Record(const CollectOptions& options,
                                                tqrhost::Source& source) {
     if (!options.record) return nullptr;
@@ -81,6 +80,19 @@ std::shared_ptr<tqrhost::CaptureWriter> Record(const CollectOptions& options,
     } catch (const tqrhost::SourceError& error) {
         throw Failure(kExitUsage, error.what());
     }
+}
+
+/// What the host has to read of every node for the classes.
+tqrhost::ReadingNeeds NeedsOf(const std::vector<std::string>& wanted,
+                              const tqrhost::PluginSet& plugins) {
+    tqrhost::ReadingNeeds needs{false, false};
+    for (const std::string& name : wanted) {
+        const tqrhost::ClassInfo* const info = plugins.FindClass(name);
+        if (info == nullptr) continue;
+        needs.log |= info->Is(NQORTQR20::kReadsLog);
+        needs.sensors |= info->Is(NQORTQR20::kReadsSensors);
+    }
+    return needs;
 }
 
 /// One for each node. The nodes of lan: sources follow each other as they were named.
@@ -116,6 +128,8 @@ int CollectTo(const CollectOptions& options, OutputFile& output) {
     const std::unique_ptr<tqrhost::PluginSet> plugins = LoadPlugins(options.plugins);
     const std::vector<std::string> wanted = ClassesToCollect(options.classes, *plugins);
     tqrhost::Source source = OpenSource(options.access);
+    StopSignals::BeginCollecting();
+    tqrhost::ReadLiveNodes(source, NeedsOf(wanted, *plugins));
     const std::shared_ptr<tqrhost::CaptureWriter> capture = Record(options, source);
     const Machine machine(std::move(source));
 
@@ -140,9 +154,9 @@ int CollectTo(const CollectOptions& options, OutputFile& output) {
     ReportSink sink(*report, *plugins, wanted, nodes);
     tqrhost::CollectionPlan plan(*plugins, wanted);
     ReportEnd end;
-    StopSignals::BeginCollecting();
-    plan.RunPasses(sink, GoesOn);
+    plan.RunPasses(sink);
     if (HasBmc()) plan.RunExporters(sink);
+    tqrhost::EndPass();
     StopSignals::EndCollecting();
     sink.Check();
     end.stopped = tqrhost::Stopped();

@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "host/spdriver/capture.h"
+#include "host/spdriver/reading.h"
 #include "host/spdriver/stop.h"
 #include "simulator/network_bmc.h"
 #include "simulator/server_file.h"
@@ -72,6 +73,7 @@ protected:
         source.facts = {server.machineType, server.integratedBmc, server.ipmiDriver,
                         server.ipmiLan,     server.localTime,     server.smbios};
         const std::string file = (folder_.path() / "capture").string();
+        tqrhost::ReadLiveNodes(source, {});
         const auto capture = tqrhost::RecordTo(file, source);
         ipmisel::ResetModuleState();
         IPMISELPluginInit(context.get());

@@ -1,0 +1,33 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <optional>
+
+#include "host/spdriver/record_store.h"
+#include "host/spdriver/transport.h"
+#include "ipmi/command.h"
+
+namespace tqrhost {
+
+/// What was read of one controller before the plug-ins' pass: its event log and its sensor
+/// repository, in one state for all who ask.
+struct ControllerMemory {
+    /// Answers of Get SEL Info, Get SDR Repository Info and Reserve SDR Repository; empty where
+    /// they were not asked for or refused.
+    std::optional<Response> logInfo;
+    std::optional<Response> sensorInfo;
+    std::optional<Response> reservation;
+    /// What a log without records answers for the first one.
+    std::optional<Response> emptyLog;
+    std::unique_ptr<RecordStore> log;
+    std::unique_ptr<RecordStore> sensors;
+    /// The log has changed while it was read, and once more while it was read again: the last
+    /// answer of Get SEL Info, or nothing when that could not be had. Otherwise not set.
+    std::optional<std::optional<Response>> laterLogInfo;
+
+    /// What the controller would answer; empty when it has to be asked.
+    std::optional<Response> Answer(const ipmi::Command& command) const;
+};
+
+}  // namespace tqrhost

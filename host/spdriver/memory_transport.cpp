@@ -1,0 +1,128 @@
+#include "host/spdriver/memory_transport.h"
+
+#include <algorithm>
+#include <chrono>
+#include <cstddef>
+#include <utility>
+
+#include "base/text.h"
+#include "host/spdriver/stop.h"
+#include "tqr/log.h"
+
+namespace tqrhost {
+namespace {
+
+/// A reading older than this is asked for again.
+constexpr auto kMaxAge = std::chrono::seconds(5);
+
+/// Predictions that nobody has asked for; those beyond are forgotten.
+constexpr std::size_t kMaxAhead = 256;
+
+/// A read of a part of a sensor record under a reservation.
+bool ReadsPartUnder(const Response& reservation, const ipmi::Command& command) {
+    constexpr std::size_t kReadLength = 6;
+    return command.code() == ipmi::kGetSdr && command.data.size() == kReadLength &&
+           command.data[4] != 0 && reservation.size() >= 3 &&
+           std::equal(command.data.begin(), command.data.begin() + 2, reservation.begin() + 1);
+}
+
+void LogNoResponse(const ipmi::Command& command) {
+    using NQORTQR20::ILogger;
+    if (!NQORTQR20::fdrLogEnabled(ILogger::kNotice) || Stopped() != StopReason::kNone) return;
+    NQORTQR20::fdrWriteLog(
+        ILogger::kNotice,
+        ipmisel::Format("No response to NetFn 0x%02x command 0x%02x: the BMC does not answer.",
+                        command.netFn, command.command)
+            .c_str());
+}
+
+}  // namespace
+
+MemoryTransport::MemoryTransport(std::unique_ptr<RequestPipeline> pipeline, ControllerMemory memory)
+    : pipeline_(std::move(pipeline)), memory_(std::move(memory)) {
+    predictor_.SetSensors(memory_.sensors.get());
+}
+
+std::optional<Response> MemoryTransport::Exchange(const RequestFrame& request) {
+    const ipmi::Command command = request.ToCommand();
+    if (auto remembered = memory_.Answer(command)) return remembered;
+    auto response = ExchangeLive(command);
+    if (response && response->front() == ipmi::kReservationCanceled && memory_.reservation &&
+        ReadsPartUnder(*memory_.reservation, command)) {
+        response = ReadUnderNewReservation(command);
+    }
+    return response;
+}
+
+bool MemoryTransport::EndPass() {
+    if (!memory_.laterLogInfo) return false;
+    memory_.logInfo = *std::exchange(memory_.laterLogInfo, std::nullopt);
+    return true;
+}
+
+std::optional<Response> MemoryTransport::ExchangeLive(const ipmi::Command& command) {
+    if (Stopped() != StopReason::kNone) return std::nullopt;
+    predictor_.Asked(command);
+    std::optional<Response> response = TakeAhead(command);
+    if (!response) {
+        const auto answer = std::make_shared<Ahead>();
+        pipeline_->Submit(command, [answer](std::optional<Response> got) {
+            answer->came = true;
+            answer->response = std::move(got);
+        });
+        AskAhead();
+        RequestPipeline* const pipelines[] = {pipeline_.get()};
+        RunPipelines(pipelines, [&answer] { return answer->came; });
+        response = std::move(answer->response);
+        if (response && response->empty()) response.reset();
+    } else {
+        AskAhead();
+    }
+    if (response) {
+        predictor_.Answered(command, *response);
+    } else {
+        LogNoResponse(command);
+    }
+    return response;
+}
+
+std::optional<Response> MemoryTransport::TakeAhead(const ipmi::Command& command) {
+    const auto found = ahead_.find(command);
+    if (found == ahead_.end()) return std::nullopt;
+    const std::shared_ptr<Ahead> ahead = std::move(found->second);
+    ahead_.erase(found);
+    RequestPipeline* const pipelines[] = {pipeline_.get()};
+    RunPipelines(pipelines, [&ahead] { return ahead->came; });
+    const bool good = ahead->response && !ahead->response->empty() &&
+                      ahead->response->front() == ipmi::kCompleted &&
+                      Clock::now() - ahead->at <= kMaxAge;
+    return good ? std::move(ahead->response) : std::nullopt;
+}
+
+void MemoryTransport::AskAhead() {
+    if (ahead_.size() > kMaxAhead) {
+        std::erase_if(ahead_, [](const auto& one) { return one.second->came; });
+    }
+    for (ipmi::Command& command : predictor_.Next(pipeline_->Room())) {
+        if (ahead_.contains(command)) continue;
+        const auto ahead = std::make_shared<Ahead>();
+        ahead_.emplace(command, ahead);
+        pipeline_->Submit(std::move(command), [ahead](std::optional<Response> response) {
+            ahead->came = true;
+            ahead->at = Clock::now();
+            ahead->response = std::move(response);
+        });
+    }
+}
+
+std::optional<Response> MemoryTransport::ReadUnderNewReservation(ipmi::Command command) {
+    const auto reservation = ExchangeOver(*pipeline_, ipmi::ReserveSdrRepository());
+    if (!reservation || reservation->size() < 3 || reservation->front() != ipmi::kCompleted) {
+        return Response{ipmi::kReservationCanceled};
+    }
+    command.data[0] = reservation->at(1);
+    command.data[1] = reservation->at(2);
+    return ExchangeOver(*pipeline_, std::move(command));
+}
+
+}  // namespace tqrhost

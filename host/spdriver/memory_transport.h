@@ -1,0 +1,48 @@
+#pragma once
+
+#include <map>
+#include <memory>
+#include <optional>
+
+#include "host/spdriver/command_predictor.h"
+#include "host/spdriver/controller_memory.h"
+#include "host/spdriver/pipeline.h"
+#include "host/spdriver/transport.h"
+
+namespace tqrhost {
+
+/// Answers from what was read of a controller before; what is not in there goes to the controller,
+/// with what will probably be asked next behind it. A prediction's answer counts only when it is a
+/// good one, so that the reader sees what it would have seen without.
+class MemoryTransport : public Transport {
+public:
+    MemoryTransport(std::unique_ptr<RequestPipeline> pipeline, ControllerMemory memory);
+    std::optional<Response> Exchange(const RequestFrame& request) override;
+    /// The pass is over. Whether the log is known to have changed since it was read: from now on
+    /// Get SEL Info is answered with the later state.
+    bool EndPass();
+
+private:
+    using Clock = RequestPipeline::Clock;
+    struct Ahead {
+        bool came = false;
+        Clock::time_point at;  ///< when it came
+        std::optional<Response> response;
+    };
+
+    std::optional<Response> ExchangeLive(const ipmi::Command& command);
+    /// A prediction's answer, waited for if it is on its way; empty when there is none, or no good
+    /// one.
+    std::optional<Response> TakeAhead(const ipmi::Command& command);
+    void AskAhead();
+    /// A part of a record is refused because the controller holds the reservation from the reading
+    /// no longer: the reader could not know, so a new one is taken for it.
+    std::optional<Response> ReadUnderNewReservation(ipmi::Command command);
+
+    std::unique_ptr<RequestPipeline> pipeline_;
+    ControllerMemory memory_;
+    CommandPredictor predictor_;
+    std::map<ipmi::Command, std::shared_ptr<Ahead>> ahead_;
+};
+
+}  // namespace tqrhost

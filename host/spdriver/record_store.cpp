@@ -1,0 +1,46 @@
+#include "host/spdriver/record_store.h"
+
+#include <algorithm>
+
+#include "base/bytes.h"
+
+namespace tqrhost {
+namespace {
+
+constexpr std::size_t kBlock = std::size_t{1} << 16;
+constexpr std::size_t kMaxRecord = 5 + 255;  // header, and what its length byte can count
+constexpr std::size_t kIds = 0x10000;
+
+}  // namespace
+
+bool RecordStore::Add(std::uint16_t id, std::uint16_t next, std::span<const std::uint8_t> bytes) {
+    if (bytes.size() > kMaxRecord || entries_.size() >= kIds) return false;
+    if (Find(id)) return true;
+    if (used_ % kBlock + bytes.size() > kBlock) used_ += kBlock - used_ % kBlock;
+    if (used_ + bytes.size() > kMaxBytes) return false;
+    if (used_ / kBlock >= blocks_.size())
+        blocks_.push_back(std::make_unique<std::uint8_t[]>(kBlock));
+    std::copy(bytes.begin(), bytes.end(), blocks_[used_ / kBlock].get() + used_ % kBlock);
+    entries_.push_back(
+        {static_cast<std::uint32_t>(used_), static_cast<std::uint16_t>(bytes.size()), next});
+    used_ += bytes.size();
+    if (index_.empty()) index_.resize(kIds);
+    index_[id] = static_cast<std::uint32_t>(entries_.size());
+    ipmisel::ByteReader in(bytes);
+    const std::uint16_t own = in.U16();
+    if (entries_.size() == 1 && in.ok()) index_[own] = 1;
+    return true;
+}
+
+std::optional<RecordStore::Record> RecordStore::Find(std::uint16_t id) const {
+    if (index_.empty() || index_[id] == 0) return std::nullopt;
+    return At(index_[id] - 1);
+}
+
+RecordStore::Record RecordStore::At(std::size_t position) const {
+    const Entry& entry = entries_.at(position);
+    if (entry.length == 0) return {entry.next, {}};
+    return {entry.next, {blocks_[entry.at / kBlock].get() + entry.at % kBlock, entry.length}};
+}
+
+}  // namespace tqrhost
