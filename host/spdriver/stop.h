@@ -16,6 +16,8 @@ void StopNow();
 void ClearStop();
 
 StopReason Stopped();
+/// Whether it is so long ago that the collection was to stop.
+bool StoppedFor(std::chrono::steady_clock::duration time);
 /// The deadline, or a far time: for waits that must not outlast it.
 std::chrono::steady_clock::time_point StopTime();
 

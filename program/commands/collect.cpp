@@ -154,7 +154,7 @@ int CollectTo(const CollectOptions& options, OutputFile& output) {
     ReportSink sink(*report, *plugins, wanted, nodes);
     tqrhost::CollectionPlan plan(*plugins, wanted);
     ReportEnd end;
-    plan.RunPasses(sink);
+    plan.RunPasses(sink, [] { return !OutputIsOver(); });
     if (HasBmc()) plan.RunExporters(sink);
     tqrhost::EndPass();
     StopSignals::EndCollecting();

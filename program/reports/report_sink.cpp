@@ -2,10 +2,12 @@
 
 #include <algorithm>
 #include <charconv>
+#include <chrono>
 #include <cstdint>
 #include <limits>
 #include <variant>
 
+#include "host/spdriver/stop.h"
 #include "tqr/classes.h"
 
 namespace ipmisel {
@@ -52,8 +54,13 @@ void ReportSink::Check() const {
     if (failure_) throw Failure(*failure_);
 }
 
+bool OutputIsOver() {
+    constexpr auto kTimeToExport = std::chrono::milliseconds(800);
+    return tqrhost::StoppedFor(kTimeToExport);
+}
+
 bool ReportSink::Take(const tqrhost::Instance& instance) {
-    if (failure_) return false;
+    if (failure_ || OutputIsOver()) return false;
     try {
         report_.Add(instance);
     } catch (const Failure& failure) {

@@ -14,6 +14,10 @@
 
 namespace ipmisel {
 
+/// The collection was stopped, and the time that is left for what had been read until then is over: no
+/// instance is taken any more.
+bool OutputIsOver();
+
 /// Takes the instances of a collection to the report and counts log records by node on their way.
 /// Once the report cannot be written, it takes nothing any more.
 class ReportSink : public tqrhost::WholeInstanceSink {
