@@ -88,7 +88,7 @@ bool AddLocated(const FruNode& node, const IPMIFRULocator& locator, IPMIVPDEntry
 bool ExportLocated(const FruNode& node, IPMIRequestFRULocator* request, IPMIFRULocator& locator,
                    IPMIVPDEntry* collector) {
     const std::string idString = locator.GetIDString();
-    const bool skipped = IsSkippedFru(idString);
+    const bool skipped = IsPassedOver(idString);
     if (!skipped) {
         request->IPMIGetFRUData(node.context, &locator, false);  // what it has read counts
         if (LogEnabled(kInfo)) {
@@ -107,16 +107,7 @@ bool HasData(const IPMIFRULocator& locator) {
     return std::any_of(data.begin(), data.end(), [](std::uint8_t byte) { return byte != 0; });
 }
 
-/// Processors and their card seldom have readable strings: that they have an inventory is enough.
-bool IsToldWithoutStrings(std::string_view name) { return name == "CPU Card" || name == "CPU"; }
-
 }  // namespace
-
-bool IsSkippedFru(std::string_view idString) {
-    constexpr std::array<std::string_view, 4> kSkipped{"BPE3", "BSE3", "HSDC", "DC1"};
-    return std::find(kSkipped.begin(), kSkipped.end(), idString) != kSkipped.end() ||
-           idString.find("Processor") != std::string_view::npos;
-}
 
 bool ExportFruDeviceZero(NQORTQR20::TCPluginCallbacks* context, IPMIRequestFRULocator* request,
                          IPMIVPDEntry* collector) {
@@ -147,7 +138,7 @@ void ExportListedFrus(const FruNode& node, IPMIRequestVPD* request,
         IPMIFRULocator data;
         request->IPMIGetVPDEntryData(node.context, device, &data);  // what it has read counts
         const Strings strings = StringsOf(data);
-        if (!IsAcceptable(strings) && !(IsToldWithoutStrings(device.name) && HasData(data))) {
+        if (!IsAcceptable(strings) && !(device.listedWithoutStrings && HasData(data))) {
             continue;
         }
         AddName(node, Format("Node:%d ", node.number), device.name, collector);

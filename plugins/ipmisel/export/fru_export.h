@@ -24,9 +24,6 @@ struct FruNode {
     int count;   ///< of all nodes; with several, names tell the node
 };
 
-/// Whether a located device is left out, by the ID string of its locator.
-bool IsSkippedFru(std::string_view idString);
-
 /// Device 0 of the node that the request goes to. It is read in any case; false when there is no
 /// collector to take it.
 bool ExportFruDeviceZero(NQORTQR20::TCPluginCallbacks* context, IPMIRequestFRULocator* request,

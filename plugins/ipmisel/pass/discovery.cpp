@@ -11,6 +11,7 @@
 #include "base/text.h"
 #include "plugins/ipmisel/log.h"
 #include "plugins/ipmisel/pass/state.h"
+#include "plugins/ipmisel/texts/machine_families.h"
 #include "tqr/datetime.h"
 #include "tqr/log.h"
 #include "tqr/smbios.h"
@@ -176,10 +177,9 @@ std::string DiscoverFirmwareRelease(TCPluginCallbacks* context) {
 }
 
 bool IPMIselHasTSB2onBoardsmBios() {
-    constexpr std::string_view kAdapter = "TSB II";
-    return ipmisel::AnyStringHas(ipmisel::kOnBoardDevices, kAdapter) ||
-           ipmisel::AnyStringHas(ipmisel::kOnBoardDevicesExtended, kAdapter) ||
-           ipmisel::AnyStringHas(ipmisel::kOemStrings, kAdapter);
+    return ipmisel::AnyStringHas(ipmisel::kOnBoardDevices, ipmisel::kSupervisorAdapter) ||
+           ipmisel::AnyStringHas(ipmisel::kOnBoardDevicesExtended, ipmisel::kSupervisorAdapter) ||
+           ipmisel::AnyStringHas(ipmisel::kOemStrings, ipmisel::kSupervisorAdapter);
 }
 
 bool DiscoverQORSP6WDriver() { return ipmisel::DriverIsMissing(); }

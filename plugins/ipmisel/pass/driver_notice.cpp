@@ -1,16 +1,13 @@
 #include "plugins/ipmisel/pass/driver_notice.h"
 
-#include <algorithm>
 #include <array>
 #include <cstdlib>
 
 #include "plugins/ipmisel/pass/discovery.h"
+#include "plugins/ipmisel/texts/machine_families.h"
 
 namespace ipmisel {
 namespace {
-
-// Models that are run without a display.
-constexpr std::array<std::string_view, 2> kHeadlessMachines{"Merrowgate", "Zorvanek"};
 
 constexpr std::string_view kDriverDocumentation = "https://docs.kernel.org/driver-api/ipmi.html";
 
@@ -57,8 +54,8 @@ bool IsBootableMedium() {
 }  // namespace
 
 bool ShowsLinks(const NoticeSetting& setting) {
-    const bool headless = std::find(kHeadlessMachines.begin(), kHeadlessMachines.end(),
-                                    setting.machineType) != kHeadlessMachines.end();
+    const MachineFamily* const family = FindMachineFamily(setting.machineType);
+    const bool headless = family != nullptr && family->headless;
     return !setting.bootableMedium && !headless && !setting.supervisorAdapter;
 }
 

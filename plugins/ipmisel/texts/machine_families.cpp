@@ -12,8 +12,8 @@ using std::string_view;
 
 constexpr std::array<string_view, 1> kSimTypes{"SIM-1"};
 
-constexpr std::array<VpdDevice, 6> kSimDevices{{{"CPU Card", 1},
-                                                {"CPU", 2},
+constexpr std::array<VpdDevice, 6> kSimDevices{{{"CPU Card", 1, true},
+                                                {"CPU", 2, true},
                                                 {"System Board", 0},
                                                 {"Memory Card 1", 3},
                                                 {"Power Supply 1", 4},
@@ -104,14 +104,15 @@ constexpr std::array<string_view, 1> kMerrowgateTypes{"Merrowgate"};
 
 constexpr std::array<MachineFamily, 3> kFamilies{{
     {"Simulated server", kSimTypes, kSimDevices, kSimDetails, kSimQueries},
-    {"Zorvanek", kZorvanekTypes, {}, {}, kZorvanekQueries},
+    {"Zorvanek", kZorvanekTypes, {}, {}, kZorvanekQueries, kNoVpdDeviceList, true},
     {"Merrowgate",
      kMerrowgateTypes,
      {},
      {},
      {},
      "Could not find vital product data Device list for Baseboard Management Controller machine on "
-     "Merrowgate"},
+     "Merrowgate",
+     true},
 }};
 
 }  // namespace
@@ -125,6 +126,12 @@ const MachineFamily* FindMachineFamily(string_view machineType, int* index) {
     if (found == kFamilies.end()) return nullptr;
     if (index != nullptr) *index = static_cast<int>(found - kFamilies.begin());
     return found;
+}
+
+bool IsPassedOver(string_view idString) {
+    constexpr std::array<string_view, 4> kBoards{"BPE3", "BSE3", "HSDC", "DC1"};
+    return std::find(kBoards.begin(), kBoards.end(), idString) != kBoards.end() ||
+           idString.find("Processor") != string_view::npos;
 }
 
 }  // namespace ipmisel

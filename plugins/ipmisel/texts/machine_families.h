@@ -13,6 +13,8 @@ namespace ipmisel {
 struct VpdDevice {
     std::string_view name;
     std::uint8_t fruDevice;  ///< FRU device ID on the BMC
+    /// Listed as soon as it has an inventory: it seldom has readable strings.
+    bool listedWithoutStrings = false;
 };
 
 /// Which event data bytes an OEM detail is taken from. A byte that event data 1 does not declare as
@@ -69,10 +71,18 @@ struct MachineFamily {
     std::span<const OemDetail> oemDetails;
     std::span<const FirmwareQuery> firmwareQueries;
     std::string_view noVpdDeviceList = kNoVpdDeviceList;
+    bool headless = false;  ///< its models are run without a display
 };
 
 /// The family of a machine type, compared as a whole; null when there is none. `index`, when given,
 /// becomes the family's place in the table; it is left alone when there is none.
 const MachineFamily* FindMachineFamily(std::string_view machineType, int* index = nullptr);
+
+/// Whether the inventory passes over a located device, by its ID string: boards of several families
+/// and processors.
+bool IsPassedOver(std::string_view idString);
+
+/// A supervisor adapter on board, which forwards text, is named so in SMBIOS.
+inline constexpr std::string_view kSupervisorAdapter = "TSB II";
 
 }  // namespace ipmisel

@@ -124,7 +124,7 @@ TEST_F(FruExport, ListedDevices) {
     processor[17] = 0x42;
     bmc.fru = {{0, FixedLayout("Maker", "Board", "S-0")}, {2, processor}, {4, processor}};
     const auto instances =
-        Listed({{"CPU", 2}, {"System Board", 0}, {"Absent", 3}, {"Supply", 4}, {"CPU", 5}});
+        Listed({{"CPU", 2, true}, {"System Board", 0}, {"Absent", 3}, {"Supply", 4}, {"CPU", 5}});
     EXPECT_THAT(instances, ElementsAre(PropertyMap{{"ElementName", "CPU"},
                                                    {"Status", "NORMAL"},
                                                    {"FRUNumber", " "},
@@ -137,7 +137,7 @@ TEST_F(FruExport, ListedDevices) {
                                                    {"FRUNumber", " "},
                                                    {"IdentifyingNumber", " "}}));
     node = {nullptr, 1, 2};
-    EXPECT_EQ(Listed({{"CPU Card", 2}})[0][0].second, "Node:1 CPU Card");
+    EXPECT_EQ(Listed({{"CPU Card", 2, true}})[0][0].second, "Node:1 CPU Card");
 }
 
 }  // namespace
