@@ -225,8 +225,13 @@ private:
         taken3_ = true;
         return record_.data[2];
     }
-    bool Extends2() const { return UseOfData2(record_) == DataUse::kExtension; }
-    bool Extends3() const { return UseOfData3(record_) == DataUse::kExtension; }
+    // FFh is unspecified, whatever event data 1 says of the byte (table 29-6).
+    bool Extends2() const {
+        return UseOfData2(record_) == DataUse::kExtension && record_.data[1] != kUnspecifiedByte;
+    }
+    bool Extends3() const {
+        return UseOfData3(record_) == DataUse::kExtension && record_.data[2] != kUnspecifiedByte;
+    }
     void Say(std::string_view words) {
         if (!words.empty()) out_.words.emplace_back(words);
     }
@@ -237,7 +242,7 @@ private:
     void SayCode(Words words, std::uint8_t code) {
         if (code < words.size()) {
             Say(words[code]);
-        } else if (code != kUnspecifiedByte) {
+        } else {
             Say("code " + ipmisel::HexByte(code));
         }
     }
@@ -249,7 +254,7 @@ private:
     void SeverityAndPreviousState() {
         const std::uint8_t byte = Data2();
         if (High(byte) != kUnspecifiedNibble) {
-            Say("severity: ", EventOffsetText(kSeverityEvents, 0, High(byte)));
+            Say("severity by the sensor: ", EventOffsetText(kSeverityEvents, 0, High(byte)));
         }
         if (Low(byte) != kUnspecifiedNibble) {
             Say("previously: ", EventOffsetText(record_.eventType, record_.sensorType, Low(byte)));
@@ -257,7 +262,6 @@ private:
     }
 
     void MemoryModule(std::uint8_t number) {
-        if (number == kUnspecifiedByte) return;
         out_.memoryModule = number;
         SayNumber("memory module ", number);
     }
@@ -348,8 +352,7 @@ private:
             out_.slotType = Data2() & 0x7F;
         }
         if (Extends3()) {
-            const std::uint8_t number = Data3();
-            if (number != kUnspecifiedByte) out_.slotNumber = number;
+            out_.slotNumber = Data3();
         }
         std::string words(out_.slotType ? At(kSlotTypes, *out_.slotType) : std::string_view());
         if (out_.slotNumber) {
@@ -366,7 +369,6 @@ private:
         const std::uint8_t offset = record_.offset();
         if ((offset == kSensorFailed || offset == kSensorAccess) && Extends2()) {
             const std::uint8_t number = Data2();
-            if (number == kUnspecifiedByte) return;
             out_.sensorNumber = number;
             Say("sensor " + ipmisel::HexByte(number));
         }
@@ -378,7 +380,7 @@ private:
         const std::uint8_t device = Data3();
         if (!logical) {
             Say("device at address " + ipmisel::HexByte(device & 0xFE));
-        } else if (device != kUnspecifiedByte) {
+        } else {
             out_.fruDevice = device;
             SayNumber("FRU device ", device);
         }
@@ -470,7 +472,6 @@ private:
         Say(label, EventOffsetText(kSensorSpecificEvents, sensor_type::kAcpiPowerState, state));
     }
 
-    // FFh is unspecified, whatever event data 1 says of the byte (table 29-6).
     void Vendors() {
         if (!taken2_ && UseOfData2(record_) != DataUse::kUnused) AddVendorByte(record_.data[1]);
         if (!taken3_ && UseOfData3(record_) != DataUse::kUnused) AddVendorByte(record_.data[2]);

@@ -57,7 +57,7 @@ static_assert(kByEventType[kAcpiDeviceEvents].size() == 4);
 // Sensor-specific offsets, table 42-3.
 constexpr auto kPhysicalSecurity =
     Row("chassis intrusion", "drive bay intrusion", "I/O card area intrusion",
-        "processor area intrusion", "LAN leash lost, the system was unplugged from the LAN",
+        "processor area intrusion", "LAN leash lost (unplugged from the LAN)",
         "unauthorized docking", "fan area intrusion");
 constexpr auto kPlatformSecurity =
     Row("secure mode violated (front panel lockout)", "wrong pre-boot user password",

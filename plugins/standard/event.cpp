@@ -33,6 +33,10 @@ ipmi::SensorKey Event::sensorKey() const {
         .owner = record.bytes[kOwner], .lun = record.generator.lun, .number = record.sensorNumber};
 }
 
+const SensorFacts* Event::agreeingSensor() const {
+    return sensor != nullptr && sensor->sensor.sensorType == record.sensorType ? sensor : nullptr;
+}
+
 bool Event::IsAsserted(std::uint8_t sensorType, std::uint8_t offset) const {
     return isSensorEvent() && !record.deassertion && record.sensorType == sensorType &&
            record.eventType == ipmi::kSensorSpecificEvents && record.offset() == offset;

@@ -44,7 +44,8 @@ struct Event {
     std::optional<std::size_t> resolvedBy;
     std::optional<bool> stillPresent;
 
-    const SensorFacts* sensor = nullptr;  ///< borrowed of the node's facts
+    /// By owner, LUN and number; borrowed of the node's facts.
+    const SensorFacts* sensor = nullptr;
     ipmi::EventData data;
     std::optional<double> reading;
     std::optional<double> threshold;
@@ -61,6 +62,9 @@ struct Event {
     /// Whether it tells of something wrong.
     bool isFault() const { return ipmi::IsFault(severity) && duration != ipmi::Duration::kReturn; }
     ipmi::SensorKey sensorKey() const;
+    /// The sensor, where its record and the event agree on what it senses. A repository that is not
+    /// the machine's gives an event the name of its sensor at most.
+    const SensorFacts* agreeingSensor() const;
     /// Whether it is an assertion of this offset of a sensor-specific type.
     bool IsAsserted(std::uint8_t sensorType, std::uint8_t offset) const;
 };

@@ -107,8 +107,9 @@ void WriteSensor(const Event& event, Output& output) {
     output.Text("EventType", ipmi::EventTypeName(record.eventType));
     output.Integer("EventTypeCode", record.eventType);
     output.Integer("Offset", record.offset());
-    if (event.sensor != nullptr && event.sensor->sensor.entity.IsSpecified()) {
-        const ipmi::Entity& entity = event.sensor->sensor.entity;
+    const SensorFacts* const facts = event.agreeingSensor();
+    if (facts != nullptr && facts->sensor.entity.IsSpecified()) {
+        const ipmi::Entity& entity = facts->sensor.entity;
         output.Text("Entity", ipmi::EntityName(entity.id));
         output.Integer("EntityID", entity.id);
         output.Integer("EntityInstance", entity.instance);

@@ -30,10 +30,11 @@ struct Place {
 };
 
 Place PlaceOf(const Event& event) {
-    if (event.sensor == nullptr || !ipmi::IsPhysicalEntity(event.sensor->sensor.entity.id)) {
+    const SensorFacts* const facts = event.agreeingSensor();
+    if (facts == nullptr || !ipmi::IsPhysicalEntity(facts->sensor.entity.id)) {
         return {.entity = {}, .sensor = event.sensorKey()};
     }
-    const ipmi::Entity& entity = event.sensor->sensor.entity;
+    const ipmi::Entity& entity = facts->sensor.entity;
     Place place{.entity = entity, .sensor = {}};
     if (entity.IsDeviceRelative()) place.sensor.owner = event.sensorKey().owner;
     return place;
@@ -47,7 +48,9 @@ bool MayBeEqual(const std::optional<T>& a, const std::optional<T>& b) {
 bool SameTarget(const Event& a, const Event& b) {
     return MayBeEqual(a.data.memoryModule, b.data.memoryModule) &&
            MayBeEqual(a.data.slotNumber, b.data.slotNumber) &&
-           MayBeEqual(a.data.processorInstance, b.data.processorInstance);
+           MayBeEqual(a.data.processorInstance, b.data.processorInstance) &&
+           MayBeEqual(a.data.sensorNumber, b.data.sensorNumber) &&
+           MayBeEqual(a.data.fruDevice, b.data.fruDevice);
 }
 
 // Whether the later event of a sensor takes the earlier one back.

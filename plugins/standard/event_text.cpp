@@ -41,6 +41,8 @@ std::string OffsetText(const ipmi::SelRecord& record) {
             }
             return "event of sensor type " + ipmisel::HexByte(record.sensorType) + ", " + offset +
                    ", not defined by IPMI";
+        case ipmi::EventClass::kUnspecified:
+            return "unspecified event, " + offset;
         default:
             return "event of type " + ipmisel::HexByte(record.eventType) + ", " + offset +
                    ", not defined by IPMI";
@@ -101,7 +103,7 @@ std::optional<double> ConvertByRecord(const ipmi::Sensor& sensor, std::uint8_t r
 }
 
 void SetReading(const Converter& convert, Event* event) {
-    if (event->sensor == nullptr) return;
+    if (event->agreeingSensor() == nullptr) return;
     const ipmi::Sensor& sensor = event->sensor->sensor;
     if (event->data.reading) event->reading = convert(sensor, *event->data.reading);
     if (event->data.threshold) event->threshold = convert(sensor, *event->data.threshold);

@@ -44,6 +44,14 @@ std::vector<Event> DeriveEvents(const NodeFacts& node, const DerivationTools& to
         if (event.isSensorEvent()) {
             const auto sensor = sensors.find(event.sensorKey());
             if (sensor != sensors.end()) event.sensor = sensor->second;
+            if (event.data.sensorNumber) {
+                ipmi::SensorKey failed = event.sensorKey();
+                failed.number = *event.data.sensorNumber;
+                const auto named = sensors.find(failed);
+                if (named != sensors.end() && !named->second->sensor.name.empty()) {
+                    event.data.words.push_back(named->second->sensor.name);
+                }
+            }
         }
         SetReading(tools.convert, &event);
         SetSeverity(node.filters, tools.rules, &event);

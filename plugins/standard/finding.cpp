@@ -114,8 +114,11 @@ public:
             if (event.time) newest_ = event.time;
         }
     }
+    // A time after that of the newest record is of a clock that was set back since.
     bool IsRecent(const Event& event, std::size_t at) const {
-        if (event.time && newest_) return *event.time >= *newest_ - kRecent;
+        if (event.time && newest_ && *event.time <= *newest_) {
+            return *event.time >= *newest_ - kRecent;
+        }
         return at + kRecentRecords >= count_;
     }
 

@@ -39,11 +39,16 @@ void WriteFindings(NodePass& pass, Output& output) {
         output.Text("Title", finding.title);
         WritePart(finding.part, output);
         std::vector<std::string> keys;
-        for (const std::size_t i : finding.events) keys.push_back(events[i].key);
-        if (!finding.events.empty()) {
-            output.Time("FirstTime", events[finding.events.front()].time);
-            output.Time("LastTime", events[finding.events.back()].time);
+        std::optional<std::int64_t> first;
+        std::optional<std::int64_t> last;  // of those that have a time
+        for (const std::size_t i : finding.events) {
+            keys.push_back(events[i].key);
+            if (!events[i].time) continue;
+            if (!first) first = events[i].time;
+            last = events[i].time;
         }
+        output.Time("FirstTime", first);
+        output.Time("LastTime", last);
         output.Integer("Count", static_cast<std::int64_t>(finding.events.size()));
         output.Texts("Events", keys);
         if (finding.firstCause) output.Text("FirstCause", events[*finding.firstCause].key);

@@ -6,7 +6,8 @@
 namespace standard {
 
 PartEvidence EntityParts::OfEvent(const Event& event) const {
-    return event.sensor == nullptr ? PartEvidence() : OfSensor(event.sensor->sensor);
+    const SensorFacts* const facts = event.agreeingSensor();
+    return facts == nullptr ? PartEvidence() : OfSensor(facts->sensor);
 }
 
 PartEvidence EntityParts::OfSensor(const ipmi::Sensor& sensor) const {

@@ -2,7 +2,9 @@
 
 #include <gtest/gtest.h>
 
+#include <fstream>
 #include <string>
+#include <string_view>
 
 #include "ipmi/event_offsets.h"
 
@@ -84,6 +86,38 @@ TEST(Severity, OfAFaultIsOkWhenItIsDeassertedAndThereIsNoneWithoutWords) {
             }
         }
     }
+}
+
+// Every row of docs/severities.md is what the table says, and every offset that has words has its row.
+TEST(Severity, IsThatOfItsPage) {
+    std::ifstream page(IPMISEL_DOCS "/severities.md");
+    ASSERT_TRUE(page);
+    const auto hexadecimal = [](const std::string& line, const char* before) {
+        const std::size_t at = line.find(before);
+        if (at == std::string::npos) return std::uint8_t{0};
+        return static_cast<std::uint8_t>(
+            std::stoul(line.substr(at + std::string_view(before).size(), 2), nullptr, 16));
+    };
+    const char* const durations[] = {"state", "latched", "momentary", "return"};
+    std::uint8_t eventType = 0;
+    std::uint8_t sensorType = 0;
+    unsigned rows = 0;
+    for (std::string line; std::getline(page, line);) {
+        if (line.starts_with("## ")) {
+            eventType = hexadecimal(line, "event type ");
+            sensorType = hexadecimal(line, "sensor type ");
+        }
+        if (!line.starts_with("| ") || line[2] < '0' || line[2] > '9') continue;
+        const auto offset = static_cast<std::uint8_t>(std::stoul(line.substr(2)));
+        const EventGrade grade = GradeOf(eventType, sensorType, offset);
+        const std::string row = "| " + std::to_string(offset) + " | " +
+                                std::string(EventOffsetText(eventType, sensorType, offset)) +
+                                " | " + Name(grade.asserted) + " | " + Name(grade.deasserted) +
+                                " | " + durations[static_cast<int>(grade.duration)] + " | ";
+        EXPECT_TRUE(line.starts_with(row)) << row;
+        ++rows;
+    }
+    EXPECT_EQ(rows, 261u);
 }
 
 TEST(Severity, HasANameThatReadsBack) {

@@ -31,6 +31,7 @@ TEST(EventText, IsOneForEveryKindOfRecord) {
         .Event(0xC1, 0x91, kAsserted, {0x03, 0xFF, 0xFF})
         .Event(0x01, 0x30, kAsserted, {0x03, 0xFF, 0xFF})
         .Event(0x01, 0x30, 0x0D, {0x03, 0xFF, 0xFF})
+        .Event(0x01, 0x30, 0x00, {0x03, 0xFF, 0xFF})
         .Record(0xC1, {1, 2, 3, 0x69, 0x57, 0x01, 0x00, 7, 8, 9, 10, 11, 12})
         .Record(0xE1, {1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13})
         .Record(0x03, {1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13})
@@ -46,6 +47,7 @@ TEST(EventText, IsOneForEveryKindOfRecord) {
         {"OEM sensor 91h: vendor-specific event, sensor type C1h, offset 3", ""},
         {"Temperature sensor 30h: event of sensor type 01h, offset 3, not defined by IPMI", ""},
         {"Temperature sensor 30h: event of type 0Dh, offset 3, not defined by IPMI", ""},
+        {"Temperature sensor 30h: unspecified event, offset 3", ""},
         {"vendor-specific record, type C1h, manufacturer 343", "0708090a0b0c"},
         {"vendor-specific record, type E1h", "0102030405060708090a0b0c0d"},
         {"record of type 03h, not defined by IPMI", "0102030405060708090a0b0c0d"},
@@ -97,6 +99,23 @@ TEST(EventText, TakesASensorByOwnerLunAndNumberNeverByItsNumberAlone) {
         log.Event(0x08, 0x30, kAsserted, {0x01, 0xFF, 0xFF});
         EXPECT_EQ(log.Derive()[0].sensor, nullptr);
     }
+}
+
+TEST(EventText, OfASensorWhoseRecordSensesSomethingElseHasTheNameAtMost) {
+    LogBuilder log;
+    log.Temperature(0x30, "CPU1 Temp", {.id = 0x03, .instance = 1});
+    log.Event(0x02, 0x30, 0x01, {0x59, 96, 95});
+    const Event event = log.Derive()[0];
+    EXPECT_EQ(event.sentence, "CPU1 Temp: above the upper critical threshold");
+    EXPECT_TRUE(event.part.parts.empty());
+    EXPECT_EQ(event.reading, std::nullopt);
+}
+
+TEST(EventText, NamesTheSensorThatFailed) {
+    LogBuilder log;
+    log.Sensor(0x74, 0x01, 0x01, "PCH Temp");
+    log.Event(0x28, 0x10, kAsserted, {0xC4, 0x74, 0xFF});
+    EXPECT_EQ(log.Derive()[0].text, "sensor failed, sensor 74h, PCH Temp");
 }
 
 TEST(EventText, NumbersHaveAtMostThreeDecimals) {

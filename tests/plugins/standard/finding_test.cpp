@@ -105,6 +105,15 @@ TEST(Finding, AMomentaryFaultWithoutATimeIsOneAmongTheLastRecords) {
     }
 }
 
+TEST(Finding, AMomentaryFaultOfAClockThatWasSetBackIsOneAmongTheLastRecords) {
+    for (const unsigned later : {63U, 64U}) {
+        LogBuilder log;
+        log.At(kNoon + 1).Event(0x23, 0x03, kAsserted, Offset(1)).At(kNoon);
+        for (unsigned i = 0; i < later; ++i) log.Event(0x14, 1, kAsserted, Offset(0));
+        EXPECT_EQ(Findings(log).size(), later == 63 ? 1u : 0u);
+    }
+}
+
 TEST(Finding, NamesTheEventThatBeganItsBurst) {
     LogBuilder log;
     log.Event(0x14, 1, kAsserted, Offset(0))
