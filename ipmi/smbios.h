@@ -19,6 +19,7 @@ constexpr std::uint8_t kSmbiosSystem = 1;
 constexpr std::uint8_t kSmbiosProcessor = 4;
 constexpr std::uint8_t kSmbiosSlot = 9;
 constexpr std::uint8_t kSmbiosMemoryDevice = 17;
+constexpr std::uint8_t kSmbiosIpmiDevice = 38;
 
 /// The number-th string (from 1) of a structure; empty when it has none of that number.
 std::string SmbiosString(std::span<const std::uint8_t> structure, std::size_t number);

@@ -1,6 +1,7 @@
 #include "host/smbios/smbios_tables.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <fstream>
 #include <numeric>
 #include <string_view>
@@ -106,6 +107,12 @@ SmbiosStructures ReadSystemSmbios(const std::filesystem::path& folder) {
     const std::vector<std::uint8_t> table = ReadFile(folder / "DMI", entryPoint->tableLength);
     if (!entryPoint->numberOfStructures) return SplitSmbiosTable(table);
     return SplitSmbiosTable(table, *entryPoint->numberOfStructures);
+}
+
+int SystemSmbiosError(const std::filesystem::path& folder) {
+    errno = 0;
+    const std::ifstream table(folder / "DMI", std::ios::binary);
+    return table || errno == ENOENT ? 0 : errno;
 }
 
 std::string SystemProductName(const SmbiosStructures& structures) {

@@ -37,6 +37,9 @@ std::optional<SmbiosEntryPoint> ReadSmbiosEntryPoint(std::span<const std::uint8_
 /// `folder`, as Linux has them. Empty when they are not there, may not be read or make no sense.
 SmbiosStructures ReadSystemSmbios(const std::filesystem::path& folder = "/sys/firmware/dmi/tables");
 
+/// Why those files may not be read although they are there: the error number of the system, else 0.
+int SystemSmbiosError(const std::filesystem::path& folder = "/sys/firmware/dmi/tables");
+
 /// The product name of the system information structure (type 1) without trailing blanks.
 std::string SystemProductName(const SmbiosStructures& structures);
 

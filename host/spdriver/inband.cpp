@@ -1,22 +1,21 @@
 #include <algorithm>
-#include <cstdint>
+#include <cerrno>
+#include <chrono>
+#include <cstring>
 #include <filesystem>
 #include <memory>
 #include <optional>
 #include <string>
-#include <system_error>
 #include <utility>
 #include <vector>
 
 #include "host/smbios/smbios_tables.h"
-#include "host/spdriver/freeipmi_context.h"
+#include "host/spdriver/inband_pipeline.h"
 #include "host/spdriver/kinds.h"
-#include "host/spdriver/stop_gate.h"
+#include "ipmi/smbios.h"
 
 namespace tqrhost {
 namespace {
-
-constexpr std::uint8_t kIpmiDeviceRecord = 38;  // SMBIOS structure type, DSP0134
 
 /// The way to a BMC that is there but has no driver.
 class SilentTransport : public Transport {
@@ -26,49 +25,83 @@ public:
 
 bool HasIpmiDevice(const std::vector<std::vector<std::uint8_t>>& smbios) {
     return std::any_of(smbios.begin(), smbios.end(), [](const auto& structure) {
-        return !structure.empty() && structure[0] == kIpmiDeviceRecord;
+        return !structure.empty() && structure[0] == ipmi::kSmbiosIpmiDevice;
     });
 }
 
-std::unique_ptr<Transport> OpenDevice(const std::filesystem::path& device) {
-    auto context = MakeContext();
-    // The kernel's driver only: its ports are not to be touched behind its back.
-    constexpr int kNoProbing = 1;
-    if (ipmi_ctx_open_inband(context.get(), IPMI_DEVICE_OPENIPMI, kNoProbing, 0, 0, device.c_str(),
-                             IPMI_WORKAROUND_FLAGS_DEFAULT, IPMI_FLAGS_DEFAULT) < 0) {
-        throw SourceError(ErrorAdvice(device.string(), ipmi_ctx_errnum(context.get())));
+/// A device file without a driver behind it, or none at all.
+bool NoDriver(int error) { return error == ENOENT || error == ENODEV || error == ENXIO; }
+
+std::string Advice(const std::filesystem::path& file, int error) {
+    const std::string place = file.string() + ": ";
+    switch (error) {
+        case EACCES:
+        case EPERM:
+            return place + "access is not allowed; run as root or ask for access to the device";
+        case EBUSY:
+            return place + "the IPMI driver is busy; try again";
+        case ENOTTY:
+            return place + "is no IPMI device; name another source with --from";
+        default:
+            return place + "cannot be opened: " + std::strerror(error) +
+                   "; check the kernel modules ipmi_si and ipmi_devintf";
     }
-    return std::make_unique<FreeIpmiTransport>(std::move(context));
 }
+
+constexpr const char* kLoadDriver =
+    "load the kernel modules ipmi_si and ipmi_devintf if it has a BMC, or name another source with "
+    "--from";
 
 }  // namespace
 
-Source OpenInbandDevice(const std::vector<std::filesystem::path>& devices,
-                        std::vector<std::vector<std::uint8_t>> smbios) {
+Source OpenInbandDevice(const std::vector<std::filesystem::path>& devices, SystemSmbios smbios,
+                        std::chrono::milliseconds timeout) {
     Source source;
-    source.facts.machineType = SystemProductName(smbios);
-    source.facts.smbios = std::move(smbios);
-    const auto device = std::find_if(devices.begin(), devices.end(), [](const auto& path) {
-        std::error_code error;
-        return std::filesystem::exists(path, error);
-    });
-    if (device != devices.end()) {
+    source.facts.machineType = SystemProductName(smbios.structures);
+    source.facts.smbios = std::move(smbios.structures);
+    std::optional<std::filesystem::path> withoutDriver;
+    for (const std::filesystem::path& path : devices) {
+        auto device = std::make_unique<KernelDevice>();
+        const int error = device->Open(path);
+        if (NoDriver(error)) {
+            if (error != ENOENT) withoutDriver = path;
+            continue;
+        }
+        if (error != 0) throw SourceError(Advice(path, error));
+        if (smbios.error != 0) {
+            throw SourceError(
+                "the SMBIOS of this machine, which says what BMC it has, cannot be read: " +
+                std::string(std::strerror(smbios.error)) + "; run as root");
+        }
         source.nodes.push_back(
-            {"inband", nullptr, std::make_unique<SerialPipeline>(OpenDevice(*device))});
-    } else if (HasIpmiDevice(source.facts.smbios)) {
+            {"inband", nullptr, std::make_unique<InbandPipeline>(std::move(device), timeout)});
+        return source;
+    }
+    if (HasIpmiDevice(source.facts.smbios)) {
         source.facts.ipmiDriver = false;
         source.nodes.push_back({"inband", std::make_unique<SilentTransport>(), nullptr});
-    } else {
-        throw SourceError(
-            "no BMC: this machine has neither an IPMI device (/dev/ipmi0) nor an IPMI record in "
-            "its SMBIOS; load the kernel modules ipmi_si and ipmi_devintf if it has a BMC, or "
-            "name another source with --from");
+        return source;
     }
-    return source;
+    if (withoutDriver) {
+        throw SourceError(withoutDriver->string() + ": there is no driver behind this device; " +
+                          kLoadDriver);
+    }
+    if (smbios.error != 0) {
+        throw SourceError(
+            "no BMC: this machine has no IPMI device (/dev/ipmi0), and its SMBIOS cannot "
+            "be read: " +
+            std::string(std::strerror(smbios.error)) + "; run as root, or " + kLoadDriver);
+    }
+    throw SourceError(
+        "no BMC: this machine has neither an IPMI device (/dev/ipmi0) nor an IPMI record "
+        "in its SMBIOS; " +
+        std::string(kLoadDriver));
 }
 
-Source OpenInband(const std::vector<std::string>& /*places*/, const SourceOptions& /*options*/) {
-    return OpenInbandDevice({"/dev/ipmi0", "/dev/ipmi/0", "/dev/ipmidev/0"}, ReadSystemSmbios());
+Source OpenInband(const std::vector<std::string>& /*places*/, const SourceOptions& options) {
+    return OpenInbandDevice(
+        {"/dev/ipmi0", "/dev/ipmi/0", "/dev/ipmidev/0"}, {ReadSystemSmbios(), SystemSmbiosError()},
+        std::chrono::milliseconds(static_cast<std::int64_t>(options.timeoutSeconds * 1000)));
 }
 
 }  // namespace tqrhost

@@ -23,11 +23,10 @@ struct Kind {
 };
 
 constexpr Kind kKinds[] = {
-#ifdef IPMISEL_FREEIPMI
     {"inband", "inband", false, OpenInband},
+#ifdef IPMISEL_FREEIPMI
     {"lan:", "lan:HOST[:PORT]", true, OpenLan},
 #else
-    {"inband", "inband", false, nullptr},
     {"lan:", "lan:HOST[:PORT]", true, nullptr},
 #endif
     {"sim:", "sim:FILE", false, OpenSimulated},
