@@ -156,6 +156,12 @@ constexpr std::uint8_t kNotSupportedInState = 0xD5;
 constexpr std::uint8_t kSubfunctionDisabled = 0xD6;
 constexpr std::uint8_t kUnspecifiedError = 0xFF;
 
+/// Whether a read was refused for its length: the controller may well give less at a time.
+constexpr bool RefusesSoManyBytes(std::uint8_t code) {
+    return code == kCannotReturnBytes || code == kRequestLengthInvalid ||
+           code == kRequestLengthExceeded;
+}
+
 /// A completion code in words, without a final full stop: those of the command where it has codes
 /// of its own (80h to BEh), else the generic ones; "device-specific code" and "command-specific
 /// code" for the ranges that neither gives a meaning, "reserved code" for the rest.

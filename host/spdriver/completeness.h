@@ -18,6 +18,11 @@ struct ReadFault {
 struct SourceAccount {
     std::optional<unsigned> announced;  ///< empty when it was not asked, or did not say
     unsigned read = 0;
+    bool asked = true;  ///< whether a record of it was
+    /// Records that were announced and, though the source was read, did not come.
+    unsigned Missing() const {
+        return asked && announced && *announced > read ? *announced - read : 0;
+    }
 };
 /// How whole the reading of a node is, as the host saw it go by.
 struct NodeCompleteness {

@@ -33,18 +33,18 @@ const char* StopText(StopReason reason) {
 }  // namespace
 
 bool NodeCompleteness::Whole() const {
-    const auto whole = [](const SourceAccount& account) {
-        return !account.announced || account.read >= *account.announced;
-    };
     const bool faulty = std::any_of(faults.begin(), faults.end(),
                                     [](const ReadFault& fault) { return fault.ofLogOrSensors; });
-    return !faulty && whole(log) && whole(sensors);
+    return !faulty && log.Missing() == 0 && sensors.Missing() == 0;
 }
 
 CompletenessTracker::CompletenessTracker(std::unique_ptr<LoopGuard> guard)
     : guard_(std::move(guard)),
-      log_{"Get SEL Info", "Get SEL Entry", true, &account_.log, {}, {}},
-      sensors_{"Get SDR Repository Info", "Get SDR", false, &account_.sensors, {}, {}} {}
+      log_{"Get SEL Info", "Get SEL Entry", true, &account_.log, {}, {}, 0, 0, 0},
+      sensors_{"Get SDR Repository Info", "Get SDR", false, &account_.sensors, {}, {}, 0, 0, 0} {
+    account_.log.asked = false;
+    account_.sensors.asked = false;
+}
 
 std::optional<Response> CompletenessTracker::Exchange(const RequestFrame& request) {
     auto response = guard_->Exchange(request);
@@ -149,6 +149,10 @@ void CompletenessTracker::NoteRecord(Source* source, const RequestFrame& request
     const std::uint16_t record = in.U16();
     const std::uint8_t offset = in.U8();
     const std::uint8_t count = in.U8();
+    source->account->asked = true;
+    const bool wantedWhole = !source->isLog && offset == 0 && count == ipmi::kWholeRecord;
+    // A controller may refuse whole records; it is asked for parts then.
+    if (wantedWhole && response && ipmi::RefusesSoManyBytes(response->front())) return;
     // An empty log or repository has no first record.
     if (response && response->front() == ipmi::kNotPresent && source->account->announced == 0u)
         return;
@@ -156,6 +160,7 @@ void CompletenessTracker::NoteRecord(Source* source, const RequestFrame& request
         if (record == 0) FinishWalk(source);
         source->record = record;
         source->recordLength = 0;
+        source->cutAt = 0;
         if (response && response->size() >= kRecordAt + kSdrHeaderLength) {
             source->recordLength =
                 kSdrHeaderLength + response->at(kRecordAt + kSdrHeaderLength - 1);
@@ -164,10 +169,13 @@ void CompletenessTracker::NoteRecord(Source* source, const RequestFrame& request
     const std::string problem = ProblemOf(response, WholeAnswer(*source, record, offset, count));
     if (!problem.empty()) {
         AddFault({source->readCommand, ipmisel::Format("%04x", record), problem, true});
+        if (wantedWhole && source->recordLength > 0) source->cutAt = response->size() - kRecordAt;
         return;
     }
-    if (offset != 0) return;
-    if (source->counted.empty()) source->counted.resize(0x10000);
+    if (offset != 0) {
+        NoteRest(source, record, offset, *response);
+        return;
+    }
     // The first and the last record can be asked for without their IDs; each counts once.
     std::uint16_t own = record;
     if ((record == ipmi::kFirstRecordId || record == ipmi::kLastRecordId) &&
@@ -175,13 +183,31 @@ void CompletenessTracker::NoteRecord(Source* source, const RequestFrame& request
         own =
             static_cast<std::uint16_t>(response->at(kRecordAt) | response->at(kRecordAt + 1) << 8);
     }
-    if (!source->counted[own]) ++source->account->read;
-    source->counted[own] = true;
+    CountRecord(source, own);
     if (record == 0) source->walk.fromFirst = true;
     ++source->walk.count;
     // An ID with a byte of 0xFF ends the one walk or the other.
     const bool lowEnds = !source->isLog && response->at(1) == 0xFF;
     if (lowEnds || response->at(2) == 0xFF) source->walk.ended = true;
+}
+
+void CompletenessTracker::NoteRest(Source* source, std::uint16_t record, std::uint8_t offset,
+                                   const Response& response) {
+    if (source->cutAt == 0 || source->cutAt != offset) return;
+    source->cutAt += response.size() - kRecordAt;
+    if (source->cutAt < source->recordLength) return;
+    const auto cut =
+        std::find_if(account_.faults.rbegin(), account_.faults.rend(),
+                     [&](const ReadFault& fault) { return fault.what == source->readCommand; });
+    if (cut != account_.faults.rend()) account_.faults.erase(std::next(cut).base());
+    CountRecord(source, record);
+    source->cutAt = 0;
+}
+
+void CompletenessTracker::CountRecord(Source* source, std::uint16_t record) {
+    if (source->counted.empty()) source->counted.resize(0x10000);
+    if (!source->counted[record]) ++source->account->read;
+    source->counted[record] = true;
 }
 
 void CompletenessTracker::NoteFru(const RequestFrame& request,

@@ -40,6 +40,8 @@ private:
         /// The record whose beginning came last, and its length; 0 when that did not come.
         std::uint16_t record = 0;
         std::size_t recordLength = 0;
+        /// How many bytes of it came, when it was wanted whole and was cut; else 0.
+        std::size_t cutAt = 0;
     };
 
     void NoteInfo(Source* source, bool askedAgain, const std::optional<Response>& response);
@@ -48,6 +50,10 @@ private:
     void FinishWalk(Source* source);
     void NoteRecord(Source* source, const RequestFrame& request,
                     const std::optional<Response>& response);
+    /// The next part of a record that was cut: once it is whole, nothing is missing of it.
+    void NoteRest(Source* source, std::uint16_t record, std::uint8_t offset,
+                  const Response& response);
+    void CountRecord(Source* source, std::uint16_t record);
     void NoteFru(const RequestFrame& request, const std::optional<Response>& response);
     /// Bytes that an answer must have, by what was asked and what is known of the record.
     static std::size_t WholeAnswer(const Source& source, std::uint16_t record, std::uint8_t offset,

@@ -14,12 +14,6 @@ constexpr std::size_t kPart = 16;
 constexpr int kMaxReservations = 4;
 constexpr std::size_t kNextIdLength = 2;
 
-bool CannotReturnSoMany(std::uint8_t completionCode) {
-    return completionCode == ipmi::kCannotReturnBytes ||
-           completionCode == ipmi::kRequestLengthInvalid ||
-           completionCode == ipmi::kRequestLengthExceeded;
-}
-
 /// The next record's ID, which stands before the bytes of a record.
 std::uint16_t NextId(const std::vector<std::uint8_t>& data) {
     return static_cast<std::uint16_t>(data[0] | data[1] << 8);
@@ -50,7 +44,7 @@ std::optional<RepositoryReader::Record> RepositoryReader::Read(std::uint16_t rec
 std::optional<RepositoryReader::Record> RepositoryReader::ReadWhole(std::uint16_t recordId) {
     const auto answer = controller_.Send(ipmi::GetSdr(recordId));
     if (!answer) return std::nullopt;
-    if (CannotReturnSoMany(answer->completionCode)) {
+    if (ipmi::RefusesSoManyBytes(answer->completionCode)) {
         inParts_ = true;
         return std::nullopt;
     }

@@ -18,8 +18,8 @@ void AppendPart(const char* separator, const std::string& part, std::string* tex
 }
 
 std::string NotRead(const char* what, const tqrhost::SourceAccount& account) {
-    if (!account.announced || account.read >= *account.announced) return {};
-    return std::to_string(*account.announced - account.read) + " of " +
+    if (account.Missing() == 0) return {};
+    return std::to_string(account.Missing()) + " of " +
            std::to_string(*account.announced) + " " + what + " not read";
 }
 

@@ -54,6 +54,32 @@ TEST_F(Completeness, TellsWhatWentWrongWithEachRead) {
     EXPECT_FALSE(Account().Whole());
 }
 
+TEST_F(Completeness, ALogThatNobodyReadIsNotMissing) {
+    Send(0x40);
+    EXPECT_EQ(Account().log.announced, 3u);
+    EXPECT_TRUE(Account().Whole());
+    Send(0x43, {0, 0, 2, 0, 0, 0xFF});
+    EXPECT_EQ(Account().log.Missing(), 2u);
+}
+
+TEST_F(Completeness, ASensorRecordInPartsIsAsGoodAsAWholeOne) {
+    bmc.sdrRecords = {{1, 0, 0x51, 1, 5, 6, 7, 8, 9, 10}};
+    bmc.faults.push_back({0x0A, 0x23, 2, ipmisim::Fault::Kind::kTruncate, 0, 2 + 6, {}});
+    FailWith(0x23, 1, 0xCA);
+    Send(0x20);
+    Send(0x22);
+    Send(0x23, {1, 0, 0, 0, 0, 0xFF});  // refused whole
+    EXPECT_EQ(Faults(), Texts{});
+    EXPECT_EQ(Account().sensors.Missing(), 1u);
+    Send(0x23, {1, 0, 0, 0, 0, 0xFF});  // cut after six bytes
+    EXPECT_EQ(Faults(), Texts{"Get SDR 0000: short answer"});
+    Send(0x23, {1, 0, 1, 0, 6, 2});
+    EXPECT_FALSE(Account().Whole());
+    Send(0x23, {1, 0, 1, 0, 8, 2});
+    EXPECT_EQ(Faults(), Texts{});
+    EXPECT_TRUE(Account().Whole());
+}
+
 TEST_F(Completeness, AQuestionAnsweredAtTheSecondTryLeavesNothingOut) {
     Silence(0x40, 1);
     Send(0x40);
