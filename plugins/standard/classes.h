@@ -23,6 +23,9 @@ void WritePart(const PartEvidence& evidence, Output& output);
 std::string CandidateText(const Part& part);
 
 // Each stands with the code that writes it.
+extern const ClassEntry kControllerClass;
+extern const ClassEntry kEventLogClass;
+extern const ClassEntry kSensorClass;
 extern const ClassEntry kEventClass;
 extern const ClassEntry kFindingClass;
 

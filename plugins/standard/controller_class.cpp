@@ -1,0 +1,110 @@
+#include "plugins/standard/controller_class.h"
+
+#include <iterator>
+
+#include "plugins/standard/classes.h"
+#include "plugins/standard/enterprise_names.h"
+
+namespace standard {
+namespace {
+
+using enum NQORTQR20::fdrPropertyType;
+
+constexpr const char* kName = "IPMI_Controller";
+
+constexpr NQORTQR20::fdrPropertyInfo kProperties[] = {
+    {"Node", kInteger, "number of the node, from 1"},
+    {"GUID", kText, "identity of the system in the text form of RFC 4122"},
+    {"GUIDOrder", kText,
+     "where SMBIOS has the identity too: whose order of bytes the controller keeps to, \"IPMI\", "
+     "\"SMBIOS\" or \"RFC 4122\""},
+    {"SystemManufacturer", kText, "by SMBIOS, else by the inventory of device 0"},
+    {"SystemProduct", kText, "by SMBIOS, else by the inventory of device 0"},
+    {"SystemSerialNumber", kText, "by SMBIOS, else by the inventory of device 0"},
+    {"FirmwareVersion", kText, "of the controller, \"major.minor\""},
+    {"AuxiliaryRevision", kText, "four bytes whose meaning is the vendor's, hexadecimal"},
+    {"IPMIVersion", kText, "of the standard that the controller keeps to"},
+    {"DeviceID", kText, "device ID, decimal"},
+    {"DeviceRevision", kText, "device revision, decimal"},
+    {"ManufacturerID", kInteger, "IANA enterprise number"},
+    {"Manufacturer", kText, "its name, where the system has IANA's list"},
+    {"ProductID", kInteger, "the manufacturer's number for the product"},
+    {"Capabilities", kTextList, "additional device support"},
+    {"SelfTest", kText, "result of the controller's test of itself"},
+    {"Time", kTime, "the controller's time"},
+    {"ClockOffsetSeconds", kReal, "the controller's time less the collector's"},
+    {"ClockUncertaintySeconds", kReal, "how far the offset may be wrong"},
+    {"UTCOffsetMinutes", kInteger, "by how much the controller's clock is ahead of UTC"},
+    {"PowerOn", kBoolean, "whether the system has power"},
+    {"LastPowerEvent", kTextList, "why the power last changed"},
+    {"PowerFaults", kTextList, "what is wrong with the power"},
+    {"ChassisIntrusion", kBoolean, "whether the chassis is open"},
+};
+
+std::vector<std::string> Strings(const std::vector<std::string_view>& views) {
+    return {views.begin(), views.end()};
+}
+
+const char* OrderName(ipmi::GuidOrder order) {
+    switch (order) {
+        case ipmi::GuidOrder::kIpmi:
+            return "IPMI";
+        case ipmi::GuidOrder::kSmbios:
+            return "SMBIOS";
+        case ipmi::GuidOrder::kRfc4122:
+            return "RFC 4122";
+    }
+    return "";
+}
+
+void Write(NodePass& pass, Output& output) {
+    Node& node = pass.node();
+    output.Begin(kName);
+    output.Integer("Node", node.number());
+    const GuidReading guid = ReadGuid(node.Guid(), std::nullopt);
+    output.Text("GUID", guid.text);
+    output.Text("GUIDOrder", guid.order);
+    if (const auto& id = node.DeviceId()) {
+        output.Text("FirmwareVersion", ipmi::FirmwareVersionText(*id));
+        output.Text("AuxiliaryRevision", ipmi::AuxiliaryRevisionText(*id));
+        output.Text("IPMIVersion", ipmi::IpmiVersionText(*id));
+        output.Text("DeviceID", std::to_string(id->deviceId));
+        output.Text("DeviceRevision", std::to_string(id->deviceRevision));
+        if (id->manufacturerId != 0) {  // 0 is "unspecified"
+            output.Integer("ManufacturerID", id->manufacturerId);
+            output.Text("Manufacturer", EnterpriseName(id->manufacturerId));
+        }
+        output.Integer("ProductID", id->productId);
+        output.Texts("Capabilities", Strings(ipmi::CapabilityNames(*id)));
+    }
+    output.Text("SelfTest", node.SelfTest().value_or(""));
+    const Clock& clock = node.GetClock();
+    output.Time("Time", clock.time);
+    output.Real("ClockOffsetSeconds", clock.offsetSeconds);
+    output.Real("ClockUncertaintySeconds", clock.uncertaintySeconds);
+    output.Integer("UTCOffsetMinutes", clock.utcOffsetMinutes);
+    if (const auto& chassis = node.Chassis()) {
+        output.Boolean("PowerOn", chassis->powerOn);
+        output.Texts("LastPowerEvent", Strings(chassis->lastPowerEvent));
+        output.Texts("PowerFaults", Strings(chassis->powerFaults));
+        output.Boolean("ChassisIntrusion", chassis->chassisIntrusion);
+    }
+    output.End();
+}
+
+}  // namespace
+
+GuidReading ReadGuid(const std::optional<ipmi::Guid>& guid,
+                     const std::optional<ipmi::Guid>& smbiosUuid) {
+    if (!guid) return {};
+    const auto order = smbiosUuid ? ipmi::GuidOrderBySmbios(*guid, *smbiosUuid) : std::nullopt;
+    return {ipmi::GuidText(*guid, order.value_or(ipmi::GuidOrder::kIpmi)),
+            order ? OrderName(*order) : ""};
+}
+
+const ClassEntry kControllerClass{
+    {kName, "the management controller, its clock, and the power of the chassis",
+     NQORTQR20::kByDefault, "Node", nullptr, kProperties, std::size(kProperties)},
+    Write};
+
+}  // namespace standard

@@ -1,0 +1,284 @@
+// The classes as the host gets them, over simulated machines.
+
+#include <gmock/gmock.h>
+
+#include <map>
+
+#include "base/text.h"
+#include "host/spdriver/source.h"
+#include "plugins/standard/classes.h"
+#include "plugins/standard/controller_class.h"
+#include "plugins/standard/enterprise_names.h"
+#include "plugins/standard/plugin.h"
+#include "plugins/standard/sensor_class.h"
+#include "simulator/server_file.h"
+#include "tests/support/bmc_fixture.h"
+#include "tests/support/temporary_folder.h"
+
+namespace standard {
+namespace {
+
+using namespace ::testing;
+using NQORTQR20::fdrPropertyType;
+
+constexpr const char* kServer = R"({"local_time": "20240305130000.000000+060", "bmcs": [{
+  "device_id": "20 81 02 15 02 bf 57 01 00 34 12 01 02 03 04",
+  "guid": "0f0e0d0c 0b0a 0908 0706 050403020100", "self_test": "5500",
+  "chassis_status": "03 01 01",
+  "sel": {"time": 1709643598, "utc_offset_minutes": 60, "free_bytes": 16, "overflow": true,
+          "last_erase": 4294967295, "entries": ["0100 02 b0e5e665 2000 04 01 30 01 59 50 45"]},
+  "sdr": {"records": [
+    "0100 51 01 32 20 00 30 03 01 7f 68 01 01 00 00 00 00 3f 00 00 01 00 00 01 02 f6 c0 10 00 05 20 20 00 00 00 64 5f 5a 0f 0a 05 02 03 00 00 00 c7 43505520546d70",
+    "0200 51 02 1f 20 01 40 0a 61 7f 40 08 6f 00 00 00 00 00 00 c0 00 00 02 00 00 00 00 00 00 00 c4 50532041",
+    "0300 51 03 0f 41 02 50 22 01 0f 6f 01 00 00 00 c3 534d49"]},
+  "sensors": {"30": {"reading": "69", "states": "c0 c8", "thresholds": "3f 05 0a 0f 5a 5f 64"},
+              "20/1/40": {"states": "c0 03 80"}}
+}, {}]})";
+
+/// A value of a property as text, and its type.
+std::string Shown(const tqrhost::PropertyValue& value) {
+    struct Visitor {
+        std::string operator()(const std::string& v) const { return v; }
+        std::string operator()(std::int64_t v) const { return std::to_string(v); }
+        std::string operator()(double v) const { return ipmisel::Format("%.10g", v); }
+        std::string operator()(bool v) const { return v ? "true" : "false"; }
+        std::string operator()(const tqrhost::Time& v) const { return tqrhost::TimeText(v); }
+        std::string operator()(const std::vector<std::string>& v) const {
+            std::string all;
+            for (const std::string& text : v) all += "[" + text + "]";
+            return all.empty() ? "[]" : all;
+        }
+        std::string operator()(const std::vector<std::uint8_t>&) const { return "bytes"; }
+        std::string operator()(const tqrhost::ObjectPath&) const { return "reference"; }
+    };
+    return std::visit(Visitor(), value);
+}
+
+class StandardClasses : public Test {
+protected:
+    ~StandardClasses() override { tqrhost::CloseMachine(); }
+
+    /// One pass over a simulated server; every property of every instance as text.
+    std::vector<std::map<std::string, std::string>> Collect(const std::string& json,
+                                                            std::vector<const char*> classNames) {
+        auto server = ipmisim::ParseServer(json, "test");
+        tqrhost::Source source;
+        source.facts.localTime = server.localTime;
+        for (auto& bmc : server.bmcs) {
+            source.nodes.push_back(
+                {"sim",
+                 std::make_unique<ipmiseltest::SimulatedTransport>(std::move(bmc), &requests),
+                 {}});
+        }
+        tqrhost::OpenMachine(std::move(source));
+        written.instances.clear();
+        const tqrhost::OutputHandle output(written);
+        EXPECT_EQ(
+            GetData(nullptr, output.get(), classNames.data(), static_cast<int>(classNames.size()))
+                .code,
+            NQORTQR20::kStatusOk);
+        std::vector<std::map<std::string, std::string>> all;
+        for (const auto& instance : written.instances) {
+            auto& properties = all.emplace_back();
+            for (const auto& [name, value] : instance.properties) properties[name] = Shown(value);
+        }
+        return all;
+    }
+
+    ipmiseltest::InstanceRecorder written;
+    std::vector<std::vector<std::uint8_t>> requests;
+};
+
+TEST_F(StandardClasses, AControllerTellsWhatItIsAndHowItIs) {
+    const auto all = Collect(kServer, {"IPMI_Controller"});
+    ASSERT_EQ(all.size(), 2u);
+    const std::map<std::string, std::string> expected{
+        {"Node", "1"},
+        {"GUID", "00010203-0405-0607-0809-0a0b0c0d0e0f"},
+        {"FirmwareVersion", "2.15"},
+        {"AuxiliaryRevision", "01020304"},
+        {"IPMIVersion", "2.0"},
+        {"DeviceID", "32"},
+        {"DeviceRevision", "1"},
+        {"ManufacturerID", "343"},
+        {"ProductID", "4660"},
+        {"SelfTest", "passed"},
+        {"Time", "2024-03-05T11:59:58Z"},
+        {"ClockOffsetSeconds", "-2"},
+        {"ClockUncertaintySeconds", "0.5"},
+        {"UTCOffsetMinutes", "60"},
+        {"PowerOn", "true"},
+        {"LastPowerEvent", "[AC failed]"},
+        {"PowerFaults", "[power overload]"},
+        {"ChassisIntrusion", "true"},
+    };
+    for (const auto& [name, value] : expected) EXPECT_EQ(all[0].at(name), value) << name;
+    EXPECT_THAT(all[0].at("Capabilities"), HasSubstr("SEL device"));
+    // Of a controller that says nothing only its number and the clock that it has all the same.
+    EXPECT_THAT(all[1],
+                ElementsAre(Pair("ClockOffsetSeconds", "0"), Pair("ClockUncertaintySeconds", "0.5"),
+                            Pair("Node", "2"), Pair("Time", "2024-03-05T12:00:00Z")));
+}
+
+TEST_F(StandardClasses, TheEventLogAsAWhole) {
+    const auto all = Collect(kServer, {"IPMI_EventLog"});
+    EXPECT_THAT(all[0],
+                ElementsAre(Pair("FreeBytes", "16"), Pair("LastAddition", "2024-03-05T08:28:16Z"),
+                            Pair("Node", "1"), Pair("Overflow", "true"), Pair("Records", "1"),
+                            Pair("UsedPercent", "50"), Pair("Version", "1.5")));
+    EXPECT_THAT(all[1], ElementsAre(Pair("FreeBytes", "65535"), Pair("Node", "2"),
+                                    Pair("Overflow", "false"), Pair("Records", "0"),
+                                    Pair("Version", "1.5")));
+    const auto allocated = Collect(R"({"bmcs": [{"faults": [{"netfn": "0a", "command": "40",
+        "data": "51 0100 3000 ffffffff ffffffff 01"}], "replies": [{"netfn": "0a", "command": "41",
+        "response": "0002 1000 f801 f001 02"}]}]})",
+                                   {"IPMI_EventLog"});
+    EXPECT_EQ(allocated.at(0).at("Allocation"),
+              "unit size 16 bytes; units 512; free units 504; largest free block 496 units");
+    EXPECT_EQ(allocated.at(0).at("UsedPercent"), "25");
+}
+
+TEST_F(StandardClasses, SensorsWithReadingLimitsAndStates) {
+    const auto all = Collect(kServer, {"IPMI_Sensor"});
+    ASSERT_EQ(all.size(), 4u);
+    const std::map<std::string, std::string> temperature{
+        {"RecordID", "1"},
+        {"OwnerAddress", "32"},
+        {"LUN", "0"},
+        {"Number", "48"},
+        {"Name", "CPU Tmp"},
+        {"Type", "Temperature"},
+        {"TypeCode", "1"},
+        {"EventTypeCode", "1"},
+        {"Entity", "Processor"},
+        {"EntityID", "3"},
+        {"EntityInstance", "1"},
+        {"EntityIsDeviceRelative", "false"},
+        {"Unit", "degrees C"},
+        {"Reading", "95"},
+        {"Tolerance", "1"},
+        {"Accuracy", "0.64"},
+        {"Nominal", "22"},
+        {"NormalMinimum", "-10"},
+        {"PositiveHysteresis", "2"},
+        {"NegativeHysteresis", "3"},
+        {"LowerNonCritical", "-5"},
+        {"UpperNonRecoverable", "90"},
+        {"States", "[at or above upper non-critical threshold]"},
+        {"Status", "warning"},
+    };
+    for (const auto& [name, value] : temperature) EXPECT_EQ(all[0].at(name), value) << name;
+    EXPECT_EQ(all[0].count("NormalMaximum"), 0u);
+
+    EXPECT_EQ(all[1].at("Name"), "PS A 0");
+    EXPECT_EQ(all[1].at("EntityIsDeviceRelative"), "true");
+    EXPECT_THAT(all[1].at("States"), AllOf(HasSubstr("present"), HasSubstr("fail")));
+    EXPECT_EQ(all[1].at("Status"), "critical");
+    EXPECT_EQ(all[1].count("Reading") + all[1].count("Unit"), 0u);
+    EXPECT_EQ(all[2].at("Number"), "65");
+    EXPECT_EQ(all[2].at("Status"), "unavailable");  // CBh
+    EXPECT_EQ(all[3].at("Name"), "SMI");
+    EXPECT_EQ(all[3].count("Status") + all[3].count("States"), 0u);  // cannot be read
+}
+
+TEST_F(StandardClasses, WhatIsWrittenStandsInTheClassTableWithItsType) {
+    constexpr fdrPropertyType kTypes[] = {
+        fdrPropertyType::kText,    fdrPropertyType::kByteList, fdrPropertyType::kReference,
+        fdrPropertyType::kInteger, fdrPropertyType::kReal,     fdrPropertyType::kBoolean,
+        fdrPropertyType::kTime,    fdrPropertyType::kTextList};  // in the order of PropertyValue
+    for (const ClassEntry* entry : {&kControllerClass, &kEventLogClass, &kSensorClass}) {
+        const NQORTQR20::fdrClassInfo* table = &entry->info;
+        Collect(kServer, {table->name});
+        EXPECT_FALSE(written.instances.empty());
+        std::map<std::string, fdrPropertyType> known;
+        for (std::uint32_t i = 0; i < table->propertyCount; ++i) {
+            known[table->properties[i].name] = table->properties[i].type;
+        }
+        for (const auto& instance : written.instances) {
+            EXPECT_EQ(instance.className, table->name);
+            for (const auto& [name, value] : instance.properties) {
+                ASSERT_EQ(known.count(name), 1u) << table->name << " " << name;
+                EXPECT_EQ(known[name], kTypes[value.index()]) << table->name << " " << name;
+            }
+        }
+    }
+}
+
+TEST_F(StandardClasses, EachRecordIsReadOnceForAllClasses) {
+    Collect(kServer, {"IPMI_Controller", "IPMI_EventLog", "IPMI_Sensor", "IPMI_Sensor"});
+    const auto sent = [&](ipmi::CommandCode code) {
+        return std::count_if(requests.begin(), requests.end(), [&](const auto& frame) {
+            return frame[2] == code.netFn && frame[4] == code.number;
+        });
+    };
+    EXPECT_EQ(sent(ipmi::kGetSdr), 3);
+    EXPECT_EQ(sent(ipmi::kGetSensorReading), 3);
+    EXPECT_EQ(sent(ipmi::kGetSelInfo), 2);  // one for each node
+}
+
+TEST_F(StandardClasses, AHostThatRefusesEndsThePass) {
+    written.refusedProperty = "Number";
+    auto server = ipmisim::ParseServer(kServer, "test");
+    tqrhost::Source source;
+    source.nodes.push_back({"sim",
+                            std::make_unique<ipmiseltest::SimulatedTransport>(
+                                std::move(server.bmcs.front()), &requests),
+                            {}});
+    tqrhost::OpenMachine(std::move(source));
+    const tqrhost::OutputHandle output(written);
+    const char* names[] = {"IPMI_Sensor"};
+    EXPECT_EQ(GetData(nullptr, output.get(), names, 1).code, NQORTQR20::kStatusFailed);
+    EXPECT_EQ(GetData(nullptr, output.get(), nullptr, 0).code, NQORTQR20::kStatusOk);
+}
+
+TEST(SensorStatus, StatesAreJudgedByTheirSeverity) {
+    const auto status = [](std::uint8_t eventType, std::uint8_t sensorType,
+                           std::optional<std::uint16_t> states) {
+        ipmi::Sensor sensor;
+        sensor.eventType = eventType;
+        sensor.sensorType = sensorType;
+        SensorState state;
+        state.reading = ipmi::SensorReading{.raw = 0, .scanningEnabled = true, .states = states};
+        return StatusOf(sensor, state);
+    };
+    EXPECT_EQ(status(0x01, 0x01, 0xC0), "ok");  // reserved bits of a threshold sensor
+    EXPECT_EQ(status(0x01, 0x01, 0xC9), "warning");
+    EXPECT_EQ(status(0x01, 0x01, 0xC1 | 0x20), "critical");
+    EXPECT_EQ(status(0x01, 0x01, std::nullopt), "");
+    EXPECT_EQ(status(0x6F, 0x08, 0x0001), "ok");
+    EXPECT_EQ(status(0x6F, 0x08, 0x0003), "critical");
+    EXPECT_EQ(status(0x6F, 0x0C, 0x0001), "warning");
+    EXPECT_EQ(status(0x0B, 0x08, 0x0001), "ok");
+    EXPECT_EQ(status(0x03, 0x01, 0x0002), "");  // "state asserted" tells neither
+    EXPECT_EQ(status(0x70, 0x01, 0x0000), "");
+    EXPECT_EQ(status(0x6F, 0xC0, 0x0000), "");
+}
+
+TEST(GuidReading, SmbiosDecidesTheOrderWhereItHasTheSameIdentity) {
+    const ipmi::Guid wire{0x0F, 0x0E, 0x0D, 0x0C, 0x0B, 0x0A, 9, 8, 7, 6, 5, 4, 3, 2, 1, 0};
+    const ipmi::Guid smbios{3, 2, 1, 0, 5, 4, 7, 6, 8, 9, 0x0A, 0x0B, 0x0C, 0x0D, 0x0E, 0x0F};
+    const std::string text = "00010203-0405-0607-0809-0a0b0c0d0e0f";
+    EXPECT_EQ(ReadGuid(wire, std::nullopt).text, text);
+    EXPECT_EQ(ReadGuid(wire, std::nullopt).order, "");
+    EXPECT_EQ(ReadGuid(wire, smbios).order, "IPMI");
+    EXPECT_EQ(ReadGuid(smbios, smbios).text, text);
+    EXPECT_EQ(ReadGuid(smbios, smbios).order, "SMBIOS");
+    EXPECT_EQ(ReadGuid(wire, ipmi::Guid{1}).order, "");  // another system: nothing is decided
+    EXPECT_EQ(ReadGuid(std::nullopt, smbios).text, "");
+}
+
+TEST(EnterpriseName, IsFoundByItsNumberAlone) {
+    const ipmiseltest::TemporaryFolder folder;
+    const std::string file = folder.Write("numbers",
+                                          "Decimal\n| Organization\n10\n  NSC\n    A Person\n"
+                                          "1\n  One, Inc. \r\n7\nbroken\n12\n");
+    EXPECT_EQ(EnterpriseName(1, file), "One, Inc.");
+    EXPECT_EQ(EnterpriseName(10, file), "NSC");
+    EXPECT_EQ(EnterpriseName(0, file), "");
+    EXPECT_EQ(EnterpriseName(7, file), "");
+    EXPECT_EQ(EnterpriseName(12, file), "");
+    EXPECT_EQ(EnterpriseName(1, file + "x"), "");
+}
+
+}  // namespace
+}  // namespace standard
