@@ -1,0 +1,92 @@
+// The standard's own reading: a whole pass over a controller that answers what the fuzzer wants,
+// and the decoders of records and answers one by one.
+//
+// Input: the answers one after the other, each a length byte (0xFF: no response) and so many bytes,
+// the completion code first. When the input is used up nothing answers any more.
+
+#include <algorithm>
+#include <cmath>
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <span>
+#include <string_view>
+#include <vector>
+
+#include "host/core/host.h"
+#include "host/spdriver/source.h"
+#include "ipmi/pef.h"
+#include "ipmi/sdr_record.h"
+#include "ipmi/sensor_reading.h"
+#include "ipmi/units.h"
+#include "plugins/standard/plugin.h"
+
+namespace {
+
+using Input = std::span<const std::uint8_t>;
+
+class FuzzedController : public tqrhost::Transport {
+public:
+    explicit FuzzedController(Input answers) : answers_(answers) {}
+    std::optional<tqrhost::Response> Exchange(const tqrhost::RequestFrame&) override {
+        if (answers_.empty()) return std::nullopt;
+        const std::size_t length = answers_.front();
+        answers_ = answers_.subspan(1);
+        if (length == 0xFF) return std::nullopt;
+        const Input bytes = answers_.first(std::min(length, answers_.size()));
+        answers_ = answers_.subspan(bytes.size());
+        return tqrhost::Response(bytes.begin(), bytes.end());
+    }
+
+private:
+    Input answers_;
+};
+
+/// Takes everything; a real must be a number.
+class NoSink : public tqrhost::InstanceSink {
+public:
+    bool OpenInstance(std::string_view) override { return true; }
+    bool AddProperty(std::string_view, const tqrhost::PropertyValue& value) override {
+        const auto* real = std::get_if<double>(&value);
+        if (real != nullptr && !std::isfinite(*real)) __builtin_trap();
+        return true;
+    }
+    bool CloseInstance() override { return true; }
+};
+
+void Decode(Input bytes) {
+    if (const auto record = ipmi::SdrRecord::Parse(bytes)) {
+        for (const ipmi::Sensor& sensor : record->Sensors()) {
+            ipmi::UnitText(sensor.units);
+            if (!sensor.analog) continue;
+            for (const int raw : {0x00, 0x7F, 0x80, 0xFF}) {
+                const auto value = sensor.analog->conversion.Value(static_cast<std::uint8_t>(raw));
+                if (value && !std::isfinite(*value)) __builtin_trap();
+            }
+        }
+    }
+    if (const auto filter = ipmi::EventFilter::Parse(bytes)) filter->Matches({});
+    ipmi::SensorReading::Parse(bytes);
+    ipmi::SensorThresholds::Parse(bytes);
+    ipmi::AskedFactors::Parse(bytes);
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+    const Input input(data, size);
+    Decode(input);
+
+    tqrhost::Source source;
+    source.nodes.push_back({"", std::make_unique<FuzzedController>(input), nullptr});
+    tqrhost::OpenMachine(std::move(source));
+    NoSink sink;
+    const tqrhost::OutputHandle output(sink);
+    std::vector<const char*> classes;
+    for (std::uint32_t i = 0; i < fdrPluginClasses.classCount; ++i) {
+        classes.push_back(fdrPluginClasses.classes[i].name);
+    }
+    standard::GetData(nullptr, output.get(), classes.data(), static_cast<int>(classes.size()));
+    tqrhost::CloseMachine();
+    return 0;
+}
