@@ -6,6 +6,7 @@
 #include <thread>
 
 #include "ipmi/command.h"
+#include "ipmi/sel_record.h"
 
 namespace ipmisim {
 namespace {
@@ -13,8 +14,7 @@ namespace {
 using ipmi::kCompleted;
 using ipmi::kNotPresent;
 
-constexpr std::uint32_t kNoTime = 0xFFFFFFFF;     // IPMI 2.0, clause 37: unspecified
-constexpr std::uint8_t kFirstUntimedType = 0xE0;  // OEM records without a time stamp
+constexpr std::uint32_t kNoTime = ipmi::kUnspecifiedTime;
 
 void AppendU16(Bytes* bytes, std::size_t value) {
     bytes->push_back(static_cast<std::uint8_t>(value));
@@ -302,15 +302,15 @@ std::optional<Bytes> SimulatedBmc::GetSdr(const Request& request) {
 std::optional<Bytes> SimulatedBmc::GetSelInfo(const Request&) {
     const auto& entries = description_.selEntries;
     const auto newest = std::find_if(entries.rbegin(), entries.rend(), [](const auto& entry) {
-        return entry[2] < kFirstUntimedType;
+        const ipmi::RecordKind kind = ipmi::KindOfRecord(entry[2]);
+        return kind == ipmi::RecordKind::kSensorEvent || kind == ipmi::RecordKind::kOemTimestamped;
     });
     const std::uint32_t newestTime =
         newest == entries.rend()
             ? kNoTime
             : U16At(*newest, 3) | static_cast<std::uint32_t>(U16At(*newest, 5)) << 16;
-    constexpr std::size_t kEntrySize = 16;
     constexpr std::uint8_t kOverflow = 0x80;
-    const std::size_t left = (0xFFFF - Count16(entries.size())) * kEntrySize;
+    const std::size_t left = (0xFFFF - Count16(entries.size())) * ipmi::kSelRecordSize;
     return RepositoryInfo(
         description_.selVersion, entries.size(), description_.selFreeBytes.value_or(Count16(left)),
         description_.selLastAddition.value_or(newestTime),

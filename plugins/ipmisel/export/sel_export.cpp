@@ -6,6 +6,7 @@
 #include <string>
 
 #include "base/text.h"
+#include "ipmi/sel_record.h"
 #include "plugins/ipmisel/class_names.h"
 #include "plugins/ipmisel/export/clock_difference.h"
 #include "plugins/ipmisel/export/copied_text.h"
@@ -22,9 +23,7 @@ using NQORTQR20::TCPluginCallbacks;
 namespace ipmisel {
 namespace {
 
-constexpr std::uint8_t kSystemEvent = 0x02;
 constexpr std::size_t kEntityLength = 128;
-constexpr std::size_t kRecordLength = 16;
 constexpr std::size_t kSensorNameLength = 17;
 
 /// What is the same for all records of one export.
@@ -295,7 +294,7 @@ bool AddUnknown(Record* record) {
 
 bool AddBody(Record* record) {
     const std::uint8_t type = record->entry.RecordType();
-    if (type == kSystemEvent) return AddSystemEvent(record);
+    if (type == ipmi::kSystemEventType) return AddSystemEvent(record);
     const auto* const kind = std::find_if(kKinds.begin(), kKinds.end(),
                                           [&](const Kind& k) { return k.recordType == type; });
     return kind != kKinds.end() ? AddKind(record, *kind) : AddUnknown(record);
@@ -314,7 +313,7 @@ std::string AuxLogText(const Record& record) {
            " Extended Data: " + extended.GetExtendedDataString();
 }
 
-void FillArray(const ValueArray& array, const std::array<unsigned char, kRecordLength>& bytes) {
+void FillArray(const ValueArray& array, const std::array<unsigned char, ipmi::kSelRecordSize>& bytes) {
     const bool traced = LogEnabled(kTrace);
     WriteLog(kTrace, "Raw Hex Data values:");
     for (const unsigned char byte : bytes) {
@@ -333,7 +332,7 @@ bool Finish(const Record& record) {
         WriteLog(kWarning, "Could not create Array for Raw Hex Data.");
         return false;
     }
-    std::array<unsigned char, kRecordLength> bytes{};
+    std::array<unsigned char, ipmi::kSelRecordSize> bytes{};
     if (record.entry.CopyRawDataHex(record.exported.context, bytes.data(), bytes.size()) != kOk) {
         WriteLog(kTrace, "No Raw Hex Data obtained.");
         return true;

@@ -10,6 +10,8 @@
 
 #include "base/bytes.h"
 #include "base/text.h"
+#include "ipmi/event_types.h"
+#include "ipmi/sel_info.h"
 #include "plugins/ipmisel/log.h"
 #include "plugins/ipmisel/records/sel_texts.h"
 
@@ -29,7 +31,7 @@ constexpr std::size_t kRowNumbers = kRowHead + kRecordLength;
 // A line of SEL information: 15 groups and the line feed.
 constexpr std::size_t kInfoNumbers = 15;
 constexpr std::size_t kInfoLineLength = 46;
-constexpr unsigned kSelVersion = 0x51;
+constexpr unsigned kSelVersion = ipmi::kSelVersion;
 
 constexpr unsigned kRawTextLength = 64;
 
@@ -153,17 +155,23 @@ unsigned IPMISELEntry::CopyEventType(TCPluginCallbacks* /*context*/, char* out, 
 unsigned IPMISELEntry::CopyEventData(TCPluginCallbacks* context, char* out, unsigned int len,
                                      const s_SDR_Mod_Units* units, IPMIMapping* mapping) const {
     const TraceScope trace("IPMISELEntry::GetEventData()", TraceScope::kFunction);
-    const int type = bytes_[12] & 0x7F;
+    const std::uint8_t type = bytes_[12] & 0x7F;
     char text[kEventDataCapacity] = {};
-    if (type == 0x01) {
-        mapping->GetThresholdOffset(context, bytes_[13], bytes_[14], bytes_[15], text, sizeof text,
-                                    units);
-    } else if (type >= 0x02 && type <= 0x0C) {
-        mapping->GetGenericOffset(context, bytes_[13], bytes_[14], bytes_[15], type, bytes_[10],
-                                  bytes_[11], text, sizeof text);
-    } else if (type == 0x6F) {
-        mapping->GetSensorOffset(context, bytes_[10], bytes_[13], bytes_[14], bytes_[15], type,
-                                 text, sizeof text);
+    switch (ipmi::ClassOfEventType(type)) {
+        case ipmi::EventClass::kThreshold:
+            mapping->GetThresholdOffset(context, bytes_[13], bytes_[14], bytes_[15], text,
+                                        sizeof text, units);
+            break;
+        case ipmi::EventClass::kGeneric:
+            mapping->GetGenericOffset(context, bytes_[13], bytes_[14], bytes_[15], type, bytes_[10],
+                                      bytes_[11], text, sizeof text);
+            break;
+        case ipmi::EventClass::kSensorSpecific:
+            mapping->GetSensorOffset(context, bytes_[10], bytes_[13], bytes_[14], bytes_[15], type,
+                                     text, sizeof text);
+            break;
+        default:
+            break;
     }
     Trace("Event Data   = ", text);
     CopyOut(out, len, text);

@@ -4,16 +4,23 @@
 #include <string_view>
 
 #include "base/text.h"
+#include "ipmi/event_types.h"
 #include "plugins/ipmisel/texts/numbered_texts.h"
 
 namespace ipmisel {
 namespace {
 
-std::string_view EventClass(int type) {
-    if (type == 0x01) return "Threshold.";
-    if (type >= 0x02 && type <= 0x0C) return "Generic.";
-    if (type == 0x6F) return "Sensor-specific.";
-    return "Unknown event type.";  // the OEM types 0x70 to 0x7F too
+std::string_view EventClass(std::uint8_t type) {
+    switch (ipmi::ClassOfEventType(type)) {
+        case ipmi::EventClass::kThreshold:
+            return "Threshold.";
+        case ipmi::EventClass::kGeneric:
+            return "Generic.";
+        case ipmi::EventClass::kSensorSpecific:
+            return "Sensor-specific.";
+        default:
+            return "Unknown event type.";  // the OEM types 0x70 to 0x7F too
+    }
 }
 
 // System software IDs, IPMI 2.0, table 5-4.

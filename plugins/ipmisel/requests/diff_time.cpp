@@ -4,6 +4,7 @@
 #include <optional>
 #include <string>
 
+#include "ipmi/command.h"
 #include "plugins/ipmisel/records/calendar_time.h"
 #include "plugins/ipmisel/requests/ipmi_message.h"
 #include "tqr/status.h"
@@ -14,7 +15,7 @@ using NQORTQR20::TCIMDateTime;
 namespace {
 
 constexpr IPMICommand kGetSelTime{
-    .command = 0x48,
+    .command = ipmi::kGetSelTime.number,
     .sendFailure = "Failure in sending command to obtain system event log device time.",
     .errorPrefix = "IPMI error in obtaining system event log device time: "};
 

@@ -1,4 +1,5 @@
 #include "plugins/ipmisel/requests/request_aux_log.h"
+#include "ipmi/command.h"
 
 #include <array>
 #include <cstdint>
@@ -11,7 +12,7 @@ namespace {
 // Compatibility: the line speaks of the system event log
 // (Exchange.EveryCommandReportsNoAnswerAndCompletionCodes).
 constexpr IPMICommand kGetAuxLogStatus{
-    .command = 0x5A,
+    .command = ipmi::kGetAuxiliaryLogStatus.number,
     .sendFailure = "Failure in sending command to obtain AUX Log Status.",
     .errorPrefix = "IPMI error in obtaining system event log info: "};
 constexpr std::array<std::uint8_t, 1> kStatusRequest{0x01};

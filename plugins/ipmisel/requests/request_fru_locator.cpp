@@ -5,6 +5,8 @@
 #include <string>
 
 #include "base/text.h"
+#include "ipmi/command.h"
+#include "ipmi/sdr_record.h"
 
 using namespace ipmisel;
 
@@ -24,21 +26,21 @@ constexpr IPMICommand FruCommand(std::uint8_t command, const char* sendFailure,
             .errorSeverity = kInfo};
 }
 
-constexpr IPMICommand kReserveSdr = FruCommand(0x22, "Failure in sending command to reserve SDR.",
-                                               "IPMI error in reserving sensor data record: ");
+constexpr IPMICommand kReserveSdr =
+    FruCommand(ipmi::kReserveSdrRepository.number, "Failure in sending command to reserve SDR.",
+               "IPMI error in reserving sensor data record: ");
 constexpr IPMICommand kGetSdrHeader =
-    FruCommand(0x23, "Failure in sending command to obtain SDR Header.",
+    FruCommand(ipmi::kGetSdr.number, "Failure in sending command to obtain SDR Header.",
                "IPMI error in obtaining sensor data record header: ");
 constexpr IPMICommand kGetSdrString =
-    FruCommand(0x23, "Failure in sending command to obtain SDR String.",
+    FruCommand(ipmi::kGetSdr.number, "Failure in sending command to obtain SDR String.",
                "IPMI error in obtaining sensor data record string: ");
 
 // IPMI 2.0, table 43-7.
-constexpr std::uint8_t kFruDeviceLocator = 0x11;
+constexpr auto kFruDeviceLocator = static_cast<std::uint8_t>(ipmi::SdrType::kFruLocator);
 constexpr std::uint8_t kHeaderOffset = 0;
 constexpr std::uint8_t kHeaderCount = 15;
 constexpr std::uint8_t kStringOffset = 15;
-constexpr std::uint8_t kToTheEnd = 0xFF;
 
 constexpr unsigned kInventoryBytes = 256;
 constexpr std::uint8_t kChunk = 16;
@@ -120,7 +122,7 @@ unsigned IPMIRequestFRULocator::IPMIGetSDRHeader(NQORTQR20::TCPluginCallbacks*,
 unsigned IPMIRequestFRULocator::IPMIGetSDRString(NQORTQR20::TCPluginCallbacks*,
                                                  IPMIFRULocator* locator) {
     TraceScope trace("IPMIRequestFRULocator::IPMIGetSDRString()");
-    if (ReadRecord(kGetSdrString, kStringOffset, kToTheEnd) != kOk) return trace.Fail();
+    if (ReadRecord(kGetSdrString, kStringOffset, ipmi::kWholeRecord) != kOk) return trace.Fail();
     constexpr std::size_t kBeforeText = 4;  // completion code, next record ID, type/length byte
     ByteReader reply = Reply();
     reply.Skip(2);
@@ -168,7 +170,8 @@ unsigned IPMIRequestFRULocator::IPMIGetFRUData(NQORTQR20::TCPluginCallbacks*,
     const std::string errorPrefix =
         "FRU data not available for Device ID " + std::to_string(device) + ": ";
     const IPMICommand readFruData =
-        FruCommand(0x11, "Failure in sending command to obtain FRU Data.", errorPrefix.c_str());
+        FruCommand(ipmi::kReadFruData.number, "Failure in sending command to obtain FRU Data.",
+                   errorPrefix.c_str());
     for (unsigned offset = 0; offset < kInventoryBytes; offset += kChunk) {
         const std::array<std::uint8_t, 4> request{device, static_cast<std::uint8_t>(offset), 0x00,
                                                   kChunk};

@@ -4,6 +4,8 @@
 #include <array>
 
 #include "base/text.h"
+#include "ipmi/command.h"
+#include "ipmi/sdr_record.h"
 
 using namespace ipmisel;
 
@@ -18,23 +20,24 @@ constexpr IPMICommand SdrCommand(std::uint8_t command, const char* sendFailure,
 }
 
 constexpr IPMICommand kGetSdrInfo =
-    SdrCommand(0x20, "Failure in sending command to obtain SDR info.",
+    SdrCommand(ipmi::kGetSdrRepositoryInfo.number, "Failure in sending command to obtain SDR info.",
                "IPMI error in obtaining sensor data record info: ");
-constexpr IPMICommand kReserveSdr = SdrCommand(0x22, "Failure in sending command to reserve SDR.",
-                                               "IPMI error in reserving sensor data record: ");
+constexpr IPMICommand kReserveSdr =
+    SdrCommand(ipmi::kReserveSdrRepository.number, "Failure in sending command to reserve SDR.",
+               "IPMI error in reserving sensor data record: ");
 constexpr IPMICommand kGetSdrHeader =
-    SdrCommand(0x23, "Failure in sending command to obtain SDR Header.",
+    SdrCommand(ipmi::kGetSdr.number, "Failure in sending command to obtain SDR Header.",
                "IPMI error in obtaining sensor data record header: ");
 constexpr IPMICommand kGetSdrUnits =
-    SdrCommand(0x23, "Failure in sending command to obtain SDR Units.",
+    SdrCommand(ipmi::kGetSdr.number, "Failure in sending command to obtain SDR Units.",
                "IPMI error in obtaining sensor data record units: ");
 constexpr IPMICommand kGetSdrString =
-    SdrCommand(0x23, "Failure in sending command to obtain SDR String.",
+    SdrCommand(ipmi::kGetSdr.number, "Failure in sending command to obtain SDR String.",
                "IPMI error in obtaining sensor data record string: ");
 
 // Record types, and offsets in their records (IPMI 2.0, tables 43-1 and 43-2).
-constexpr std::uint8_t kFullSensor = 0x01;
-constexpr std::uint8_t kCompactSensor = 0x02;
+constexpr auto kFullSensor = static_cast<std::uint8_t>(ipmi::SdrType::kFull);
+constexpr auto kCompactSensor = static_cast<std::uint8_t>(ipmi::SdrType::kCompact);
 constexpr std::uint8_t kHeaderOffset = 0;
 constexpr std::uint8_t kHeaderCount = 10;
 constexpr std::uint8_t kRecordTypeAt = 3;
@@ -42,7 +45,6 @@ constexpr std::uint8_t kUnitsOffset = 20;
 constexpr std::uint8_t kUnitsCount = 10;
 constexpr std::uint8_t kFullStringOffset = 47;
 constexpr std::uint8_t kCompactStringOffset = 31;
-constexpr std::uint8_t kToTheEnd = 0xFF;
 
 /// Compatibility: one byte of 0xFF ends the repository, so that a record whose ID has such a byte
 /// is never read (SdrWalk.AnyFfByteEndsTheWalk).
@@ -109,7 +111,7 @@ unsigned IPMIRequestSDR::IPMIGetSDRString(NQORTQR20::TCPluginCallbacks*, s_SDR_e
     TraceScope trace("IPMIRequestSDR::IPMIGetSDRString()");
     const std::uint8_t offset =
         recordType_ == kFullSensor ? kFullStringOffset : kCompactStringOffset;
-    if (ReadRecord(kGetSdrString, offset, kToTheEnd) != kOk) return trace.Fail();
+    if (ReadRecord(kGetSdrString, offset, ipmi::kWholeRecord) != kOk) return trace.Fail();
     StoreText(entry->SDRStringData);
     return kOk;
 }

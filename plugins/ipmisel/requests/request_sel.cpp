@@ -6,18 +6,20 @@
 #include <string>
 
 #include "base/text.h"
+#include "ipmi/command.h"
+#include "ipmi/sel_info.h"
 
 using namespace ipmisel;
 
 namespace {
 
-constexpr IPMICommand kGetSelInfo{.command = 0x40,
+constexpr IPMICommand kGetSelInfo{.command = ipmi::kGetSelInfo.number,
                                   .sendFailure = "Failure in sending command to obtain SEL info.",
                                   .errorPrefix = "IPMI error in obtaining system event log info: ",
                                   .eraseText = true};
 
 constexpr IPMICommand kGetFirstEntry{
-    .command = 0x43,
+    .command = ipmi::kGetSelEntry.number,
     .sendFailure = "Failure in sending command to obtain SEL Entry.",
     .errorPrefix = "IPMI error in obtaining system event log entry: ",
     .eraseText = true};
@@ -25,16 +27,14 @@ constexpr IPMICommand kGetFirstEntry{
 // Compatibility: an answer missing in the middle of the walk is tolerated and ends it well
 // (SelWalk.MissingAnswerInTheMiddleKeepsTheRowsAndIsTolerated).
 constexpr IPMICommand kGetLaterEntry{
-    .command = 0x43,
+    .command = ipmi::kGetSelEntry.number,
     .sendFailure = "Failure in sending command to obtain SEL entry.\n",
     .sendFailureSeverity = kTrace,
     .sendFailureResult = kEndOfData,
     .errorPrefix = "IPMI error in obtaining system event log entry: ",
     .eraseText = true};
 
-constexpr std::uint8_t kSelVersion = 0x51;
 constexpr std::size_t kDumpCapacity = 256;
-constexpr std::uint8_t kWholeRecord = 0xFF;
 
 }  // namespace
 
@@ -53,7 +53,7 @@ unsigned IPMIRequestSEL::IPMIGetSELInfo(NQORTQR20::TCPluginCallbacks*, unsigned 
     if (LogEnabled(kTrace)) WriteLog(kTrace, "IPMIGetSELInfo::tempbuf = " + ResponseText());
     if (Response().empty()) return trace.Fail("Error in reading data for SEL information.");
     ByteReader reply = Reply();
-    if (reply.U8() != kSelVersion) {
+    if (reply.U8() != ipmi::kSelVersion) {
         return trace.Fail("The SEL Version does not match the Current IPMI Version\n");
     }
     *entryCount = reply.U16();
@@ -72,7 +72,7 @@ unsigned IPMIRequestSEL::IPMIGetSELEntry(NQORTQR20::TCPluginCallbacks*, s_SEL_ro
     for (unsigned counter = 0; counter < kMostRecords; ++counter) {
         // A reservation is not needed for whole records, hence ID 0x0000.
         const std::array<std::uint8_t, 6> request{
-            0x00, 0x00, nextRecordId_.low, nextRecordId_.high, 0x00, kWholeRecord};
+            0x00, 0x00, nextRecordId_.low, nextRecordId_.high, 0x00, ipmi::kWholeRecord};
         const unsigned result = Exchange(counter == 0 ? kGetFirstEntry : kGetLaterEntry, request);
         if (result == kEndOfData) break;
         if (result != kOk) return trace.Fail();

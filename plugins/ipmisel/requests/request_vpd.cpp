@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "base/text.h"
+#include "ipmi/command.h"
 
 using namespace ipmisel;
 
@@ -20,8 +21,8 @@ constexpr std::uint8_t kMajorVersion = 0x7F;       // bit 7 tells of an update i
 constexpr std::uint32_t kManufacturer = 0x0FFFFF;  // 20 bits
 
 constexpr IPMICommand kGetDeviceID{
-    .netFn = 0x06,
-    .command = 0x01,
+    .netFn = ipmi::kGetDeviceId.netFn,
+    .command = ipmi::kGetDeviceId.number,
     .sendFailure = "Failure in sending command to obtain BMC firmware information.",
     .errorPrefix = "IPMI error in obtaining BMC firmware information: ",
     .errorSeverity = kNotice};
