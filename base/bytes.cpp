@@ -5,6 +5,8 @@
 #include <charconv>
 #include <limits>
 
+#include "base/hex.h"
+
 namespace ipmisel {
 namespace {
 
@@ -12,10 +14,7 @@ void AppendByte(std::string* text, std::uint8_t byte, Digits digits) {
     if (digits == Digits::kDecimal) {
         *text += std::to_string(byte);
     } else {
-        const char* alphabet =
-            digits == Digits::kUpperHex ? "0123456789ABCDEF" : "0123456789abcdef";
-        *text += alphabet[byte >> 4];
-        *text += alphabet[byte & 0x0F];
+        AppendHex(text, byte, digits == Digits::kUpperHex ? HexCase::kUpper : HexCase::kLower);
     }
     *text += ' ';
 }

@@ -6,6 +6,7 @@
 #include <string_view>
 #include <utility>
 
+#include "base/hex.h"
 #include "base/text.h"
 #include "ipmi/id_string.h"
 
@@ -49,12 +50,7 @@ bool IsBcdPlus(Bytes bytes) {
 
 std::string WithoutPadding(std::string text) { return text.erase(text.find_last_not_of(' ') + 1); }
 
-std::string HexText(Bytes bytes) {
-    if (bytes.empty()) return {};
-    std::string text = "0x";
-    for (const std::uint8_t byte : bytes) text += Format("%02x", byte);
-    return text;
-}
+std::string HexNumber(Bytes bytes) { return bytes.empty() ? "" : "0x" + ipmisel::HexText(bytes); }
 
 /// Reads the fields of an area one after the other.
 class FieldReader {
@@ -111,11 +107,11 @@ private:
         const std::size_t all = bytes.size() * 2;  // no encoding has more characters
         switch (encoding) {
             case kBinary:
-                return HexText(bytes);
+                return HexNumber(bytes);
             case TextEncoding::kBcdPlus:
                 if (IsBcdPlus(bytes)) return WithoutPadding(DecodeBcdPlus(bytes, all));
                 Problem(Format("field %u is no BCD plus", number_));
-                return HexText(bytes);
+                return HexNumber(bytes);
             case TextEncoding::kSixBit:
                 return WithoutPadding(DecodeSixBit(bytes, all));
             case TextEncoding::kLatin1:

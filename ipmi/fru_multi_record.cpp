@@ -4,6 +4,7 @@
 #include <optional>
 #include <utility>
 
+#include "base/hex.h"
 #include "base/text.h"
 #include "ipmi/id_string.h"
 
@@ -75,9 +76,7 @@ public:
     }
     void AddHex(const char* name, std::size_t at) {
         if (at >= data_.size()) return;
-        std::string digits = "0x";
-        for (const std::uint8_t byte : data_.subspan(at)) digits += Format("%02x", byte);
-        Add(name, std::move(digits));
+        Add(name, "0x" + ipmisel::HexText(data_.subspan(at)));
     }
     /// Adds the IANA number of a manufacturer in three bytes; false when the data end before it.
     bool AddManufacturer() {

@@ -99,6 +99,12 @@ std::optional<std::uint32_t> MemorySize(Bytes area) {
 
 }  // namespace
 
+bool HasIpmiDevice(std::span<const std::vector<std::uint8_t>> structures) {
+    return std::any_of(structures.begin(), structures.end(), [](const auto& structure) {
+        return !structure.empty() && structure[0] == kSmbiosIpmiDevice;
+    });
+}
+
 std::string SmbiosString(Bytes structure, std::size_t number) {
     if (number == 0 || structure.size() < 2 || structure[1] > structure.size()) return {};
     Bytes strings = structure.subspan(structure[1]);

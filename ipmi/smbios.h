@@ -6,6 +6,7 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <vector>
 
 // SMBIOS structures as values (DSP0134 3.6): what the firmware tells the operating system about the
 // parts of the machine. A structure: type, length of the formatted area (4 at least), handle (16
@@ -20,6 +21,9 @@ constexpr std::uint8_t kSmbiosProcessor = 4;
 constexpr std::uint8_t kSmbiosSlot = 9;
 constexpr std::uint8_t kSmbiosMemoryDevice = 17;
 constexpr std::uint8_t kSmbiosIpmiDevice = 38;
+
+/// Whether one of the structures is an IPMI device information: the machine has a BMC.
+bool HasIpmiDevice(std::span<const std::vector<std::uint8_t>> structures);
 
 /// The number-th string (from 1) of a structure; empty when it has none of that number.
 std::string SmbiosString(std::span<const std::uint8_t> structure, std::size_t number);

@@ -11,6 +11,8 @@
 #include <sstream>
 #include <utility>
 
+#include "base/hex.h"
+
 namespace ipmisel {
 namespace {
 
@@ -189,16 +191,13 @@ std::vector<std::uint8_t> JsonValue::Hex() const {
     for (std::size_t i = 0; i < text.size(); ++i) {
         const char c = text[i];
         if (c == ' ' || c == '\t') continue;
-        const auto digit = c >= '0' && c <= '9'   ? c - '0'
-                           : c >= 'a' && c <= 'f' ? c - 'a' + 10
-                           : c >= 'A' && c <= 'F' ? c - 'A' + 10
-                                                  : -1;
-        if (digit < 0) Refuse("character " + std::to_string(i + 1) + " is no hexadecimal digit");
+        const auto digit = HexDigit(c);
+        if (!digit) Refuse("character " + std::to_string(i + 1) + " is no hexadecimal digit");
         if (high) {
-            bytes.push_back(static_cast<std::uint8_t>(*high << 4 | static_cast<unsigned>(digit)));
+            bytes.push_back(static_cast<std::uint8_t>(*high << 4 | *digit));
             high.reset();
         } else {
-            high = static_cast<unsigned>(digit);
+            high = *digit;
         }
     }
     if (high) Refuse("a byte is two hexadecimal digits; their number here is odd");

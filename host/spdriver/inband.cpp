@@ -1,4 +1,3 @@
-#include <algorithm>
 #include <cerrno>
 #include <chrono>
 #include <cstring>
@@ -22,12 +21,6 @@ class SilentTransport : public Transport {
 public:
     std::optional<Response> Exchange(const RequestFrame&) override { return std::nullopt; }
 };
-
-bool HasIpmiDevice(const std::vector<std::vector<std::uint8_t>>& smbios) {
-    return std::any_of(smbios.begin(), smbios.end(), [](const auto& structure) {
-        return !structure.empty() && structure[0] == ipmi::kSmbiosIpmiDevice;
-    });
-}
 
 /// A device file without a driver behind it, or none at all.
 bool NoDriver(int error) { return error == ENOENT || error == ENODEV || error == ENXIO; }
@@ -77,7 +70,7 @@ Source OpenInbandDevice(const std::vector<std::filesystem::path>& devices, Syste
             {"inband", nullptr, std::make_unique<InbandPipeline>(std::move(device), timeout)});
         return source;
     }
-    if (HasIpmiDevice(source.facts.smbios)) {
+    if (ipmi::HasIpmiDevice(source.facts.smbios)) {
         source.facts.ipmiDriver = false;
         source.nodes.push_back({"inband", std::make_unique<SilentTransport>(), nullptr});
         return source;

@@ -11,26 +11,16 @@
 #include <string>
 #include <utility>
 
+#include "base/hex.h"
 #include "host/spdriver/capture.h"
 #include "tqr/datetime.h"
 
 namespace tqrhost {
 namespace {
 
-std::string Hex(std::span<const std::uint8_t> bytes) {
-    constexpr char kDigits[] = "0123456789abcdef";
-    std::string text;
-    text.reserve(bytes.size() * 2);
-    for (const std::uint8_t byte : bytes) {
-        text += kDigits[byte >> 4];
-        text += kDigits[byte & 0x0F];
-    }
-    return text;
-}
-
 std::string FactsLine(const Source& source) {
     nlohmann::ordered_json smbios = nlohmann::ordered_json::array();
-    for (const auto& structure : source.facts.smbios) smbios.push_back(Hex(structure));
+    for (const auto& structure : source.facts.smbios) smbios.push_back(ipmisel::HexText(structure));
     const nlohmann::ordered_json line = {
         {"ipmisel_capture", 1},
         {"machine_type", source.facts.machineType},
@@ -90,9 +80,9 @@ public:
     std::optional<Response> Exchange(const RequestFrame& request) override {
         auto response = transport_->Exchange(request);
         if (response && response->empty()) response.reset();
-        capture_->Write(
-            "{\"node\": " + std::to_string(node_) + ", \"request\": \"" + Hex(request.bytes()) +
-            "\", \"response\": " + (response ? "\"" + Hex(*response) + "\"" : "null") + "}\n");
+        capture_->Write("{\"node\": " + std::to_string(node_) + ", \"request\": \"" +
+                        ipmisel::HexText(request.bytes()) + "\", \"response\": " +
+                        (response ? "\"" + ipmisel::HexText(*response) + "\"" : "null") + "}\n");
         return response;
     }
 

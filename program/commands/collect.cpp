@@ -18,6 +18,7 @@
 #include "host/spdriver/reading.h"
 #include "host/spdriver/source.h"
 #include "host/spdriver/stop.h"
+#include "ipmi/smbios.h"
 #include "program/commands/access.h"
 #include "program/commands/arguments.h"
 #include "program/commands/failure.h"
@@ -35,7 +36,6 @@ namespace ipmisel {
 namespace {
 
 constexpr std::int64_t kMicrosecondsPerSecond = 1000000;
-constexpr std::uint8_t kIpmiDeviceStructure = 38;  // SMBIOS, IPMI device information
 
 /// What the user asked for.
 struct CollectOptions {
@@ -58,10 +58,7 @@ std::string Joined(const std::vector<std::string>& parts) {
 /// The plug-in decides by the same signs and says nothing: a machine without them is told here.
 bool HasBmc() {
     const tqrhost::MachineFacts& facts = tqrhost::GetMachineFacts();
-    const bool known =
-        facts.ipmiLan || std::any_of(facts.smbios.begin(), facts.smbios.end(), [](const auto& s) {
-            return !s.empty() && s[0] == kIpmiDeviceStructure;
-        });
+    const bool known = facts.ipmiLan || ipmi::HasIpmiDevice(facts.smbios);
     return known && NQORTQR20::SPLibrary::GetNumberBMCNode() > 0;
 }
 

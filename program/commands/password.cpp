@@ -14,6 +14,7 @@
 #include <iterator>
 #include <string_view>
 
+#include "base/hex.h"
 #include "program/commands/failure.h"
 
 namespace ipmisel {
@@ -142,16 +143,6 @@ std::string FromTerminal() {
 
 constexpr std::size_t kLongestKg = 20;  // IPMI 2.0, clause 13.33
 
-/// The bytes of an even number of hexadecimal digits; empty for anything else.
-std::vector<std::uint8_t> FromHex(std::string_view digits) {
-    std::vector<std::uint8_t> bytes(digits.size() / 2);
-    for (std::size_t i = 0; i < bytes.size(); ++i) {
-        const char* const pair = digits.data() + 2 * i;
-        if (std::from_chars(pair, pair + 2, bytes[i], 16).ptr != pair + 2) return {};
-    }
-    return digits.size() % 2 == 0 ? bytes : std::vector<std::uint8_t>();
-}
-
 }  // namespace
 
 std::string ReadPassword(const std::optional<std::string>& file) {
@@ -165,8 +156,9 @@ std::vector<std::uint8_t> ReadKg(const std::optional<std::string>& file) {
     if (!file && given == nullptr) return {};
     const std::string text = file ? FromFile(*file, "key") : given;
     const bool isHex = text.starts_with("0x");
-    auto key = isHex ? FromHex(std::string_view(text).substr(2))
-                     : std::vector<std::uint8_t>(text.begin(), text.end());
+    auto key =
+        isHex ? ParseHex(std::string_view(text).substr(2)).value_or(std::vector<std::uint8_t>())
+              : std::vector<std::uint8_t>(text.begin(), text.end());
     if (key.empty() || key.size() > kLongestKg) {
         Refuse("the key of the BMC (Kg) from " + (file ? *file : "IPMISEL_KG") +
                " is none; give 1 to 20 characters, or 0x and 2 to 40 hexadecimal digits");

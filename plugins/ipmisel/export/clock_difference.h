@@ -1,13 +1,11 @@
 #pragma once
 
+#include "plugins/ipmisel/records/calendar_time.h"
 #include "tqr/datetime.h"
 #include "tqr/plugin.h"
 #include "tqr/splibrary.h"
 
 namespace ipmisel {
-
-/// Stands for no time in every time stamp that is written.
-inline constexpr const char* kNoTime = "19700101000000.000000+000";
 
 /// How far the BMC's clock stands from the operating system's: measured once per export, handed to
 /// the time stamps of every record.

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "base/text.h"
+#include "ipmi/smbios.h"
 #include "plugins/ipmisel/log.h"
 #include "plugins/ipmisel/pass/state.h"
 #include "plugins/ipmisel/texts/machine_families.h"
@@ -26,7 +27,6 @@ enum StructureType : int {
     kFirmware = 0,
     kOnBoardDevices = 10,
     kOemStrings = 11,
-    kIpmiDevice = 38,
     kOnBoardDevicesExtended = 41,
 };
 
@@ -115,9 +115,9 @@ bool HasIpmiDevice(const SmbiosReader& reader, const char** finding) {
         return false;
     }
     int length = kDeviceRecordRoom;
-    const bool found =
-        NQORTQR20::smBiosGetFirst(reader.handle(), kIpmiDevice, structure.get(), &length) == 0 &&
-        length > 0;
+    const bool found = NQORTQR20::smBiosGetFirst(reader.handle(), ipmi::kSmbiosIpmiDevice,
+                                                 structure.get(), &length) == 0 &&
+                       length > 0;
     *finding =
         found ? "Found a Type 38 SMBIOS BMC record" : "Did NOT find a Type 38 SMBIOS BMC record";
     return found;

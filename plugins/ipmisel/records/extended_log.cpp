@@ -5,6 +5,7 @@
 #include <string_view>
 
 #include "base/bytes.h"
+#include "base/hex.h"
 #include "base/text.h"
 #include "plugins/ipmisel/log.h"
 
@@ -84,11 +85,9 @@ constexpr std::array<CodeClass, 4> kClasses{{{"Computing", kComputing},
                                              {"I/O BUS", kIoBus},
                                              {"Software", kSoftware}}};
 
-/// "0x" and two digits a byte, in stored order.
-std::string HexText(std::span<const std::uint8_t> bytes) {
-    std::string text = "0x";
-    for (const std::uint8_t byte : bytes) text += Format("%02X", byte);
-    return text;
+/// "0x" and two digits per byte, in stored order.
+std::string HexNumber(std::span<const std::uint8_t> bytes) {
+    return "0x" + HexText(bytes, HexCase::kUpper);
 }
 
 constexpr std::array<std::uint8_t, 3> kSignature{0x4D, 0x4F, 0x00};
@@ -129,7 +128,7 @@ void IPMIExtendedSELDataEntry::SetSeverity(unsigned char severity) {
 
 void IPMIExtendedSELDataEntry::SetOperation(const unsigned char* operation) {
     std::copy_n(operation, operation_.size(), operation_.begin());
-    operationText_ = HexText(operation_);
+    operationText_ = HexNumber(operation_);
 }
 
 void IPMIExtendedSELDataEntry::SetSubclass(unsigned char subclass) { subclass_ = subclass; }
@@ -149,12 +148,12 @@ void IPMIExtendedSELDataEntry::SetClass(unsigned char classCode) {
 
 void IPMIExtendedSELDataEntry::SetFRUInstance(const unsigned char* instance) {
     std::copy_n(instance, fruInstance_.size(), fruInstance_.begin());
-    fruInstanceText_ = HexText(fruInstance_);
+    fruInstanceText_ = HexNumber(fruInstance_);
 }
 
 void IPMIExtendedSELDataEntry::SetGUID(const unsigned char* guid) {
     std::copy_n(guid, guid_.size(), guid_.begin());
-    guidText_ = HexText(guid_);
+    guidText_ = HexNumber(guid_);
 }
 
 void IPMIExtendedSELDataEntry::SetExtendedData(std::string text) {

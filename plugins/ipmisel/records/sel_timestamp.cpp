@@ -14,8 +14,6 @@ using NQORTQR20::TCPluginCallbacks;
 namespace ipmisel {
 namespace {
 
-constexpr const char* kNoTime = "19700101000000.000000+000";
-
 /// Time stamps up to here count from the initialisation of the BMC (IPMI 2.0, 37.1).
 constexpr std::int64_t kLastBeforeInitialisation = 0x1FFFFFFF;
 

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "base/hex.h"
 #include "base/text.h"
 #include "ipmi/command.h"
 
@@ -54,12 +55,6 @@ std::string Pointed(std::span<const std::uint8_t> bytes) {
     return text;
 }
 
-std::string Hex(std::span<const std::uint8_t> bytes) {
-    std::string text;
-    for (const std::uint8_t byte : bytes) text += Format("%02X", byte);
-    return text;
-}
-
 /// The characters up to a NUL that can be shown; empty when none can be seen.
 std::string ShownText(std::span<const std::uint8_t> bytes) {
     const std::string text(bytes.begin(), std::find(bytes.begin(), bytes.end(), 0));
@@ -99,7 +94,7 @@ std::string VersionText(const FirmwareQuery& query, std::span<const std::uint8_t
         case VersionForm::kMajorMinor:
             return Pointed(version);
         case VersionForm::kHex:
-            return Hex(version);
+            return HexText(version, HexCase::kUpper);
         case VersionForm::kText:
             return ShownText(version);
     }
