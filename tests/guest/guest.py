@@ -74,7 +74,7 @@ def initramfs(build: pathlib.Path, modules: list[pathlib.Path], script: str) -> 
     files = {"bin/busybox": pathlib.Path(busybox)}
     files |= {f"modules/{module.name}": module for module in modules}
     installed = [build / "bin/ipmisel", *sorted((build / "lib").glob("*.so")),
-                 build / "lib/ipmisel/libipmisel.pi", build / "lib/ipmisel/ipmisel.INI"]
+                 *sorted((build / "lib/ipmisel").glob("*.pi")), build / "lib/ipmisel/ipmisel.INI"]
     libraries = set()
     for path in installed:
         files["opt/" + str(path.relative_to(build))] = path
@@ -144,8 +144,10 @@ def free_port(kind=socket.SOCK_STREAM) -> int:
 
 
 @contextlib.contextmanager
-def ipmi_sim(sel: list[bytes], sdrs: list[bytes]):
-    """A BMC of OpenIPMI, reached over the LAN and by a virtual machine: (udp port, tcp port)."""
+def ipmi_sim(sel: list[bytes], sdrs: list[bytes], commands: tuple[str, ...] = ()):
+    """A BMC of OpenIPMI, reached over the LAN and by a virtual machine: (udp port, tcp port).
+
+    `commands` are its own, given before the BMC is enabled."""
     program = shutil.which("ipmi_sim")
     if not program:
         raise Missing("no ipmi_sim (package openipmi)")
@@ -164,7 +166,7 @@ def ipmi_sim(sel: list[bytes], sdrs: list[bytes]):
            f"sel_enable 0x20 {max(len(sel), 1) + 10} 0x0a"]
     emu += [f"sel_add 0x20 0x{entry[2]:02x} {hexes(entry[3:])}" for entry in sel]
     emu += [f"main_sdr_add 0x20 {hexes(record)}" for record in sdrs]
-    emu.append("mc_enable 0x20")
+    emu += [*commands, "mc_enable 0x20"]
     with tempfile.TemporaryDirectory() as folder:
         base = pathlib.Path(folder)
         (base / "lan.conf").write_text(lan)

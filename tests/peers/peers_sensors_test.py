@@ -1,0 +1,142 @@
+"""One repository, read by ipmisel, ipmitool and ipmi-sensors: names, units, readings, thresholds.
+
+usage: peers_sensors_test.py PROGRAM SOURCE_FOLDER    (exit status 77: a facility is missing)
+"""
+import csv
+import json
+import os
+import pathlib
+import shutil
+import subprocess
+import sys
+import tempfile
+import unittest
+
+PROGRAM = pathlib.Path(sys.argv[1]).resolve()
+SOURCE = pathlib.Path(sys.argv[2]).resolve()
+sys.path.insert(0, str(SOURCE / "tests/guest"))
+import guest  # noqa: E402
+
+UNSIGNED, ONES, TWOS = 0x00, 0x40, 0x80
+# Name, sensor type, format and rate and percentage, base unit, linearization, M, B, exponents of B
+# and R, reading, thresholds from lower non-critical to upper non-recoverable. IPMI 2.0, 36.3.
+ANALOG = [
+    ("Unsigned", 0x01, UNSIGNED, 1, 0, 1, 0, 0, 0, 0x59, (5, 3, 1, 0x60, 0x70, 0xF0)),
+    ("Offset", 0x01, UNSIGNED, 1, 0, 2, -50, 0, 0, 0x40, (5, 3, 1, 0x60, 0x70, 0xF0)),
+    ("Negative M", 0x01, UNSIGNED, 1, 0, -3, 7, 1, -1, 0x21, (0xF0, 0xF1, 0xF2, 5, 4, 3)),
+    ("Twos", 0x01, TWOS, 1, 0, 2, 7, 0, 0, 0xF6, (0xE0, 0xD0, 0xC0, 0x10, 0x20, 0x30)),
+    ("Ones", 0x01, ONES, 1, 0, 1, 0, 0, 0, 0xF6, (0xE0, 0xD0, 0xC0, 0x10, 0x20, 0x30)),
+    ("Volts", 0x02, UNSIGNED, 4, 0, 61, 0, 0, -3, 0xC4, (0xB0, 0xA0, 0x90, 0xD0, 0xE0, 0xF0)),
+    ("Amps", 0x03, UNSIGNED, 5, 0, 5, 0, 0, -2, 0x10, (2, 1, 0, 0x60, 0x70, 0xF0)),
+    ("Fan", 0x04, UNSIGNED, 18, 0, 60, 0, 0, 0, 0x70, (20, 10, 0, 0xC0, 0xD0, 0xE0)),
+    ("Watts", 0x0B, UNSIGNED, 6, 0, 4, 0, 0, 0, 0x30, (5, 3, 1, 0x60, 0x70, 0xF0)),
+]
+FUNCTIONS = ["linear", "ln", "log10", "log2", "e", "exp10", "exp2", "1/x", "sqr", "cube", "sqrt",
+             "cube root"]
+# M = 1, R exponent -1: raw 20 is 2.
+ANALOG += [(name, 0x01, UNSIGNED, 1, function, 1, 0, 0, -1, 20, (10, 5, 2, 30, 35, 40))
+           for function, name in enumerate(FUNCTIONS) if function]
+# As they are in a record, and what they say.
+NAMES = [
+    (0xC5, b"Latin", "Latin"), (0x84, bytes([0x29, 0xDC, 0xA6]), "IPMI"),
+    (0x46, bytes([0x01, 0x2B, 0x9C]), "012-9."), (0x03, "Ünï".encode("utf-16-le"), "Ünï"),
+]
+LIMITS = ["LowerNonCritical", "LowerCritical", "LowerNonRecoverable", "UpperNonCritical",
+          "UpperCritical", "UpperNonRecoverable"]
+UNITS = {1: "degrees C", 4: "Volts", 5: "Amps", 6: "Watts", 18: "RPM"}
+# A reading is shown to two or three places, or to six significant ones.
+PLACES = 0.006
+
+
+def ten_bits(value: int) -> list[int]:
+    return [value & 0xFF, value >> 2 & 0xC0]
+
+
+def record(number: int, analog: tuple, name: tuple[int, bytes]) -> bytes:
+    _, kind, form, unit, function, m, b, b_exponent, r_exponent, _, limits = analog
+    upper_first = [limits[place] for place in (5, 4, 3, 2, 1, 0)]
+    rest = [0x20, 0, number, 3, 1, 0x7F, 0x68, kind, 1, 0, 0, 0, 0, 0x3F, 0x3F, form, unit, 0,
+            function, *ten_bits(m), *ten_bits(b), 0, (r_exponent & 15) << 4 | b_exponent & 15, 0,
+            0, 0, 0, 0, 0, *upper_first, 1, 1, 0, 0, 0, name[0], *name[1]]
+    return bytes([number, 0, 0x51, 1, len(rest), *rest])
+
+
+def number(text: str) -> float | None:
+    try:
+        return float(text)
+    except ValueError:
+        return None
+
+
+class SideBySide(unittest.TestCase):
+    @classmethod
+    def setUpClass(cls):
+        rows = [(analog, (0xC0 | len(analog[0]), analog[0].encode())) for analog in ANALOG]
+        rows += [(ANALOG[0], name[:2]) for name in NAMES]
+        records = [record(place, *row) for place, row in enumerate(rows, 1)]
+        commands = []
+        for place, (analog, _) in enumerate(rows, 1):
+            commands += [
+                f"sensor_add 0x20 0 {place} {analog[1]} 1",
+                f"sensor_set_value 0x20 0 {place} {analog[9]} 0",
+                f"sensor_set_threshold 0x20 0 {place} settable 111111 "
+                + " ".join(str(analog[10][limit]) for limit in (5, 4, 3, 2, 1, 0)),
+                f"sensor_set_event_support 0x20 0 {place} enable scanning per-state "
+                + " ".join(["000000000000000"] * 4)]
+        with guest.ipmi_sim([], records, tuple(commands)) as (port, _), \
+                tempfile.TemporaryDirectory() as folder:
+            def run(*command: str) -> str:
+                environment = dict(os.environ, IPMISEL_PASSWORD="secret", HOME=folder, TZ="UTC")
+                return subprocess.run(["timeout", "60", *command], capture_output=True, check=True,
+                                      text=True, errors="replace", env=environment).stdout
+            cls.ours = [instance["properties"] for instance in json.loads(
+                run(str(PROGRAM), "collect", "--from", f"lan:127.0.0.1:{port}", "--user", "root",
+                    "--workaround", "opensesspriv", "--format", "json", "--class",
+                    "IPMI_Sensor"))["instances"]]
+            cls.tool = [[cell.strip() for cell in line.split("|")] for line in
+                run("ipmitool", "-I", "lanplus", "-C", "3", "-H", "127.0.0.1", "-p", str(port),
+                    "-U", "root", "-P", "secret", "sensor").splitlines()]
+            cls.free = list(csv.reader(
+                run("ipmi-sensors", "-D", "LAN_2_0", "-I", "3", "-h", f"127.0.0.1:{port}", "-u",
+                    "root", "-p", "secret", "-W", "opensesspriv", "--comma-separated-output",
+                    "--no-header-output", "--output-sensor-thresholds", "--quiet-cache",
+                    "--non-abbreviated-units").splitlines()))
+
+    def test_every_sensor_is_told_of_by_all(self):
+        count = len(ANALOG) + len(NAMES)
+        self.assertEqual([len(self.ours), len(self.tool), len(self.free)], [count] * 3)
+
+    def test_names(self):
+        for analog, ours, tool, free in zip(ANALOG, self.ours, self.tool, self.free):
+            self.assertEqual([ours["Name"], tool[0], free[1]], [analog[0]] * 3)
+        # The other two know 8-bit names alone.
+        for (_, _, name), ours in zip(NAMES, self.ours[len(ANALOG):]):
+            self.assertEqual(ours["Name"], name)
+
+    def test_units_readings_and_thresholds(self):
+        for analog, ours, tool, free in zip(ANALOG, self.ours, self.tool, self.free):
+            with self.subTest(sensor=analog[0], ours=ours, tool=tool, free=free):
+                unit = UNITS[analog[3]]
+                self.assertEqual([ours["Unit"], tool[2].lower(), free[4].lower()],
+                                 [unit, unit.lower(), unit.lower()])
+                values = [ours.get("Reading"), *(ours.get(limit) for limit in LIMITS)]
+                self.assertNotIn(None, values)
+                # ipmitool: lower ones from non-recoverable up, upper ones from non-critical up.
+                theirs = [number(tool[cell]) for cell in (1, 6, 5, 4, 7, 8, 9)]
+                others = [number(free[cell]) for cell in (3, 7, 6, 5, 8, 9, 10)]
+                for mine, one, other in zip(values, theirs, others):
+                    # ipmi-sensors takes cube^-1(x) for 1/x^3; after sqrt(x) in the standard's list
+                    # it is the root, as ipmitool has it.
+                    for peer in (one,) if analog[0] == "cube root" else (one, other):
+                        self.assertIsNotNone(peer)
+                        self.assertAlmostEqual(mine, peer,
+                                               delta=max(PLACES, abs(mine) * 1e-5))
+
+
+if __name__ == "__main__":
+    for needed, package in ("ipmi_sim", "openipmi"), ("ipmitool", "ipmitool"), (
+            "ipmi-sensors", "freeipmi-tools"):
+        if not shutil.which(needed):
+            print(f"SKIPPED: no {needed} (package {package})")
+            sys.exit(77)
+    unittest.main(argv=sys.argv[:1], verbosity=2)
