@@ -175,7 +175,8 @@ void WritePart(const PartEvidence& evidence, Output& output) {
 const ClassEntry kEventClass{
     .info = {.name = "IPMI_Event",
              .description = "the records of the event log in words, with severity, state and part",
-             .marks = NQORTQR20::kPerLogRecord | NQORTQR20::kReadsLog | NQORTQR20::kReadsSensors,
+             .marks = NQORTQR20::kByDefault | NQORTQR20::kPerLogRecord | NQORTQR20::kReadsLog |
+                      NQORTQR20::kReadsSensors,
              .nodeProperty = "Node",
              .exporter = nullptr,
              .properties = kProperties,

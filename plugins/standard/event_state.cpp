@@ -53,13 +53,18 @@ bool SameTarget(const Event& a, const Event& b) {
            MayBeEqual(a.data.fruDevice, b.data.fruDevice);
 }
 
-// Whether the later event of a sensor takes the earlier one back.
-bool TakesBack(const Event& later, const Event& earlier) {
-    const ipmi::SelRecord& now = later.record;
-    const ipmi::SelRecord& then = earlier.record;
-    if (now.offset() == then.offset()) return now.deassertion != then.deassertion;
-    return !now.deassertion && !then.deassertion &&
-           ipmi::Excludes(now.eventType, now.sensorType, now.offset(), then.offset());
+// What a sensor said of one of its offsets.
+struct Statement {
+    std::uint8_t offset = 0;
+    bool deassertion = false;
+    auto operator<=>(const Statement&) const = default;
+};
+
+// Whether the event takes back what its sensor said before.
+bool TakesBack(const ipmi::SelRecord& now, const Statement& before) {
+    if (now.offset() == before.offset) return now.deassertion != before.deassertion;
+    return !now.deassertion && !before.deassertion &&
+           ipmi::Excludes(now.eventType, now.sensorType, now.offset(), before.offset);
 }
 
 std::optional<ipmi::Presence> PresenceToldBy(const Event& event) {
@@ -96,7 +101,8 @@ private:
             event.state = EventState::kOpen;
             open_.push_back(i);
             if (event.isSensorEvent()) {
-                openOf_[KeyOf(event)].push_back(i);
+                const ipmi::SelRecord& record = event.record;
+                openOf_[KeyOf(event)][{record.offset(), record.deassertion}].push_back(i);
                 openAt_[PlaceOf(event)].push_back(i);
             }
         }
@@ -120,13 +126,13 @@ private:
     void Sensor(std::size_t now) {
         const auto found = openOf_.find(KeyOf(events_[now]));
         if (found == openOf_.end()) return;
-        for (const std::size_t i : found->second) {
-            if (IsOpen(i) && SameTarget(events_[now], events_[i]) &&
-                TakesBack(events_[now], events_[i])) {
-                Resolve(i, now);
+        for (auto& [statement, open] : found->second) {
+            if (!TakesBack(events_[now].record, statement)) continue;
+            for (const std::size_t i : open) {
+                if (IsOpen(i) && SameTarget(events_[now], events_[i])) Resolve(i, now);
             }
+            std::erase_if(open, [this](std::size_t i) { return !IsOpen(i); });
         }
-        std::erase_if(found->second, [this](std::size_t i) { return !IsOpen(i); });
     }
 
     // What was open before a part went is over when one has come in its place.
@@ -151,7 +157,7 @@ private:
 
     std::span<Event> events_;
     std::vector<std::size_t> open_;
-    std::map<SensorAndTypes, std::vector<std::size_t>> openOf_;
+    std::map<SensorAndTypes, std::map<Statement, std::vector<std::size_t>>> openOf_;
     std::map<Place, std::vector<std::size_t>> openAt_;
     std::map<Place, std::size_t> goneAt_;
 };

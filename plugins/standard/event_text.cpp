@@ -172,8 +172,8 @@ std::string SensorText(const Event& event) {
 }
 
 std::string SubjectText(const Event& event) {
-    const std::string part = PartText(event.part);
-    const std::string sensor = SensorText(event);
+    std::string part = PartText(event.part);
+    std::string sensor = SensorText(event);
     if (part.empty() || part == sensor) return sensor;
     return sensor.empty() ? part : part + ", " + sensor;
 }

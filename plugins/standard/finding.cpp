@@ -19,7 +19,7 @@ namespace standard {
 namespace {
 
 constexpr std::int64_t kBurstGap = 300;
-constexpr std::int64_t kRecent = 7 * 24 * 3600;
+constexpr std::int64_t kRecent = std::int64_t{7} * 24 * 3600;
 constexpr std::size_t kRecentRecords = 64;
 
 bool IsOf(const Event& event, std::uint8_t sensorType, std::uint16_t offsets) {

@@ -63,7 +63,7 @@ void WriteFindings(NodePass& pass, Output& output) {
 const ClassEntry kFindingClass{
     .info = {.name = "IPMI_Finding",
              .description = "what is wrong now, worst first, with its evidence",
-             .marks = NQORTQR20::kReadsLog | NQORTQR20::kReadsSensors,
+             .marks = NQORTQR20::kByDefault | NQORTQR20::kReadsLog | NQORTQR20::kReadsSensors,
              .nodeProperty = "Node",
              .exporter = nullptr,
              .properties = kProperties,
