@@ -10,14 +10,17 @@
 #include "program/commands/classes.h"
 #include "program/commands/collect.h"
 #include "program/commands/command.h"
+#include "program/commands/diff.h"
 #include "program/commands/failure.h"
+#include "program/commands/report.h"
 #include "program/reports/terminal_text.h"
 
 namespace ipmisel {
 namespace {
 
 /// In the order of the help.
-constexpr Command (*kCommands[])(CLI::App* program) = {AddCollectCommand, AddClassesCommand};
+constexpr Command (*kCommands[])(CLI::App* program) = {AddCollectCommand, AddReportCommand,
+                                                       AddDiffCommand, AddClassesCommand};
 
 int Run(int argc, char** argv) {
     CLI::App app("Reads what a server's management controller (BMC) knows.", "ipmisel");

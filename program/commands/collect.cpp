@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <chrono>
 #include <cstdint>
+#include <filesystem>
 #include <memory>
 #include <optional>
 #include <string>
@@ -25,7 +26,6 @@
 #include "program/commands/log_lines.h"
 #include "program/commands/plugins.h"
 #include "program/commands/stop_signals.h"
-#include "program/reports/output_file.h"
 #include "program/reports/report.h"
 #include "program/reports/report_sink.h"
 #include "program/reports/terminal_text.h"
@@ -36,18 +36,6 @@ namespace ipmisel {
 namespace {
 
 constexpr std::int64_t kMicrosecondsPerSecond = 1000000;
-
-/// What the user asked for.
-struct CollectOptions {
-    AccessOptions access;
-    std::vector<std::string> classes;  ///< empty: the default ones
-    std::string format = "table";
-    std::optional<std::string> output;  ///< empty: standard output
-    std::optional<std::string> record;
-    LogOptions log;
-    std::vector<std::string> plugins;  ///< further plug-in files
-    std::optional<double> deadlineSeconds;
-};
 
 std::string Joined(const std::vector<std::string>& parts) {
     std::string text;
@@ -101,6 +89,9 @@ std::vector<SystemInfo> SystemsOf(const std::vector<std::string>& sources, std::
         system.source = sources[oneEach ? node : 0];
         const auto colon = system.source.find(':');
         system.name = colon == std::string::npos ? system.source : system.source.substr(colon + 1);
+        if (!system.source.starts_with("lan:")) {  // of a file its name alone
+            system.name = std::filesystem::path(system.name).stem().string();
+        }
     }
     return systems;
 }
@@ -120,19 +111,18 @@ std::vector<std::string> TellNotices() {
     return texts;
 }
 
-int CollectTo(const CollectOptions& options, OutputFile& output) {
+int CollectTo(const CollectOptions& options, ReportOutput& output) {
+    const auto begin = std::chrono::steady_clock::now();
     // The plug-ins first: without them nobody is asked for a password.
     const std::unique_ptr<tqrhost::PluginSet> plugins = LoadPlugins(options.plugins);
-    const std::vector<std::string> wanted = ClassesToCollect(options.classes, *plugins);
+    const std::vector<std::string> wanted = ClassesToCollect(
+        options.report.classes, FindFormat(options.report.format)->classes, *plugins);
     tqrhost::Source source = OpenSource(options.access);
     StopSignals::BeginCollecting();
     tqrhost::ReadLiveNodes(source, NeedsOf(wanted, *plugins));
     const std::shared_ptr<tqrhost::CaptureWriter> capture = Record(options, source);
     const Machine machine(std::move(source));
 
-    const auto formats = KnownFormats();
-    const auto format = std::find_if(formats.begin(), formats.end(),
-                                     [&](const FormatInfo& f) { return f.name == options.format; });
     const auto nodes = static_cast<std::size_t>(NQORTQR20::SPLibrary::GetNumberBMCNode());
     const ReportHead head{.source = Joined(options.access.Sources()),
                           .plugin = plugins->Plugins().front()->Info(),
@@ -143,11 +133,11 @@ int CollectTo(const CollectOptions& options, OutputFile& output) {
                                         kMicrosecondsPerSecond},
                           .classes = plugins->Classes(),
                           .wanted = wanted,
-                          .named = !options.classes.empty()};
+                          .named = !options.report.classes.empty()};
     tqrhost::PluginSettings settings;
     for (const SystemInfo& system : head.systems) settings.systemNames.push_back(system.name);
     tqrhost::SetPluginSettings(std::move(settings));
-    const std::unique_ptr<ReportWriter> report = format->make(output, head);
+    const std::unique_ptr<ReportWriter> report = output.Make(head);
     ReportSink sink(*report, *plugins, wanted, nodes);
     tqrhost::CollectionPlan plan(*plugins, wanted);
     ReportEnd end;
@@ -164,6 +154,7 @@ int CollectTo(const CollectOptions& options, OutputFile& output) {
     end.plugins = plan.Statuses();
     end.status = plan.Status();
     end.systems = head.systems;
+    end.seconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - begin).count();
     report->Finish(end);
     output.Commit();
     if (capture && !capture->Finish()) {
@@ -173,21 +164,6 @@ int CollectTo(const CollectOptions& options, OutputFile& output) {
     const Outcome outcome = OutcomeOf(end);
     if (outcome.exitStatus != kExitCollected) Say(outcome.problem + "; " + outcome.advice);
     return outcome.exitStatus;
-}
-
-int Collect(const CollectOptions& options) {
-    const StopSignals signals;
-    if (options.deadlineSeconds) {
-        using Clock = std::chrono::steady_clock;
-        tqrhost::StopAt(Clock::now() +
-                        std::chrono::duration_cast<Clock::duration>(
-                            std::chrono::duration<double>(*options.deadlineSeconds)));
-    }
-    LogLines log(options.log);
-    OutputFile output(options.output);
-    const int status = CollectTo(options, output);
-    log.Finish();
-    return status;
 }
 
 constexpr const char* kExitStatusHelp =
@@ -200,19 +176,25 @@ constexpr const char* kExitStatusHelp =
 
 }  // namespace
 
+int Collect(const CollectOptions& options) {
+    const StopSignals signals;
+    if (options.deadlineSeconds) {
+        using Clock = std::chrono::steady_clock;
+        tqrhost::StopAt(Clock::now() +
+                        std::chrono::duration_cast<Clock::duration>(
+                            std::chrono::duration<double>(*options.deadlineSeconds)));
+    }
+    LogLines log(options.log);
+    ReportOutput output(options.report);
+    const int status = CollectTo(options, output);
+    log.Finish();
+    return status;
+}
+
 Command AddCollectCommand(CLI::App* program) {
     CLI::App* const command = program->add_subcommand("collect", "Collect and write a report");
     const auto options = std::make_shared<CollectOptions>();
-    command->add_option("--class", options->classes, "Class to collect; see \"ipmisel classes\"")
-        ->type_name("CLASS")
-        ->allow_extra_args(false);
-    command->add_option("--format", options->format, "Form of the report")
-        ->type_name("FORMAT")
-        ->capture_default_str()
-        ->check(OneOf(Names(KnownFormats())));
-    command->add_option("--output", options->output, "Write the report here, whole or not at all")
-        ->type_name("FILE")
-        ->check(FileName());
+    AddReportOptions(command, &options->report);
     command->add_option("--record", options->record, "Write a capture of every exchange here")
         ->type_name("FILE")
         ->check(FileName());
@@ -224,7 +206,7 @@ Command AddCollectCommand(CLI::App* program) {
                      "Seconds that the whole collection may take")
         ->type_name("SECONDS")
         ->check(Seconds(365 * kSecondsPerDay));
-    command->footer(WorkaroundHelp() + kExitStatusHelp);
+    command->footer(FormatHelp() + WorkaroundHelp() + kExitStatusHelp);
     return {command, [options] { return Collect(*options); }};
 }
 

@@ -1,10 +1,30 @@
 #pragma once
 
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "program/commands/access.h"
 #include "program/commands/command.h"
+#include "program/commands/log_lines.h"
+#include "program/commands/report_output.h"
 
 namespace ipmisel {
 
-/// `ipmisel collect`: collects and writes a report.
+/// What is to be collected, and where it goes.
+struct CollectOptions {
+    AccessOptions access;
+    ReportOptions report;
+    std::optional<std::string> record;
+    LogOptions log;
+    std::vector<std::string> plugins;  ///< further plug-in files
+    std::optional<double> deadlineSeconds;
+};
+
+/// Collects and writes a report; the exit status. Throws Failure.
+int Collect(const CollectOptions& options);
+
+/// `ipmisel collect`.
 Command AddCollectCommand(CLI::App* program);
 
 }  // namespace ipmisel

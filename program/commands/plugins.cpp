@@ -42,6 +42,7 @@ std::unique_ptr<tqrhost::PluginSet> LoadPlugins(const std::vector<std::string>& 
 }
 
 std::vector<std::string> ClassesToCollect(const std::vector<std::string>& named,
+                                          std::span<const std::string_view> ofFormat,
                                           const tqrhost::PluginSet& plugins) {
     for (const std::string& name : named) {
         if (plugins.FindClass(name) != nullptr) continue;
@@ -51,7 +52,11 @@ std::vector<std::string> ClassesToCollect(const std::vector<std::string>& named,
         }
         throw Failure(kExitUsage, "there is no class \"" + name + "\"; use one of " + known);
     }
-    std::vector<std::string> wanted = named.empty() ? plugins.DefaultClasses() : named;
+    std::vector<std::string> wanted = named;
+    for (const std::string_view name : ofFormat) {
+        if (named.empty() && plugins.FindClass(name) != nullptr) wanted.emplace_back(name);
+    }
+    if (wanted.empty()) wanted = plugins.DefaultClasses();
     WithPlugins([&] { plugins.CheckNeededFiles(wanted); });
     return wanted;
 }

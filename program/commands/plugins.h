@@ -2,7 +2,9 @@
 
 #include <CLI/CLI.hpp>
 #include <memory>
+#include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "host/core/plugin_set.h"
@@ -15,9 +17,10 @@ void AddPluginOption(CLI::App* command, std::vector<std::string>* files);
 /// The plug-ins of the program's own folder, and these files. Throws Failure.
 std::unique_ptr<tqrhost::PluginSet> LoadPlugins(const std::vector<std::string>& files);
 
-/// The classes to collect: those that are named, else the default ones; the files that their
-/// plug-ins need are there. Throws Failure.
+/// The classes to collect: those that are named, else those of the format that there are, else the
+/// default ones; the files that their plug-ins need are there. Throws Failure.
 std::vector<std::string> ClassesToCollect(const std::vector<std::string>& named,
+                                          std::span<const std::string_view> ofFormat,
                                           const tqrhost::PluginSet& plugins);
 
 }  // namespace ipmisel

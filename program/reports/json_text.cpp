@@ -1,15 +1,24 @@
 #include "program/reports/json_text.h"
 
 #include <algorithm>
-#include <nlohmann/json.hpp>
-#include <type_traits>
+#include <cstdint>
 #include <variant>
+#include <vector>
 
 #include "base/text.h"
 #include "program/reports/terminal_text.h"
 
 namespace ipmisel {
 namespace {
+
+constexpr auto kReplace = Json::error_handler_t::replace;
+
+/// Nothing to escape and nothing but ASCII, as nearly every text.
+bool IsPlain(std::string_view text) {
+    return std::all_of(text.begin(), text.end(), [](char c) {
+        return c >= ' ' && c <= '~' && c != '"' && c != '\\';  // a byte beyond ASCII is negative
+    });
+}
 
 std::string Escaped(char32_t c) {
     if (c < 0x10000) return Format("\\u%04x", static_cast<unsigned>(c));
@@ -18,59 +27,44 @@ std::string Escaped(char32_t c) {
     return Format("\\u%04x\\u%04x", 0xD800 + (rest >> 10), 0xDC00 + (rest & 0x3FF));
 }
 
-/// The length of what stands as it is and is nothing but ASCII, as nearly every text.
-std::size_t PlainLength(std::string_view text) {
-    const auto* const end = std::find_if(text.begin(), text.end(), [](char c) {
-        return c < ' ' || c > '~' || c == '"' ||
-               c == '\\';  // a byte beyond ASCII is below or above
-    });
-    return static_cast<std::size_t>(end - text.begin());
-}
-
-void AppendText(std::string& out, std::string_view text) {
-    out += '"';
-    while (true) {
-        const std::size_t plain = PlainLength(text);
-        out += text.substr(0, plain);
-        text.remove_prefix(plain);
-        if (text.empty()) break;
-        const Character character = FirstCharacter(text);
-        if (!character.valid) {
-            out += "\uFFFD";
-        } else if (character.value == U'"' || character.value == U'\\') {
-            out += '\\';
-            out += text.front();
-        } else if (character.value == U'\n') {
-            out += "\\n";
-        } else if (IsControl(character.value)) {
+std::string Quoted(std::string_view text) {
+    if (IsPlain(text)) return '"' + std::string(text) + '"';
+    // The library leaves DEL, C1 and the marks of direction as they are, and has short forms for
+    // some controls, of which only that of a line feed has ever stood in a report.
+    const std::string json = Json(text).dump(-1, ' ', false, kReplace);
+    std::string out;
+    for (std::string_view rest = json; !rest.empty();) {
+        const Character character = FirstCharacter(rest);
+        constexpr std::string_view kShort = "bfrt";
+        const std::size_t form =
+            character.value == U'\\' ? kShort.find(rest[1]) : std::string_view::npos;
+        if (form != std::string_view::npos) {
+            out += Escaped(U"\b\f\r\t"[form]);
+            rest.remove_prefix(2);
+            continue;
+        }
+        if (character.value == U'\\') {  // another escape, whose second character is none
+            out += rest.substr(0, 2);
+            rest.remove_prefix(2);
+            continue;
+        }
+        if (IsControl(character.value)) {
             out += Escaped(character.value);
         } else {
-            out += text.substr(0, character.length);
+            out += rest.substr(0, character.length);
         }
-        text.remove_prefix(character.length);
+        rest.remove_prefix(character.length);
     }
-    out += '"';
+    return out;
 }
 
-void AppendPair(std::string& out, std::string_view name, std::string_view text, bool first) {
-    if (!first) out += ", ";
-    AppendText(out, name);
-    out += ": ";
-    AppendText(out, text);
-}
-
-void AppendValue(std::string& out, const std::string& text) { AppendText(out, text); }
-
-void AppendValue(std::string& out, std::uint8_t byte) { out += std::to_string(byte); }
-
+void AppendValue(std::string& out, const std::string& text) { out += Quoted(text); }
 void AppendValue(std::string& out, std::int64_t number) { out += std::to_string(number); }
-
+void AppendValue(std::string& out, std::uint8_t byte) { out += std::to_string(byte); }
 /// The shortest text that reads back as the same number; 20 stands as 20.0.
-void AppendValue(std::string& out, double number) { out += nlohmann::json(number).dump(); }
-
+void AppendValue(std::string& out, double number) { out += Json(number).dump(); }
 void AppendValue(std::string& out, bool truth) { out += truth ? "true" : "false"; }
-
-void AppendValue(std::string& out, tqrhost::Time time) { AppendText(out, TimeText(time)); }
+void AppendValue(std::string& out, tqrhost::Time time) { out += Quoted(TimeText(time)); }
 
 template <typename Element>
 void AppendValue(std::string& out, const std::vector<Element>& list) {
@@ -83,37 +77,34 @@ void AppendValue(std::string& out, const std::vector<Element>& list) {
 }
 
 void AppendValue(std::string& out, const tqrhost::ObjectPath& path) {
-    out += '{';
-    AppendPair(out, "class", path.className, true);
-    out += ", \"keys\": {";
+    out += "{\"class\": " + Quoted(path.className) + ", \"keys\": {";
     for (std::size_t i = 0; i < path.keys.size(); ++i) {
-        AppendPair(out, path.keys[i].first, path.keys[i].second, i == 0);
+        if (i > 0) out += ", ";
+        out += Quoted(path.keys[i].first) + ": " + Quoted(path.keys[i].second);
     }
     out += "}}";
 }
 
 }  // namespace
 
-std::string JsonText(std::string_view text) {
+std::string JsonText(std::string_view text) { return Quoted(text); }
+
+std::string JsonLine(const Json& value) { return value.dump(-1, ' ', true, kReplace); }
+
+// Written property by property: an object of the library would keep one of two of the same name.
+std::string JsonProperties(const tqrhost::Instance& instance) {
     std::string out;
-    AppendText(out, text);
+    for (const auto& [name, value] : instance.properties) {
+        if (!out.empty()) out += ", ";
+        out += Quoted(name) + ": ";
+        std::visit([&](const auto& each) { AppendValue(out, each); }, value);
+    }
     return out;
 }
 
 std::string JsonInstance(const tqrhost::Instance& instance) {
-    std::string out = "{";
-    AppendPair(out, "class", instance.className, true);
-    out += ", \"properties\": {";
-    bool first = true;
-    for (const auto& [name, value] : instance.properties) {
-        if (!first) out += ", ";
-        first = false;
-        AppendText(out, name);
-        out += ": ";
-        std::visit([&](const auto& each) { AppendValue(out, each); }, value);
-    }
-    out += "}}";
-    return out;
+    return "{\"class\": " + Quoted(instance.className) + ", \"properties\": {" +
+           JsonProperties(instance) + "}}";
 }
 
 }  // namespace ipmisel

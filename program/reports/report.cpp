@@ -1,14 +1,35 @@
 #include "program/reports/report.h"
 
+#include <algorithm>
+#include <charconv>
+#include <iterator>
+#include <variant>
+
 #include "program/commands/failure.h"
+#include "program/reports/view.h"
 
 namespace ipmisel {
 namespace {
 
+// What a format is made of, where not of all classes.
+constexpr std::string_view kReading[] = {kControllerClass, kEventLogClass, kSensorClass,
+                                         kFruClass,        kEventClass,    kFindingClass};
+constexpr std::string_view kEvents[] = {kControllerClass, kEventClass};
+constexpr std::string_view kEventRows[] = {kEventClass};
+constexpr std::string_view kState[] = {kControllerClass, kEventLogClass, kEventClass,
+                                       kFindingClass};
+
 constexpr FormatInfo kFormats[] = {
-    {"table", MakeTableReport},
-    {"json", MakeJsonReport},
-    {"ndjson", MakeNdjsonReport},
+    {"table", "for reading, on a terminal", MakeTableReport, kReading, true},
+    {"json", "one object", MakeJsonReport, {}},
+    {"ndjson", "an object per line, a line per instance", MakeNdjsonReport, {}},
+    {"events", "an object per line, a line per event, flat", MakeEventsReport, kEvents},
+    {"csv", "comma-separated values, a row per event", MakeCsvReport, kEventRows},
+    {"html", "one page for a browser", MakeHtmlReport, kReading, true},
+    {"redfish", "a Redfish LogEntryCollection", MakeRedfishReport, kEvents},
+    {"prometheus", "metrics for a node exporter's textfile collector", MakePrometheusReport,
+     kState},
+    {"otlp", "OpenTelemetry logs (OTLP/JSON)", MakeOtlpReport, kEvents},
 };
 
 void AppendPart(const char* separator, const std::string& part, std::string* text) {
@@ -64,7 +85,34 @@ std::string StopText(tqrhost::StopReason reason) {
 
 std::span<const FormatInfo> KnownFormats() { return kFormats; }
 
+const FormatInfo* FindFormat(std::string_view name) {
+    const auto* const found = std::find_if(std::begin(kFormats), std::end(kFormats),
+                                           [name](const FormatInfo& f) { return f.name == name; });
+    return found == std::end(kFormats) ? nullptr : found;
+}
+
+std::optional<std::int64_t> NodeOf(const tqrhost::Instance& instance, std::string_view property) {
+    for (const auto& [name, value] : instance.properties) {
+        if (name != property) continue;
+        std::int64_t node = 0;
+        if (const auto* const number = std::get_if<std::int64_t>(&value)) node = *number;
+        if (const auto* const text = std::get_if<std::string>(&value)) {
+            std::from_chars(text->data(), text->data() + text->size(), node);
+        }
+        if (node >= 1) return node;
+    }
+    return std::nullopt;
+}
+
+std::optional<std::int64_t> NodeOf(const tqrhost::Instance& instance, const ReportHead& head) {
+    const auto info = std::find_if(
+        head.classes.begin(), head.classes.end(),
+        [&](const tqrhost::ClassInfo& each) { return each.name == instance.className; });
+    return NodeOf(instance, info == head.classes.end() ? "Node" : info->nodeProperty);
+}
+
 Outcome OutcomeOf(const ReportEnd& end) {
+    if (end.recorded) return *end.recorded;
     if (!end.hasBmc && end.status.code == NQORTQR20::kStatusOk) {
         return {kExitNoSource, "no BMC: the machine has no management controller",
                 "name a machine that has one with --from"};

@@ -1,6 +1,8 @@
 #pragma once
 
+#include <cstdint>
 #include <memory>
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -15,6 +17,10 @@
 #include "tqr/status.h"
 
 namespace ipmisel {
+
+/// Version of what the formats for programs write: within one, keys and values keep their names and
+/// their meaning, and new ones may come.
+inline constexpr std::string_view kFormatVersion = "ipmisel/1";
 
 /// A node as the user knows it, and what it said of itself; what is not known is empty.
 struct SystemInfo {
@@ -36,6 +42,13 @@ struct ReportHead {
     bool named = false;                 ///< the user named them
 };
 
+/// How a collection went: the exit status, and unless it is 0 what was wrong and what to do.
+struct Outcome {
+    int exitStatus;
+    std::string problem;  ///< a few words, for the end of a report
+    std::string advice;
+};
+
 struct ReportEnd {
     NQORTQR20::TTQRStatusCode status{};  ///< the first of the plug-ins' that is not 0
     bool hasBmc = true;
@@ -47,6 +60,19 @@ struct ReportEnd {
     std::vector<unsigned> exported;
     std::vector<tqrhost::PluginStatus> plugins{};
     std::vector<SystemInfo> systems{};  ///< by node, with what the controllers said of themselves
+    std::optional<double> seconds{};    ///< that the collection took
+    std::optional<Outcome> recorded{};  ///< of a report that is read again
+};
+
+/// The number of the node that an instance belongs to, from 1, as the property of that name says,
+/// or that of its class; empty when it belongs to none.
+std::optional<std::int64_t> NodeOf(const tqrhost::Instance& instance, std::string_view property);
+std::optional<std::int64_t> NodeOf(const tqrhost::Instance& instance, const ReportHead& head);
+
+/// How a report for people looks.
+struct ReportLook {
+    std::size_t width = 100;  ///< columns
+    bool colour = false;
 };
 
 /// One report on its way out: the instances as they come, the rest at the end. Memory does not grow
@@ -60,22 +86,24 @@ public:
 
 struct FormatInfo {
     std::string_view name;
-    std::unique_ptr<ReportWriter> (*make)(OutputFile& out, const ReportHead& head);
+    std::string_view description;
+    std::unique_ptr<ReportWriter> (*make)(OutputFile& out, const ReportHead& head,
+                                          const ReportLook& look);
+    /// The classes that are collected for it when none is named; none: the default ones.
+    std::span<const std::string_view> classes;
+    bool forPeople = false;  ///< shows events, of which fewer may be wanted
 };
 
 /// The formats, one line each.
 std::span<const FormatInfo> KnownFormats();
+/// Null for a name that none has.
+const FormatInfo* FindFormat(std::string_view name);
 
-std::unique_ptr<ReportWriter> MakeTableReport(OutputFile& out, const ReportHead& head);
-std::unique_ptr<ReportWriter> MakeJsonReport(OutputFile& out, const ReportHead& head);
-std::unique_ptr<ReportWriter> MakeNdjsonReport(OutputFile& out, const ReportHead& head);
+using MakeReport = std::unique_ptr<ReportWriter>(OutputFile& out, const ReportHead& head,
+                                                 const ReportLook& look);
+MakeReport MakeTableReport, MakeJsonReport, MakeNdjsonReport, MakeEventsReport, MakeCsvReport,
+    MakeHtmlReport, MakeRedfishReport, MakePrometheusReport, MakeOtlpReport;
 
-/// How a collection went: the exit status, and unless it is 0 what was wrong and what to do.
-struct Outcome {
-    int exitStatus;
-    std::string problem;  ///< a few words, for the end of a report
-    std::string advice;
-};
 Outcome OutcomeOf(const ReportEnd& end);
 
 }  // namespace ipmisel

@@ -1,30 +1,14 @@
 #include "program/reports/report_sink.h"
 
 #include <algorithm>
-#include <charconv>
 #include <chrono>
 #include <cstdint>
 #include <limits>
-#include <variant>
 
 #include "host/spdriver/stop.h"
 #include "tqr/classes.h"
 
 namespace ipmisel {
-
-std::optional<std::size_t> NodeOf(const tqrhost::Instance& instance, std::string_view property) {
-    for (const auto& [name, value] : instance.properties) {
-        if (property.empty() || name != property) continue;
-        std::int64_t node = 0;
-        if (const auto* const text = std::get_if<std::string>(&value)) {
-            std::from_chars(text->data(), text->data() + text->size(), node);
-        } else if (const auto* const number = std::get_if<std::int64_t>(&value)) {
-            node = *number;
-        }
-        if (node >= 1) return static_cast<std::size_t>(node - 1);
-    }
-    return std::nullopt;
-}
 
 ReportSink::ReportSink(ReportWriter& report, const tqrhost::PluginSet& plugins,
                        const std::vector<std::string>& wanted, std::size_t nodes)
@@ -69,7 +53,8 @@ bool ReportSink::Take(const tqrhost::Instance& instance) {
     }
     if (const auto counted = counted_.find(instance.className); counted != counted_.end()) {
         const auto node = NodeOf(instance, counted->second.nodeProperty);
-        if (node && *node < nodes_) ++counted->second.byNode[*node];
+        const auto index = static_cast<std::size_t>(node.value_or(0) - 1);
+        if (index < nodes_) ++counted->second.byNode[index];
     }
     return true;
 }

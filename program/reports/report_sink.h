@@ -47,8 +47,4 @@ private:
     std::optional<Failure> failure_;
 };
 
-/// The node of an instance, from 0, by the property that holds its number from 1; empty when it
-/// belongs to none.
-std::optional<std::size_t> NodeOf(const tqrhost::Instance& instance, std::string_view property);
-
 }  // namespace ipmisel

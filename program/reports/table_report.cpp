@@ -1,223 +1,361 @@
 #include <algorithm>
-#include <array>
 #include <map>
+#include <memory>
 
 #include "base/text.h"
 #include "program/reports/report.h"
+#include "program/reports/systems.h"
 #include "program/reports/terminal_text.h"
+#include "program/reports/text_table.h"
+#include "program/reports/wording.h"
 
 namespace ipmisel {
 namespace {
 
-constexpr std::string_view kLogRecord = "QORSG_IPMILogRecord";
-constexpr std::string_view kNoAuxiliary = "No Extended Data";
-constexpr std::size_t kWidth = 100;
-constexpr std::size_t kNameWidth = 24;
-
-struct Column {
-    std::string_view title;
-    std::size_t width;
-};
-// 100 columns with one blank between two.
-constexpr std::array<Column, 6> kColumns{{{"Record", 6},
-                                          {"Time", 19},
-                                          {"Source", 12},
-                                          {"Sensor type", 14},
-                                          {"Direction", 11},
-                                          {"Message", 33}}};
-static_assert(6 + 19 + 12 + 14 + 11 + 33 + 5 == kWidth);
-
-using Row = std::array<std::string, kColumns.size()>;
-
-std::string TextOf(const tqrhost::Instance& instance, std::string_view name) {
-    for (const auto& [property, value] : instance.properties) {
-        const auto* text = std::get_if<std::string>(&value);
-        if (property == name && text != nullptr) return *text;
-    }
-    return {};
-}
-
-/// "20240305120000.000000+060" as "2024-03-05 12:00:00"; "-" for no time.
-std::string TimeText(const std::string& cim) {
-    if (cim.size() < 14 || cim == "19700101000000.000000+000") return "-";
-    return cim.substr(0, 4) + "-" + cim.substr(4, 2) + "-" + cim.substr(6, 2) + " " +
-           cim.substr(8, 2) + ":" + cim.substr(10, 2) + ":" + cim.substr(12, 2);
-}
-
-/// Assertion or deassertion, as the event type says first.
-std::string DirectionOf(const std::string& eventType) {
-    const auto comma = eventType.find(',');
-    return comma == std::string::npos ? eventType : eventType.substr(0, comma);
-}
-
-void Replace(std::string_view part, std::string_view by, std::string* text) {
-    const auto at = text->find(part);
-    if (at != std::string::npos) text->replace(at, part.size(), by);
-}
-
-/// The source without a LUN and a channel of 0, which nearly all have.
-std::string SourceOf(std::string source) {
-    Replace(" LUN 0.", "", &source);
-    Replace(" Channel 0.", "", &source);
-    source.erase(source.find_last_not_of(". ") + 1);
-    return source.empty() ? "-" : source;
-}
-
-/// The message without what the columns beside it say: "Processor 1 (Temperature - CPU Temp):
-/// Assertion: ..." as "Processor 1 (CPU Temp): ...".
-std::string MessageOf(std::string message, const std::string& sensorType,
-                      const std::string& direction) {
-    if (!direction.empty()) Replace("): " + direction + ": ", "): ", &message);
-    if (!sensorType.empty()) Replace("(" + sensorType + " - ", "(", &message);
-    if (message.starts_with(" (): ")) message.erase(0, 5);
-    return message;
-}
+constexpr std::size_t kNameWidth = 12;      // of what the report itself names
+constexpr std::size_t kPropertyWidth = 24;  // of a property that a plug-in names
+constexpr std::size_t kNoColumn = 99;
+/// From here on an event has its reading, its sensor and its number in columns of their own.
+constexpr std::size_t kWide = 120;
+/// Below it the day stands on a line of its own, before its events.
+constexpr std::size_t kNarrow = 100;
 
 std::string ShownValue(const std::string& text) { return text; }
-
 std::string ShownValue(const std::vector<std::uint8_t>& bytes) {
     std::string text;
     for (const std::uint8_t byte : bytes) text += Format(text.empty() ? "%02x" : " %02x", byte);
     return text;
 }
-
 std::string ShownValue(const tqrhost::ObjectPath& path) {
     std::string text = path.className;
-    for (const auto& [key, name] : path.keys) {
-        text += Format(" %s=%s", key.c_str(), name.c_str());
-    }
+    for (const auto& [key, name] : path.keys) text += " " + key + "=" + name;
     return text;
 }
-
 std::string ShownValue(std::int64_t number) { return std::to_string(number); }
-std::string ShownValue(double number) { return Format("%g", number); }
+std::string ShownValue(double number) { return NumberText(number); }
 std::string ShownValue(bool truth) { return truth ? "yes" : "no"; }
-std::string ShownValue(tqrhost::Time time) { return tqrhost::TimeText(time); }
+std::string ShownValue(tqrhost::Time time) { return DateAndTime(time); }
+std::string ShownValue(const Texts& texts) { return Listed(texts, "; "); }
 
-std::string ShownValue(const std::vector<std::string>& texts) {
-    std::string text;
-    for (const std::string& each : texts) text += (text.empty() ? "" : "; ") + each;
-    return text;
-}
-
-std::string ValueText(const tqrhost::PropertyValue& value) {
-    return std::visit([](const auto& each) { return ShownValue(each); }, value);
-}
-
+/// Findings stand before the events and are known after them: the rows of events wait.
 class TableReport : public ReportWriter {
 public:
-    TableReport(OutputFile& out, const ReportHead& head) : out_(out), nodes_(head.nodes) {
-        PrintLine((head.machineType.empty() ? "Machine of unknown type"
-                                            : "Machine " + TerminalText(head.machineType)) +
-                  ", " + std::to_string(nodes_) + (nodes_ == 1 ? " BMC" : " BMCs") + ", from " +
-                  TerminalText(head.source));
-    }
+    TableReport(OutputFile& out, const ReportHead& head, const ReportLook& look)
+        : out_(out), head_(head), look_(look), systems_(head), events_(systems_.All().size()) {}
+
     void Add(const tqrhost::Instance& instance) override {
         ++counts_[instance.className];
-        const bool isLog = instance.className == kLogRecord;
-        const std::string node = isLog ? TextOf(instance, "SourceNode") : "";
-        if (instance.className != lastClass_ || node != lastNode_) {
-            Heading(instance.className, node);
-        } else if (!isLog) {
-            PrintLine("");
-        }
-        lastClass_ = instance.className;
-        lastNode_ = node;
-        if (isLog) {
-            PrintRow(LogRow(instance));
-        } else {
-            PrintProperties(instance);
+        if (instance.className == kEventClass) {
+            AddEvent(EventOf(instance));
+        } else if (machine_.Add(instance)) {
+            if (instance.className == kControllerClass) systems_.Add(machine_.controllers.back());
+        } else if (Shows(instance.className)) {
+            AddOther(instance);
         }
     }
+
     void Finish(const ReportEnd& end) override {
-        std::string last;
-        for (const auto& [name, count] : counts_) {
-            last += (last.empty() ? "" : ", ") + std::to_string(count) + " " + name;
-        }
-        if (last.empty()) last = "nothing";
-        const Outcome outcome = OutcomeOf(end);
-        PrintLine("");
-        last += (outcome.problem.empty() ? ". Complete" : "; " + outcome.problem) + ".";
-        for (const std::string& line : Wrap(TerminalText("Collected: " + last), kWidth)) {
-            PrintLine(line);
-        }
+        PrintHead();
+        if (Shows(kFindingClass)) PrintFindings(end);
+        for (std::size_t i = 0; i < systems_.All().size(); ++i) PrintSystem(i);
+        if (otherClass_ != "") other_.CopyTo(out_);
+        PrintEnd(end);
     }
 
 private:
-    void PrintLine(const std::string& text) {
-        const auto end = text.find_last_not_of(' ');
-        out_.Write(text.substr(0, end == std::string::npos ? 0 : end + 1) + "\n");
+    bool IsNamed(std::string_view className) const {
+        return head_.named &&
+               std::find(head_.wanted.begin(), head_.wanted.end(), className) != head_.wanted.end();
+    }
+    /// Whether a class was asked for, so that none of it is worth a word.
+    bool Shows(std::string_view className) const {
+        return std::find(head_.wanted.begin(), head_.wanted.end(), className) != head_.wanted.end();
+    }
+    std::size_t IndexOf(Integer node) const {
+        const auto index = static_cast<std::size_t>(node.value_or(1) - 1);
+        return std::min(index, systems_.All().size() - 1);
     }
 
-    void Heading(const std::string& className, const std::string& node) {
-        PrintLine("");
-        PrintLine(TerminalText(className) +
-                  (nodes_ > 1 && !node.empty() ? ", node " + TerminalText(node) : ""));
-        if (className != kLogRecord) return;
-        Row titles;
-        for (std::size_t i = 0; i < titles.size(); ++i) titles[i] = kColumns[i].title;
-        PrintRow(titles);
-        PrintLine(std::string(kWidth, '-'));
-    }
-
-    static Row LogRow(const tqrhost::Instance& instance) {
-        const std::string direction = DirectionOf(TextOf(instance, "EventType"));
-        const std::string sensorType = TextOf(instance, "SensorType");
-        std::string message = MessageOf(TextOf(instance, "Message"), sensorType, direction);
-        const std::string auxiliary = TextOf(instance, "AuxLog");
-        if (auxiliary != kNoAuxiliary) message += " " + auxiliary;
-        return {
-            TextOf(instance, "RecordID"),         TimeText(TextOf(instance, "MessageTimestamp")),
-            SourceOf(TextOf(instance, "Source")), sensorType,
-            direction.empty() ? "-" : direction,  message};
-    }
-
-    void PrintRow(const Row& row) {
-        std::array<std::vector<std::string>, kColumns.size()> cells;
-        std::size_t lines = 1;
-        for (std::size_t i = 0; i < row.size(); ++i) {
-            cells[i] = Wrap(TerminalText(row[i]), kColumns[i].width);
-            lines = std::max(lines, cells[i].size());
+    void AddEvent(const Event& event) {
+        auto& table = events_[IndexOf(event.node)];
+        if (!table)
+            table = std::make_unique<TextTable>(EventColumns(), look_.width >= kWide ? 2 : 1);
+        TextTable::Row row{{}, event.severity, {}};
+        std::string when = WhenText(event);
+        if (event.time && look_.width < kNarrow) {
+            row.group = when.substr(0, when.find(' '));
+            when.erase(0, row.group.size() + 1);
         }
-        for (std::size_t line = 0; line < lines; ++line) {
-            std::string text;
-            for (std::size_t i = 0; i < row.size(); ++i) {
-                const std::string cell = line < cells[i].size() ? cells[i][line] : "";
-                text += (i == 0 ? "" : " ") + Fit(cell, kColumns[i].width);
-            }
-            PrintLine(text);
+        const std::string severity =
+            event.severity ? std::string(InfoOf(*event.severity).shortName) : "-";
+        const std::string part = PartText(event.part, event.partCandidates);
+        if (look_.width >= kWide) {
+            row.cells = {event.recordId ? std::to_string(*event.recordId) : "",
+                         when,
+                         severity,
+                         event.state == "open" ? "open" : "",
+                         part,
+                         event.sensor,
+                         WhatText(event),
+                         ReadingText(event)};
+        } else {
+            // Without a reading the part says enough; a limit is one of a sensor.
+            const bool ofSensor = event.reading.has_value() && !part.empty();
+            const std::string what =
+                ofSensor ? Listed({event.sensor, WhatText(event)}, ": ") : WhatText(event);
+            row.cells = {when, severity, part.empty() ? event.sensor : part,
+                         Listed({what, ReadingText(event)}, "; ")};
         }
+        for (std::string& cell : row.cells) cell = TerminalText(cell);
+        table->Add(row);
+        zoneUnknown_ = zoneUnknown_ || event.timeZoneKnown == false;
+    }
+    std::vector<TextTable::Column> EventColumns() const {
+        if (look_.width < kWide) {
+            return {{"Time", false}, {"Severity", false}, {"Part"}, {"What happened"}};
+        }
+        return {{"Record", false}, {"Time", false}, {"Severity", false}, {"State", false},
+                {"Part"},          {"Sensor"},      {"What happened"},   {"Reading"}};
     }
 
-    void PrintProperties(const tqrhost::Instance& instance) {
+    /// A class without a place of its own: its properties, a line each.
+    void AddOther(const tqrhost::Instance& instance) {
+        if (instance.className != otherClass_) {
+            other_.Write("\n" + Bold(TerminalText(instance.className), look_) + "\n");
+        } else {
+            other_.Write("\n");
+        }
+        otherClass_ = instance.className;
         for (const auto& [name, value] : instance.properties) {
-            const std::string shown = ValueText(value);
-            // The heading says the class; what has no value says nothing.
-            if (name == "CreationClassName" || shown.find_first_not_of(' ') == std::string::npos) {
-                continue;
-            }
-            const std::string label = TerminalText(name) + ":";
-            const std::size_t width = std::clamp(Columns(label), kNameWidth, kWidth / 2);
-            std::string lead = "  " + Fit(label, width) + " ";
-            const std::size_t indent = Columns(lead);
-            for (const std::string& line : Wrap(TerminalText(shown), kWidth - indent)) {
-                PrintLine(lead + line);
-                lead.assign(indent, ' ');
+            const std::string shown =
+                TerminalText(std::visit([](const auto& v) { return ShownValue(v); }, value));
+            if (shown.empty()) continue;
+            for (const std::string& line : Property(TerminalText(name), shown, kPropertyWidth)) {
+                other_.Write(line + "\n");
             }
         }
+    }
+    /// "  Name:      value", the value in as many lines as it takes.
+    std::vector<std::string> Property(const std::string& name, const std::string& value,
+                                      std::size_t nameWidth) const {
+        const std::string label = name + ":";
+        const std::size_t width = std::clamp(Columns(label), nameWidth, look_.width / 2);
+        std::string lead = "  " + Fit(label, width) + " ";
+        const std::size_t indent = Columns(lead);
+        std::vector<std::string> lines;
+        for (const std::string& line : Wrap(value, look_.width - indent)) {
+            lines.push_back(lead + line);
+            lead.assign(indent, ' ');
+        }
+        return lines;
+    }
+    void PrintProperty(const std::string& name, const std::string& value) {
+        if (value.empty()) return;
+        for (const std::string& line : Property(name, TerminalText(value), kNameWidth))
+            out_.Write(line + "\n");
+    }
+
+    void PrintLine(const std::string& text) { out_.Write(text + "\n"); }
+    void PrintWrapped(const std::string& text, const std::string& lead = "") {
+        const std::size_t indent = std::min(Columns(lead), look_.width / 2);
+        for (const std::string& line : Wrap(TerminalText(text), look_.width - indent)) {
+            PrintLine(lead + line);
+        }
+    }
+    void PrintHeading(const std::string& text) {
+        PrintLine("\n" + Bold(TerminalText(text), look_));
+    }
+
+    std::string SystemText(const SystemInfo& system) const {
+        const std::string model = Listed({system.manufacturer, system.product}, " ");
+        std::string text =
+            Listed({model, system.serial.empty() ? "" : "serial number " + system.serial});
+        if (text.empty()) text = head_.machineType;
+        return Listed({system.name, text}, ": ");
+    }
+
+    void PrintHead() {
+        for (const SystemInfo& system : systems_.All()) {
+            const std::string text = SystemText(system);
+            if (!text.empty()) PrintLine(Bold(TerminalText(text), look_));
+        }
+        const std::string bmcs =
+            std::to_string(head_.nodes) + (head_.nodes == 1 ? " BMC" : " BMCs");
+        PrintWrapped(bmcs + " from " + head_.source + ", collected " +
+                     DateAndTime(head_.collected) + " UTC");
+    }
+
+    void PrintFindings(const ReportEnd& end) {
+        const std::vector<Finding>& findings = machine_.findings;
+        std::string verdict = VerdictText(findings);
+        if (findings.empty() && OutcomeOf(end).exitStatus != 0) verdict += " in what could be read";
+        const std::optional<Severity> worst =
+            findings.empty() ? std::nullopt : findings.front().severity;
+        PrintLine("\n" + Painted(verdict + ".", worst, look_));
+        for (const Finding& f : findings) {
+            const std::string label =
+                Fit(f.severity ? InfoOf(*f.severity).shortName : "-", sizeof "critical" + 1);
+            const std::string indent(label.size(), ' ');
+            std::string lead = Painted(label, f.severity, look_);
+            const std::string node = systems_.All().size() > 1 ? systems_.Of(f.node).name : "";
+            for (const std::string& line :
+                 Wrap(TerminalText(Listed({node, f.title}, ": ")), look_.width - indent.size())) {
+                PrintLine(lead + line);
+                lead = indent;
+            }
+            const std::string part = PartText("", f.partCandidates);
+            PrintDetail(part, indent);
+            PrintDetail(OrderText(f.partNumber, f.serialNumber), indent);
+            PrintDetail(CourseText(f), indent);
+        }
+    }
+    void PrintDetail(const std::string& text, const std::string& indent) {
+        if (!text.empty()) PrintWrapped(text, indent);
+    }
+
+    void PrintSystem(std::size_t index) {
+        if (systems_.All().size() > 1) {
+            PrintHeading("Node " + std::to_string(index + 1) +
+                         (systems_.All()[index].name.empty() ? "" : ": ") +
+                         systems_.All()[index].name);
+        }
+        PrintParts(index);
+        PrintController(index);
+        PrintSensors(index);
+        PrintEvents(index);
+    }
+
+    void PrintParts(std::size_t index) {
+        TextTable table({{"Part"},
+                         {"Manufacturer"},
+                         {"Product"},
+                         {"Part number", false},
+                         {"Serial number", false}},
+                        kNoColumn);
+        for (const Fru& f : machine_.frus) {
+            if (IndexOf(f.node) != index) continue;
+            TextTable::Row row;
+            row.cells = {
+                f.name.empty() && f.deviceId ? "FRU " + std::to_string(*f.deviceId) : f.name,
+                f.manufacturer.empty() ? f.moduleManufacturer : f.manufacturer, f.product,
+                f.partNumber.empty() ? f.modulePartNumber : f.partNumber,
+                f.serialNumber.empty() ? f.moduleSerialNumber : f.serialNumber};
+            for (std::string& cell : row.cells) cell = TerminalText(cell);
+            table.Add(row);
+        }
+        if (table.Empty()) return;
+        PrintLine("");
+        table.Print(out_, look_);
+    }
+
+    void PrintController(std::size_t index) {
+        for (const Controller& c : machine_.controllers) {
+            if (IndexOf(c.node) != index) continue;
+            PrintHeading("Controller");
+            PrintProperty("Firmware",
+                          Listed({c.firmware, c.ipmiVersion.empty() ? "" : "IPMI " + c.ipmiVersion,
+                                  c.controllerManufacturer}));
+            PrintProperty("Self test", c.selfTest);
+            PrintProperty("Clock", ClockText(c));
+            PrintProperty("Power", Listed({c.powerOn ? (*c.powerOn ? "on" : "off") : "",
+                                           Listed(c.powerFaults)}));
+            if (c.chassisIntrusion == true) PrintProperty("Chassis", "opened");
+        }
+        for (const EventLog& log : machine_.eventLogs) {
+            if (IndexOf(log.node) == index) PrintProperty("Event log", EventLogText(log));
+        }
+    }
+
+    /// Those that are not well; all of them when sensors were asked for by name.
+    void PrintSensors(std::size_t index) {
+        TextTable table(
+            {{"Sensor"}, {"Status", false}, {"Reading", false}, {"Unit"}, {"Limits"}, {"States"}},
+            1);
+        std::map<std::string, unsigned> byStatus;
+        for (const Sensor& s : machine_.sensors) {
+            if (IndexOf(s.node) != index) continue;
+            ++byStatus[s.status];
+            const std::optional<Severity> severity = SeverityNamed(s.status);
+            if (!IsNamed(kSensorClass) && severity.value_or(Severity::kOk) <= Severity::kOk)
+                continue;
+            TextTable::Row row{{}, severity, {}};
+            row.cells = {s.name, s.status,    s.reading ? NumberText(*s.reading) : "",
+                         s.unit, LimitsOf(s), Listed(s.states)};
+            for (std::string& cell : row.cells) cell = TerminalText(cell);
+            table.Add(row);
+        }
+        std::string text;
+        for (const auto& [status, count] : byStatus) {
+            if (!status.empty()) text = Listed({text, std::to_string(count) + " " + status});
+        }
+        PrintProperty("Sensors", text);
+        if (table.Empty()) return;
+        PrintLine("");
+        table.Print(out_, look_);
+    }
+    /// Critical and warning limits, those below and those above: "500/900 .. 80/90".
+    static std::string LimitsOf(const Sensor& s) {
+        const auto pair = [](const Real& a, const Real& b) {
+            return Listed({a ? NumberText(*a) : "", b ? NumberText(*b) : ""}, "/");
+        };
+        const std::string low = pair(s.lowerCritical, s.lowerNonCritical);
+        const std::string high = pair(s.upperNonCritical, s.upperCritical);
+        return low.empty() && high.empty() ? "" : low + " .. " + high;
+    }
+
+    void PrintEvents(std::size_t index) {
+        if (!events_[index]) {
+            if (Shows(kEventClass)) PrintLine("\nNo events.");
+            return;
+        }
+        PrintLine("");
+        events_[index]->Print(out_, look_);
+    }
+
+    void PrintEnd(const ReportEnd& end) {
+        bool headed = false;
+        const auto line = [&](const std::string& text) {
+            if (!headed) PrintHeading("Not read");
+            headed = true;
+            PrintWrapped(text, "  ");
+        };
+        for (std::size_t i = 0; i < end.completeness.size(); ++i) {
+            for (const tqrhost::ReadFault& fault : end.completeness[i].faults) {
+                const std::string node = systems_.All().size() > 1 ? Format("node %zu", i + 1) : "";
+                line(Listed({node, Listed({fault.what, fault.record}, " "), fault.problem}, ": "));
+            }
+        }
+        PrintLine("");
+        if (zoneUnknown_) {
+            PrintWrapped("Times are those of the controller's clock; its time zone is not known.");
+        }
+        std::string last;
+        for (const auto& [name, count] : counts_) {
+            last = Listed({last, std::to_string(count) + " " + name});
+        }
+        if (last.empty()) last = "nothing";
+        const Outcome outcome = OutcomeOf(end);
+        last += outcome.problem.empty() ? ". Complete." : "; " + outcome.problem + ".";
+        PrintWrapped("Collected: " + last);
     }
 
     OutputFile& out_;
-    std::size_t nodes_;
-    std::map<std::string, unsigned> counts_;
-    std::string lastClass_;
-    std::string lastNode_;
+    ReportHead head_;
+    ReportLook look_;
+    Systems systems_;
+    MachineState machine_;
+    std::vector<std::unique_ptr<TextTable>> events_;  ///< by system
+    Spool other_;
+    std::string otherClass_;
+    std::map<std::string, unsigned, std::less<>> counts_;
+    bool zoneUnknown_ = false;
 };
 
 }  // namespace
 
-std::unique_ptr<ReportWriter> MakeTableReport(OutputFile& out, const ReportHead& head) {
-    return std::make_unique<TableReport>(out, head);
+std::unique_ptr<ReportWriter> MakeTableReport(OutputFile& out, const ReportHead& head,
+                                              const ReportLook& look) {
+    return std::make_unique<TableReport>(out, head, look);
 }
 
 }  // namespace ipmisel

@@ -103,8 +103,8 @@ TEST_F(BadInput, WhatDoesNotFitLeavesWhatWasThere) {
     const std::string file = place.Write("report", before);
     setting.fileLimit = 20000;
     for (const char* format : {"json", "ndjson", "table"}) {
-        const Ended ended =
-            Collect(source, {"--output", file, "--format", format, "--log-level", "error"});
+        const Ended ended = Collect(source, {"--output", file, "--format", format, "--log-level",
+                                             "error", "--class", "QORSG_IPMILogRecord"});
         EXPECT_EQ(ended.exitStatus, 2) << format;
         EXPECT_THAT(ended.err, MatchesRegex("ipmisel: cannot [^\n]+: File too large; [^\n]+\n"));
         EXPECT_EQ(ReadText(file), before);
@@ -118,7 +118,7 @@ TEST_F(BadInput, ASymbolicLinkIsReplacedAndNotFollowed) {
     EXPECT_EQ(Run(Good({})).exitStatus, 0);
     EXPECT_EQ(ReadText(other), "precious");
     EXPECT_FALSE(std::filesystem::is_symlink(InPlace("report")));
-    EXPECT_THAT(ReadText(InPlace("report")), StartsWith("Machine SIM-T"));
+    EXPECT_THAT(ReadText(InPlace("report")), StartsWith("server: SIM-T"));
 }
 
 TEST_F(BadInput, APipeIsWrittenAndStays) {
@@ -128,7 +128,7 @@ TEST_F(BadInput, APipeIsWrittenAndStays) {
     EXPECT_EQ(Run(Good({})).exitStatus, 0);
     char begin[8] = {};
     EXPECT_EQ(read(reader, begin, 7), 7);
-    EXPECT_STREQ(begin, "Machine");
+    EXPECT_STREQ(begin, "server:");
     close(reader);
     EXPECT_TRUE(std::filesystem::is_fifo(pipe));
 }

@@ -23,7 +23,11 @@ TEST_F(Collecting, TheJsonReportHoldsEveryPropertyInTheOrderWritten) {
     const Ended ended = Collect(source, {"--format", "json", "--class", "QORSG_IPMILogRecord"});
     EXPECT_EQ(ended.exitStatus, 0);
     const Json expected = Json::parse(R"({
+        "format": "ipmisel/1",
         "source": "",
+        "collected": "2024-03-05T11:00:00Z",
+        "complete": true,
+        "systems": [{"name": "server"}],
         "plugin": {"name": "IPMISEL", "version": "1.0", "interface": "1.0"},
         "status": {"code": 0, "text": "Success"},
         "instances": [{"class": "QORSG_IPMILogRecord", "properties": {
@@ -44,12 +48,16 @@ TEST_F(Collecting, TheJsonReportHoldsEveryPropertyInTheOrderWritten) {
             "SourceNode": "1",
             "RawData": [1, 0, 2, 176, 229, 230, 101, 32, 0, 4, 1, 48, 1, 89, 80, 69]}}],
         "notices": [],
-        "completeness": [{"node": 0,
+        "completeness": [{"node": 1, "source": "",
             "log": {"announced": 1, "read": 1, "exported": 1},
             "sensors": {"announced": 1, "read": 1}, "faults": []}]})");
     Json report = Json::parse(ended.out);
-    EXPECT_EQ(report["source"], source);
-    report["source"] = "";
+    for (Json* text : {&report["source"], &report["completeness"][0]["source"]}) {
+        EXPECT_EQ(*text, source);
+        *text = "";
+    }
+    EXPECT_EQ(report["plugins"][0]["status"], report["status"]);
+    report.erase("plugins");
     EXPECT_EQ(report, expected) << report.dump(2);
 }
 
@@ -57,15 +65,24 @@ TEST_F(Collecting, FormatsAndPlacesAgree) {
     const std::string source = Example("two-node");
     const Json instances = Report(source)["instances"];
     Json lines = Json::array();
-    for (const std::string& line : Lines(Collect(source, {"--format", "ndjson"}).out)) {
-        lines.push_back(Json::parse(line));
+    Json summaries = Json::array();
+    for (const std::string& text : Lines(Collect(source, {"--format", "ndjson"}).out)) {
+        Json line = Json::parse(text);
+        EXPECT_EQ(line["format"], "ipmisel/1");
+        if (line.contains("summary")) {
+            summaries.push_back(line);
+        } else {
+            lines.push_back({{"class", line["class"]}, {"properties", line["properties"]}});
+        }
     }
     EXPECT_EQ(lines, instances);
+    ASSERT_EQ(summaries.size(), 2U);
+    EXPECT_EQ(summaries[1]["summary"]["completeness"]["node"], 2);
+    EXPECT_EQ(summaries[1]["summary"]["complete"], true);
 
     const Ended table = Collect(source);
     EXPECT_THAT(Lines(table.out), Each(SizeIs(Lt(101U))));
-    EXPECT_THAT(table.out,
-                AllOf(HasSubstr("QORSG_IPMILogRecord, node 2\n"), EndsWith("Complete.\n")));
+    EXPECT_THAT(table.out, AllOf(HasSubstr("\nNode 2: two-node\n"), EndsWith("Complete.\n")));
     EXPECT_EQ(Collect(source, {"--output", "-"}).out, table.out);
 
     const std::string file = InPlace("report");
@@ -131,7 +148,8 @@ TEST_F(Collecting, TextsOfABmcDoNotSteerTheTerminal) {
                                            "0200 dd b0e5e665 000000 00 c29b7f42 00"};
     const std::string source = Write(server);
     for (const char* format : {"table", "json", "ndjson"}) {
-        const Ended ended = Collect(source, {"--format", format, "--log-level", "trace"});
+        const Ended ended = Collect(
+            source, {"--format", format, "--log-level", "trace", "--class", "QORSG_IPMILogRecord"});
         for (const std::string& text : {ended.out, ended.err}) {
             EXPECT_FALSE(text.empty());
             for (const char* control : {"\x1b", "\x7f", "\xff", "\xc2\x9b"}) {
@@ -146,7 +164,12 @@ TEST_F(Collecting, TextsOfABmcDoNotSteerTheTerminal) {
 }
 
 TEST_F(Collecting, TheLogFileHoldsEveryLineAndTheTerminalWhatWasAskedFor) {
-    const Ended ended = Collect(Write(Server()), {"--log-file", InPlace("log")});
+    const std::vector<std::string> everything{"--format", "ndjson"};
+    const auto with = [&everything](std::vector<std::string> more) {
+        more.insert(more.end(), everything.begin(), everything.end());
+        return more;
+    };
+    const Ended ended = Collect(Write(Server()), with({"--log-file", InPlace("log")}));
     std::set<int> severities;
     const std::vector<std::string> lines = Lines(ReadText(InPlace("log")));
     for (const std::string& line : lines) {
@@ -156,8 +179,8 @@ TEST_F(Collecting, TheLogFileHoldsEveryLineAndTheTerminalWhatWasAskedFor) {
                                      R"({"severity": 4, "text": "num_SELentries = 1"})"}));
     EXPECT_THAT(severities, ElementsAre(1, 2, 3, 4));
     EXPECT_THAT(Lines(ended.err), AllOf(Not(IsEmpty()), Each(StartsWith("ipmisel: warning: "))));
-    EXPECT_EQ(Collect(Write(Server()), {"--log-level", "error"}).err, "");
-    EXPECT_THAT(Collect(Write(Server()), {"--log-level", "info"}).err,
+    EXPECT_EQ(Collect(Write(Server()), with({"--log-level", "error"})).err, "");
+    EXPECT_THAT(Collect(Write(Server()), with({"--log-level", "info"})).err,
                 HasSubstr("ipmisel: info: Getting IPMI SEL data.\n"));
 }
 

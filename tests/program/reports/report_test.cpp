@@ -1,6 +1,7 @@
 #include <gmock/gmock.h>
 
 #include "program/commands/failure.h"
+#include "program/reports/output_file.h"
 #include "program/reports/report.h"
 
 namespace {
@@ -10,87 +11,143 @@ using ipmisel::ReportEnd;
 using tqrhost::Instance;
 using tqrhost::StopReason;
 
+/// An event as a plug-in writes it.
+Instance Event(std::int64_t record, const std::string& severity, const std::string& text) {
+    return {"IPMI_Event",
+            {{"Key", std::string(32, static_cast<char>('a' + record))},
+             {"Node", std::int64_t{1}},
+             {"RecordID", record},
+             {"Time", tqrhost::Time{1773023504 + record}},
+             {"Severity", severity},
+             {"State", std::string("open")},
+             {"Direction", std::string("asserted")},
+             {"Sensor", std::string("CPU1 Temp")},
+             {"Text", text},
+             {"Part", std::string("Processor 1")}}};
+}
+
 class Table : public testing::Test {
 protected:
-    /// The table of these instances, without its first line and the last.
+    ipmisel::ReportHead head{.source = "sim:x",
+                             .plugin = {"IPMISEL", "1.0", "1.0"},
+                             .machineType = "SIM-1",
+                             .nodes = 1,
+                             .systems = {{"rack7", "sim:x", "", "", "", ""}},
+                             .collected = {1773081722},
+                             .wanted = {"IPMI_Event", "IPMI_Finding"}};
+    ipmisel::ReportLook look;
+    ipmisel::ReportEnd end;
+
+    /// The table of these instances from its third line on.
     std::string Print(const std::vector<Instance>& instances) {
         testing::internal::CaptureStdout();
         {
             ipmisel::OutputFile out(std::nullopt);
-            const auto report =
-                ipmisel::MakeTableReport(out, {"sim:x", {"IPMISEL", "1.0", "1.0"}, "SIM-1", 1});
+            const auto report = ipmisel::MakeTableReport(out, head, look);
             for (const Instance& instance : instances) report->Add(instance);
-            report->Finish({});
+            report->Finish(end);
             out.Commit();
         }
         std::string text = testing::internal::GetCapturedStdout();
-        text.erase(0, text.find('\n') + 1);
-        return text.substr(0, text.rfind("\nCollected"));
-    }
-    static Instance Record(const std::string& message) {
-        return {"QORSG_IPMILogRecord",
-                {{"RecordID", "1"},
-                 {"MessageTimestamp", "20240305120000.000000+060"},
-                 {"Source", "16 (address). LUN 0. Channel 0. "},
-                 {"SensorType", "Temperature"},
-                 {"EventType", "Assertion, Threshold."},
-                 {"Message", message},
-                 {"AuxLog", "No Extended Data"},
-                 {"SourceNode", "1"}}};
-    }
-    static void Set(Instance* record, const std::string& name, const std::string& value) {
-        for (auto& [property, old] : record->properties) {
-            if (property == name) old = value;
-        }
+        EXPECT_THAT(text, testing::HasSubstr("rack7: SIM-1"));
+        EXPECT_THAT(text,
+                    testing::HasSubstr("\n1 BMC from sim:x, collected 2026-03-09 18:42:02 UTC\n"));
+        for (int lines = 2; lines > 0; --lines) text.erase(0, text.find('\n') + 1);
+        return text;
     }
 };
 
-const std::string kHead =
-    "\nQORSG_IPMILogRecord\n"
-    "Record Time                Source       Sensor type    Direction   Message\n" +
-    std::string(100, '-') + "\n";
+TEST_F(Table, AnEventIsOneLineWhereItFits) {
+    Instance hot = Event(1, "critical", "upper critical high");
+    hot.properties.insert(
+        hot.properties.end(),
+        {{"Reading", 80.5}, {"Threshold", 69.0}, {"Unit", std::string("degrees C")}});
+    Instance over = Event(2, "ok", "machine check");
+    for (auto& [name, value] : over.properties) {
+        if (name == "Direction") value = std::string("deasserted");
+    }
+    Instance young = Event(3, "", "boot?");
+    young.properties.erase(young.properties.begin() + 3, young.properties.begin() + 5);
+    young.properties.emplace_back("SecondsSinceStart", std::int64_t{3754});
+    EXPECT_EQ(Print({hot, over, young}), R"(
+No problem found.
 
-TEST_F(Table, ARecordIsOneRowOfColumnsThatWrap) {
-    Instance noTime = Record("Unknown log type. Raw Data:\n00 01");
-    noTime.properties.erase(noTime.properties.begin() + 2, noTime.properties.begin() + 5);
-    Set(&noTime, "RecordID", "65535");
-    Set(&noTime, "MessageTimestamp", "19700101000000.000000+000");
-    Instance auxiliary = Record(" (Memory - ): Deassertion: Uncorrectable");
-    Set(&auxiliary, "SensorType", "Memory");
-    Set(&auxiliary, "EventType", "Deassertion, Sensor-specific.");
-    Set(&auxiliary, "Source", "System management software. Channel 7.");
-    Set(&auxiliary, "AuxLog", "Type: Debug Code");
-    const Instance wrapped = Record(
-        "Processor 1 (Temperature - CPU1 Temp): Assertion: Rose above the upper limit. \n     "
-        "Trigger reading: 80 degrees C.");
-    EXPECT_EQ(
-        Print({wrapped, noTime, auxiliary}),
-        kHead +
-            R"(1      2024-03-05 12:00:00 16 (address) Temperature    Assertion   Processor 1 (CPU1 Temp): Rose
-                                                                   above the upper limit. Trigger
-                                                                   reading: 80 degrees C.
-65535  -                   -                           -           Unknown log type. Raw Data: 00 01
-1      2024-03-05 12:00:00 System       Memory         Deassertion Uncorrectable Type: Debug Code
-                           management
-                           software.
-                           Channel 7
+Time                 Severity  Part         What happened
+2026-03-09 02:31:45  critical  Processor 1  CPU1 Temp: upper critical high; 80.5 degrees C, limit 69
+2026-03-09 02:31:46  ok        Processor 1  no longer: machine check
+start +1:02:34       -         Processor 1  boot?
+
+Collected: 3 IPMI_Event. Complete.
+)");
+    look.width = 60;
+    EXPECT_THAT(Print({hot}), testing::HasSubstr(R"(
+Time      Severity  Part         What happened
+2026-03-09
+02:31:45  critical  Processor 1  CPU1 Temp: upper critical
+                                 high; 80.5 degrees C, limit
+                                 69
+)"));
+    look = {140, true};
+    EXPECT_THAT(Print({hot}),
+                testing::HasSubstr("1       2026-03-09 02:31:45  \x1b[1;31mcritical\x1b[0m  open   "
+                                   "Processor 1  CPU1 Temp  upper critical high  80.5 degrees "
+                                   "C, limit 69\n"));
+}
+
+TEST_F(Table, FindingsStandFirstWithWhatToOrder) {
+    const Instance finding{"IPMI_Finding",
+                           {{"Severity", std::string("critical")},
+                            {"Title", std::string("DIMM_11: uncorrectable error")},
+                            {"PartNumber", std::string("MC4")},
+                            {"SerialNumber", std::string("0A1B")},
+                            {"PartCandidates", std::vector<std::string>{"DIMM_11", "DIMM_12"}},
+                            {"FirstTime", tqrhost::Time{1773023504}},
+                            {"LastTime", tqrhost::Time{1773023508}},
+                            {"Count", std::int64_t{2}},
+                            {"StillPresent", true}}};
+    end.completeness = {{"sim:x", {1, 1}, {}, {{"Read FRU Data", "0005", "no response", false}}}};
+    EXPECT_EQ(Print({Event(1, "critical", "x"), finding}), R"(
+1 problem, critical.
+critical  DIMM_11: uncorrectable error
+          one of: DIMM_11; DIMM_12
+          part number MC4, serial number 0A1B
+          2026-03-09 02:31:44 to 2026-03-09 02:31:48, still present now
+
+Time                 Severity  Part         What happened
+2026-03-09 02:31:45  critical  Processor 1  x
+
+Not read
+  Read FRU Data 0005: no response
+
+Collected: 1 IPMI_Event, 1 IPMI_Finding. Complete.
 )");
 }
 
-TEST_F(Table, AnyOtherClassIsReadableToo) {
-    const Instance one{"QORSG_New\x1b", {{"Name", std::string("a\nb")}, {"Last", std::string()}}};
-    const Instance other{"QORSG_New\x1b",
+TEST_F(Table, AClassThatIsNamedIsShownByItsProperties) {
+    head.named = true;
+    head.wanted = {"NEW_Class\x1b"};
+    const Instance one{"NEW_Class\x1b", {{"Name", std::string("a\nb")}, {"Last", std::string()}}};
+    const Instance other{"NEW_Class\x1b",
                          {{"RawData", std::vector<std::uint8_t>{1, 0xAB}},
-                          {"Log", tqrhost::ObjectPath{"QORSG_Y", {{"Name", "z"}}}},
-                          {"ANameLongerThanItsColumn_____", std::string(80, 'x')}}};
-    EXPECT_EQ(Print({one, other}),
-              "\nQORSG_New\uFFFD\n"
+                          {"Log", tqrhost::ObjectPath{"NEW_Y", {{"Name", "z"}}}},
+                          {"Real", 1.5},
+                          {"Truth", true},
+                          {"At", tqrhost::Time{0}},
+                          {"Texts", std::vector<std::string>{"p", "q"}},
+                          {"Long", std::string(90, 'x')}}};
+    EXPECT_EQ(Print({one, other, {"OTHER_Class", {{"Name", std::string("not asked for")}}}}),
+              "\nNEW_Class\uFFFD\n"
               "  Name:                    a b\n"
               "\n"
               "  RawData:                 01 ab\n"
-              "  Log:                     QORSG_Y Name=z\n"
-              "  ANameLongerThanItsColumn_____: " +
-                  std::string(67, 'x') + "\n" + std::string(33, ' ') + std::string(13, 'x') + "\n");
+              "  Log:                     NEW_Y Name=z\n"
+              "  Real:                    1.5\n"
+              "  Truth:                   yes\n"
+              "  At:                      1970-01-01 00:00:00\n"
+              "  Texts:                   p; q\n"
+              "  Long:                    " +
+                  std::string(73, 'x') + "\n" + std::string(27, ' ') + std::string(17, 'x') +
+                  "\n\nCollected: 2 NEW_Class\uFFFD, 1 OTHER_Class. Complete.\n");
 }
 
 TEST(Outcome, SaysHowItWentAndWhatIsMissing) {

@@ -1,0 +1,47 @@
+#include "program/reports/completeness_json.h"
+
+namespace ipmisel {
+namespace {
+
+Json AccountJson(const tqrhost::SourceAccount& account) {
+    Json json = Json::object();
+    json["announced"] = account.announced ? Json(*account.announced) : Json(nullptr);
+    json["read"] = account.read;
+    return json;
+}
+
+}  // namespace
+
+Json CompletenessJson(const ReportEnd& end) {
+    Json nodes = Json::array();
+    for (std::size_t node = 0; node < end.completeness.size(); ++node) {
+        const tqrhost::NodeCompleteness& account = end.completeness[node];
+        Json log = AccountJson(account.log);
+        if (node < end.exported.size()) log["exported"] = end.exported[node];
+        Json faults = Json::array();
+        for (const tqrhost::ReadFault& fault : account.faults) {
+            Json json = {{"what", fault.what}};
+            if (!fault.record.empty()) json["record"] = fault.record;
+            json["problem"] = fault.problem;
+            faults.push_back(std::move(json));
+        }
+        Json json = {{"node", node + 1}};
+        if (!account.source.empty()) json["source"] = account.source;
+        json["log"] = std::move(log);
+        json["sensors"] = AccountJson(account.sensors);
+        json["faults"] = std::move(faults);
+        nodes.push_back(std::move(json));
+    }
+    return nodes;
+}
+
+Json StatusJson(NQORTQR20::TTQRStatusCode status) {
+    return {{"code", status.code}, {"text", status.TranslateStatusCode()}};
+}
+
+Json PluginJson(const tqrhost::PluginInfo& plugin) {
+    return {
+        {"name", plugin.name}, {"version", plugin.version}, {"interface", plugin.interfaceVersion}};
+}
+
+}  // namespace ipmisel

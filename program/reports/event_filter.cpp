@@ -1,0 +1,75 @@
+#include "program/reports/event_filter.h"
+
+#include <charconv>
+#include <deque>
+#include <string>
+#include <utility>
+
+#include "program/reports/view.h"
+
+namespace ipmisel {
+namespace {
+
+class EventFilter : public ReportWriter {
+public:
+    EventFilter(std::unique_ptr<ReportWriter> report, const EventWish& wish)
+        : report_(std::move(report)), wish_(wish) {}
+
+    void Add(const tqrhost::Instance& instance) override {
+        if (instance.className != kEventClass) {
+            report_->Add(instance);
+            return;
+        }
+        if (!IsWished(EventOf(instance))) return;
+        if (!wish_.last) {
+            report_->Add(instance);
+            return;
+        }
+        newest_.push_back(instance);
+        if (newest_.size() > *wish_.last) newest_.pop_front();
+    }
+    void Finish(const ReportEnd& end) override {
+        for (const tqrhost::Instance& instance : newest_) report_->Add(instance);
+        report_->Finish(end);
+    }
+
+private:
+    bool IsWished(const Event& event) {
+        if (event.time) last_ = event.time;
+        if (wish_.since && (!last_ || last_->seconds < wish_.since->seconds)) return false;
+        return !wish_.severity || event.severity >= wish_.severity;
+    }
+
+    std::unique_ptr<ReportWriter> report_;
+    EventWish wish_;
+    MaybeTime last_;
+    std::deque<tqrhost::Instance> newest_;
+};
+
+}  // namespace
+
+std::optional<tqrhost::Time> ParseMoment(std::string_view text, tqrhost::Time now) {
+    for (const char* rest : {"", "Z", ":00Z", " 00:00:00Z"}) {
+        if (const MaybeTime time = ParseTime(std::string(text) + rest)) return time;
+    }
+    constexpr struct {
+        char unit;
+        std::int64_t seconds;
+    } kUnits[] = {{'m', 60}, {'h', 3600}, {'d', 86400}};
+    std::int64_t count = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), count);
+    if (error != std::errc() || end + 1 != text.data() + text.size()) return std::nullopt;
+    if (count < 0 || count > 100000) return std::nullopt;
+    for (const auto& [unit, seconds] : kUnits) {
+        if (*end == unit) return tqrhost::Time{now.seconds - count * seconds};
+    }
+    return std::nullopt;
+}
+
+std::unique_ptr<ReportWriter> FilterEvents(std::unique_ptr<ReportWriter> report,
+                                           const EventWish& wish) {
+    if (wish.Everything()) return report;
+    return std::make_unique<EventFilter>(std::move(report), wish);
+}
+
+}  // namespace ipmisel

@@ -1,0 +1,29 @@
+#pragma once
+
+#include <functional>
+#include <string>
+
+#include "program/reports/report.h"
+
+namespace ipmisel {
+
+/// A report that was written with --format json, read again. Its instances are read one at a time.
+class SavedReport {
+public:
+    /// Reads all but the instances. Throws Failure when the file cannot be read or is no report.
+    explicit SavedReport(const std::string& file);
+    const ReportHead& Head() const { return head_; }
+    const ReportEnd& End() const { return end_; }
+    /// The instances in their order. Throws Failure, and whatever `take` throws.
+    void ForEach(const std::function<void(const tqrhost::Instance&)>& take) const;
+
+private:
+    std::string file_;
+    ReportHead head_;
+    ReportEnd end_;
+};
+
+/// Whether a file is a capture of --record, by its beginning.
+bool IsCapture(const std::string& file);
+
+}  // namespace ipmisel

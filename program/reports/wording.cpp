@@ -1,0 +1,121 @@
+#include "program/reports/wording.h"
+
+#include <algorithm>
+#include <cmath>
+
+#include "base/text.h"
+
+namespace ipmisel {
+namespace {
+
+std::string Counted(std::int64_t count, const std::string& what) {
+    return std::to_string(count) + " " + what + (count == 1 ? "" : "s");
+}
+
+}  // namespace
+
+std::string DateAndTime(tqrhost::Time time) {
+    std::string text = TimeText(time);  // 2026-03-09T02:31:44Z
+    text[10] = ' ';
+    text.pop_back();
+    return text;
+}
+
+std::string WhenText(const Event& event) {
+    if (event.time) return DateAndTime(*event.time);
+    if (!event.secondsSinceStart) return "-";
+    const auto s = static_cast<long long>(*event.secondsSinceStart);
+    if (s >= 86400)
+        return Format("start +%lldd %02lld:%02lld", s / 86400, s / 3600 % 24, s / 60 % 60);
+    return Format("start +%lld:%02lld:%02lld", s / 3600, s / 60 % 60, s % 60);
+}
+
+std::string DurationText(double seconds) {
+    constexpr struct {
+        double seconds;
+        const char* unit;
+    } kUnits[] = {{86400, "days"}, {3600, "hours"}, {60, "minutes"}};
+    for (const auto& [length, unit] : kUnits) {
+        if (seconds >= 2 * length) return Format("%.0f %s", seconds / length, unit);
+    }
+    return Format(seconds < 10 ? "%.1f seconds" : "%.0f seconds", seconds);
+}
+
+std::string NumberText(double number) { return Format("%.6g", number); }
+
+std::string WhatText(const Event& event) {
+    return (event.IsDeasserted() ? "no longer: " : "") + event.text;
+}
+
+std::string ReadingText(const Event& event) {
+    if (!event.reading) return {};
+    std::string text = NumberText(*event.reading);
+    if (!event.unit.empty()) text += " " + event.unit;
+    if (event.threshold) text += ", limit " + NumberText(*event.threshold);
+    return text;
+}
+
+std::string Listed(const Texts& parts, const char* separator) {
+    std::string text;
+    for (const std::string& part : parts) {
+        if (!part.empty()) text += (text.empty() ? "" : separator) + part;
+    }
+    return text;
+}
+
+std::string PartText(const std::string& part, const Texts& candidates) {
+    if (candidates.size() > 1) return "one of: " + Listed(candidates, "; ");
+    return part.empty() ? Listed(candidates) : part;
+}
+
+std::string OrderText(const std::string& partNumber, const std::string& serialNumber) {
+    return Listed({partNumber.empty() ? "" : "part number " + partNumber,
+                   serialNumber.empty() ? "" : "serial number " + serialNumber});
+}
+
+std::string CourseText(const Finding& finding) {
+    std::string when;
+    if (finding.firstTime && finding.lastTime && *finding.firstTime != *finding.lastTime) {
+        when = DateAndTime(*finding.firstTime) + " to " + DateAndTime(*finding.lastTime);
+    } else if (finding.firstTime || finding.lastTime) {
+        when = DateAndTime(finding.firstTime ? *finding.firstTime : *finding.lastTime);
+    }
+    return Listed({when, finding.stillPresent == true ? "still present now" : ""});
+}
+
+std::string VerdictText(const std::vector<Finding>& findings) {
+    if (findings.empty()) return "No problem found";
+    std::optional<Severity> worst;
+    for (const Finding& finding : findings) worst = std::max(worst, finding.severity);
+    return Counted(static_cast<std::int64_t>(findings.size()), "problem") +
+           (worst
+                ? (findings.size() == 1 ? ", " : ", the worst ") + std::string(InfoOf(*worst).name)
+                : "");
+}
+
+std::string ClockText(const Controller& controller) {
+    std::string text = controller.time ? DateAndTime(*controller.time) + " UTC" : "";
+    if (controller.clockOffset) {
+        const double offset = *controller.clockOffset;
+        const bool within = std::fabs(offset) <= controller.clockUncertainty.value_or(0);
+        text += text.empty() ? "" : ", ";
+        text +=
+            within ? "right" : DurationText(std::fabs(offset)) + (offset > 0 ? " fast" : " slow");
+    }
+    if (controller.utcOffset) {
+        const auto minutes = static_cast<int>(*controller.utcOffset);
+        text += Format("%stime zone UTC%c%02d:%02d", text.empty() ? "" : ", ",
+                       minutes < 0 ? '-' : '+', std::abs(minutes) / 60, std::abs(minutes) % 60);
+    }
+    return text;
+}
+
+std::string EventLogText(const EventLog& log) {
+    return Listed({log.records ? Counted(*log.records, "record") : "",
+                   log.usedPercent ? Format("%.0f %% used", *log.usedPercent) : "",
+                   log.overflow == true ? "full: events were dropped" : "",
+                   log.lastAddition ? "last added to " + DateAndTime(*log.lastAddition) : "",
+                   log.lastErase ? "last erased " + DateAndTime(*log.lastErase) : ""});
+}
+
+}  // namespace ipmisel

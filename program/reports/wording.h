@@ -1,0 +1,40 @@
+#pragma once
+
+#include <string>
+
+#include "program/reports/view.h"
+
+// How the reports for people put the values of the view into words. The texts are those of the
+// controller: a report cleans them for where they go.
+
+namespace ipmisel {
+
+/// "2026-03-09 02:31:44", UTC.
+std::string DateAndTime(tqrhost::Time time);
+/// When it happened: date and time; "start +0:12:34" for a time since the controller's start; "-"
+/// for none.
+std::string WhenText(const Event& event);
+/// 4.5 seconds, 3 minutes, 2 hours, 12 days: the largest unit that is not less than two of it.
+std::string DurationText(double seconds);
+/// At most six significant digits.
+std::string NumberText(double number);
+/// What happened: "no longer: ..." for a fault that was taken back.
+std::string WhatText(const Event& event);
+/// "80 degrees C, limit 69"; empty without a reading.
+std::string ReadingText(const Event& event);
+/// The part, or the parts of which it is one.
+std::string PartText(const std::string& part, const Texts& candidates);
+/// "part number X, serial number Y", as far as known.
+std::string OrderText(const std::string& partNumber, const std::string& serialNumber);
+/// From when to when, still present.
+std::string CourseText(const Finding& finding);
+/// "no problem", "2 problems, the worst critical".
+std::string VerdictText(const std::vector<Finding>& findings);
+/// A controller's clock beside the collector's.
+std::string ClockText(const Controller& controller);
+/// How full the log is and since when it runs.
+std::string EventLogText(const EventLog& log);
+/// Parts joined by ", ", empty ones left out.
+std::string Listed(const Texts& parts, const char* separator = ", ");
+
+}  // namespace ipmisel

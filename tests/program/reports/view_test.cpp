@@ -1,0 +1,188 @@
+#include "program/reports/view.h"
+
+#include <gmock/gmock.h>
+
+#include "program/reports/event_filter.h"
+#include "program/reports/severity.h"
+#include "program/reports/wording.h"
+
+namespace {
+
+using ipmisel::ParseTime;
+using tqrhost::Instance;
+using tqrhost::Time;
+
+std::optional<Time> At(std::optional<std::int64_t> seconds) {
+    return seconds ? std::optional(Time{*seconds}) : std::nullopt;
+}
+
+TEST(View, ATimeIsReadInEveryFormOfRfc3339AndNothingElse) {
+    const struct {
+        const char* text;
+        std::optional<std::int64_t> seconds;
+    } cases[] = {
+        {"1970-01-01T00:00:00Z", 0},
+        {"2026-03-09T02:31:44Z", 1773023504},
+        {"2026-03-09T02:31:44z", 1773023504},
+        {"2026-03-09 03:31:44+01:00", 1773023504},
+        {"2026-03-08T21:01:44-05:30", 1773023504},
+        {"1969-12-31T23:59:59Z", -1},
+        {"2100-01-01T00:00:00Z", 4102444800},
+        {"2026-02-29T02:31:44Z", std::nullopt},  // no leap year
+        {"2026-03-09T24:00:00Z", std::nullopt},
+        {"2026-03-09T02:60:00Z", std::nullopt},
+        {"2026-13-09T02:31:44Z", std::nullopt},
+        {"2026-03-09T02:31:44", std::nullopt},
+        {"2026-03-09T02:31:44Zx", std::nullopt},
+        {"2026-03-09T02:31:44+1:00", std::nullopt},
+        {"2026-03-09T02:31:44+24:00", std::nullopt},
+        {"-026-03-09T02:31:44Z", std::nullopt},
+        {"2026-03-+9T02:31:44Z", std::nullopt},
+        {"", std::nullopt},
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(ParseTime(c.text), At(c.seconds)) << c.text;
+    }
+}
+
+TEST(View, PropertiesAreTakenByNameInAnyOrderAndOnlyInTheirType) {
+    const ipmisel::Event event =
+        ipmisel::EventOf({"IPMI_Event",
+                          {{"Raw", std::string("0100022080a5695b0004013001595045")},
+                           {"Reading", std::int64_t{80}},
+                           {"Later", std::string("a property of a later version")},
+                           {"Time", std::string("2026-03-09T02:31:44Z")},
+                           {"ResolvedTime", Time{7}},
+                           {"Severity", std::string("fatal")},
+                           {"PartCertain", false},
+                           {"PartCandidates", std::vector<std::string>{"A", "B"}},
+                           {"RecordID", std::string("1")}}});
+    EXPECT_EQ(event.reading, 80.0);
+    EXPECT_EQ(event.time, Time{1773023504});
+    EXPECT_EQ(event.resolvedTime, Time{7});
+    EXPECT_EQ(event.severity, ipmisel::Severity::kFatal);
+    EXPECT_EQ(event.partCertain, false);
+    EXPECT_THAT(event.partCandidates, testing::ElementsAre("A", "B"));
+    EXPECT_EQ(event.recordId, std::nullopt);
+    EXPECT_EQ(event.stillPresent, std::nullopt);
+    ASSERT_TRUE(event.Record());
+    EXPECT_EQ((*event.Record())[0], 0x01);
+    EXPECT_EQ((*event.Record())[15], 0x45);
+    for (const char* raw :
+         {"", "01", "0100022080a5695b000401300159504", "0100022080a5695b00040130015950g5",
+          "0100022080a5695b00040130015950+5"}) {
+        ipmisel::Event broken;
+        broken.raw = raw;
+        EXPECT_FALSE(broken.Record()) << raw;
+    }
+}
+
+TEST(View, AMomentIsADateATimeOrHowLongAgo) {
+    const Time now{1773100800};  // 2026-03-10
+    const struct {
+        const char* text;
+        std::optional<std::int64_t> seconds;
+    } cases[] = {
+        {"2026-03-09", 1773014400},
+        {"2026-03-09 02:31", 1773023460},
+        {"2026-03-09 02:31:44", 1773023504},
+        {"2026-03-09T03:31:44+01:00", 1773023504},
+        {"90m", 1773095400},
+        {"12h", 1773057600},
+        {"7d", 1772496000},
+        {"0d", 1773100800},
+        {"7", std::nullopt},
+        {"7w", std::nullopt},
+        {"d", std::nullopt},
+        {"-1d", std::nullopt},
+        {"99999999999d", std::nullopt},
+        {"yesterday", std::nullopt},
+        {"", std::nullopt},
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(ipmisel::ParseMoment(c.text, now), At(c.seconds)) << c.text;
+    }
+}
+
+/// Takes down which events come through.
+class Records : public ipmisel::ReportWriter {
+public:
+    explicit Records(std::string* seen) : seen_(seen) {}
+    void Add(const Instance& instance) override {
+        const auto record = ipmisel::EventOf(instance).recordId;
+        *seen_ += record ? std::to_string(*record) : "x";
+    }
+    void Finish(const ipmisel::ReportEnd&) override { *seen_ += "."; }
+
+private:
+    std::string* seen_;
+};
+
+TEST(View, FewerEventsAreShownWhenFewerAreWanted) {
+    using ipmisel::Severity;
+    const struct {
+        ipmisel::EventWish wish;
+        const char* seen;
+    } cases[] = {
+        {{}, "12345x."},
+        {{.since = Time{20}}, "234x."},  // a record without a time is as old as the one before it
+        {{.severity = Severity::kWarning}, "24x."},
+        {{.last = 2}, "x45."},
+        {{.since = Time{20}, .severity = Severity::kWarning, .last = 1}, "x4."},
+    };
+    const std::vector<std::pair<std::optional<Time>, const char*>> events = {
+        {Time{10}, "ok"},
+        {Time{20}, "critical"},
+        {std::nullopt, ""},
+        {Time{30}, "warning"},
+        {Time{5}, "information"}};
+    for (const auto& c : cases) {
+        std::string seen;
+        const auto report = ipmisel::FilterEvents(std::make_unique<Records>(&seen), c.wish);
+        std::int64_t record = 0;
+        for (const auto& [time, severity] : events) {
+            Instance event{"IPMI_Event",
+                           {{"RecordID", ++record}, {"Severity", std::string(severity)}}};
+            if (time) event.properties.emplace_back("Time", *time);
+            report->Add(event);
+        }
+        report->Add({"IPMI_Finding", {}});
+        report->Finish({});
+        EXPECT_EQ(seen, c.seen);
+    }
+}
+
+TEST(Wording, SaysHowAClockGoes) {
+    ipmisel::Controller controller;
+    controller.time = Time{1773023504};
+    controller.clockUncertainty = 0.5;
+    const struct {
+        double offset;
+        const char* text;
+    } cases[] = {{0.4, "right"},
+                 {-0.5, "right"},
+                 {1.5, "1.5 seconds fast"},
+                 {-119, "119 seconds slow"},
+                 {-121, "2 minutes slow"},
+                 {7300, "2 hours fast"},
+                 {-200000, "2 days slow"}};
+    for (const auto& c : cases) {
+        controller.clockOffset = c.offset;
+        EXPECT_EQ(ClockText(controller), "2026-03-09 02:31:44 UTC, " + std::string(c.text));
+    }
+    controller.time.reset();
+    controller.clockOffset.reset();
+    controller.utcOffset = -330;
+    EXPECT_EQ(ClockText(controller), "time zone UTC-05:30");
+}
+
+TEST(Severities, AreOrderedAndNamedOnce) {
+    EXPECT_EQ(ipmisel::SeverityNamed("fatal"), ipmisel::Severity::kFatal);
+    EXPECT_EQ(ipmisel::SeverityNamed("Fatal"), std::nullopt);
+    for (const auto& info : ipmisel::Severities()) {
+        EXPECT_EQ(ipmisel::SeverityNamed(info.name), info.severity);
+        EXPECT_LE(info.shortName.size(), 8U);
+    }
+}
+
+}  // namespace
