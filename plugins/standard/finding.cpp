@@ -30,10 +30,7 @@ bool IsOf(const Event& event, std::uint8_t sensorType, std::uint16_t offsets) {
 
 constexpr std::uint16_t kAnyOffset = 0xFFFF;
 
-bool IsMemoryError(const Event& event) {
-    // Correctable, uncorrectable, parity, scrub, and the logging limit of correctable ones.
-    return IsOf(event, ipmi::sensor_type::kMemory, 0b101111);
-}
+bool IsOfMemory(const Event& event) { return IsOf(event, ipmi::sensor_type::kMemory, kAnyOffset); }
 bool IsThermalTrip(const Event& event) {
     return IsOf(event, ipmi::sensor_type::kProcessor, 0b10) ||
            IsOf(event, ipmi::sensor_type::kChipSet, 0b10);
@@ -63,7 +60,7 @@ struct Rule {
 // The first rule that applies to an open or momentary fault says with which others it is one
 // finding.
 constexpr std::array kRules = std::to_array<Rule>({
-    {IsMemoryError, Scope::kModule},
+    {IsOfMemory, Scope::kModule},
     {IsSystemStop, Scope::kBurst},
     {IsPcieError, Scope::kDevice},
     {IsThermalTrip, Scope::kSensorOffset},

@@ -27,20 +27,21 @@ TEST(Finding, TenCorrectedErrorsOfOneModuleAreOneWithACount) {
         log.At(kNoon + i).Event(kMemory, 0x80, kAsserted, {0x30, 0xFF, 0x04});
     }
     log.At(kNoon + 20).Event(kMemory, 0x80, kAsserted, {0x30, 0xFF, 0x05});
+    log.At(kNoon + 25).Event(kMemory, 0x80, kAsserted, {0x34, 0xFF, 0x04});  // disabled
     log.At(kNoon + 30).Event(kMemory, 0x82, kAsserted, {0x31, 0xFF, 0x04});  // another sensor
     const auto findings = Findings(log);
     ASSERT_EQ(findings.size(), 2u);
     EXPECT_EQ(findings[0].severity, ipmi::Severity::kCritical);
     EXPECT_EQ(findings[0].title,
               "Memory sensor 82h: uncorrectable ECC or other uncorrectable memory error, memory "
-              "module 4 (11 events)");
-    EXPECT_EQ(findings[0].events.size(), 11u);
+              "module 4 (12 events)");
+    EXPECT_EQ(findings[0].events.size(), 12u);
     EXPECT_THAT(findings[0].evidence,
                 ElementsAre("2026-03-09T12:00:00Z: Memory sensor 80h: correctable ECC or other "
                             "correctable memory error, memory module 4",
                             "2026-03-09T12:00:30Z: Memory sensor 82h: uncorrectable ECC or other "
                             "uncorrectable memory error, memory module 4",
-                            "9 more events"));
+                            "10 more events"));
     EXPECT_THAT(findings[1].events, ElementsAre(10));
 }
 
