@@ -1,10 +1,13 @@
 #include <iterator>
+#include <map>
+#include <string>
 
 #include "base/hex.h"
 #include "ipmi/entities.h"
 #include "ipmi/event_types.h"
 #include "ipmi/sensor_types.h"
 #include "plugins/standard/classes.h"
+#include "plugins/standard/enterprise_names.h"
 
 namespace standard {
 
@@ -116,7 +119,21 @@ void WriteSensor(const Event& event, Output& output) {
     }
 }
 
+// The names of manufacturers, each looked up once.
+class Manufacturers {
+public:
+    const std::string& NameOf(std::uint32_t number) {
+        const auto [name, isNew] = names_.try_emplace(number);
+        if (isNew) name->second = EnterpriseName(number);
+        return name->second;
+    }
+
+private:
+    std::map<std::uint32_t, std::string> names_;
+};
+
 void WriteEvents(NodePass& pass, Output& output) {
+    Manufacturers manufacturers;
     const std::vector<Event>& events = pass.Events();
     const bool zoneKnown = pass.node().GetClock().utcOffsetMinutes.has_value();
     for (const Event& event : events) {
@@ -138,6 +155,7 @@ void WriteEvents(NodePass& pass, Output& output) {
         output.Text("MakerData", event.vendorData);
         if (event.record.kind == ipmi::RecordKind::kOemTimestamped) {
             output.Integer("ManufacturerID", event.record.manufacturerId);
+            output.Text("Manufacturer", manufacturers.NameOf(event.record.manufacturerId));
         }
         WritePart(event.part, output);
         if (event.continuationOf) {

@@ -280,5 +280,87 @@ TEST(EnterpriseName, IsFoundByItsNumberAlone) {
     EXPECT_EQ(EnterpriseName(1, file + "x"), "");
 }
 
+// An event of the temperature of kServer, one of its BIOS, an OEM record, and a supply that is gone.
+constexpr const char* kEvents = R"({"local_time": "20240305130000.000000+000", "bmcs": [{
+  "guid": "00000000000000000000000000000001",
+  "sel": {"utc_offset_minutes": 60, "time": 1709643598, "entries": [
+    "0100 02 b0e5e665 2000 04 01 30 01 57 64 5f",
+    "0200 04 00000020 0100 04 0f 02 ef c0 ff ff",
+    "0300 c1 b1e5e665 d97e00 010203040506",
+    "0400 02 ffffffff 2000 04 08 40 ef 00 ff ff"]},
+  "sdr": {"records": [
+    "0100 51 01 32 20 00 30 03 01 7f 68 01 01 00 00 00 70 3f 00 00 01 00 00 01 00 f6 c0 00 00 00 00 00 00 00 00 64 5f 5a 0f 0a 05 00 00 00 00 00 c7 43505520546d70"]},
+  "sensors": {"30": {"reading": "69", "states": "c0 c8"}}
+}]})";
+
+TEST_F(StandardClasses, AnEventHasWhatIsKnownOfItAndNothingElse) {
+    const auto all = Collect(kEvents, {"IPMI_Event"});
+    ASSERT_EQ(all.size(), 4u);
+    const std::map<std::string, std::string> temperature{
+        {"Key", all[0].at("Key")},
+        {"Node", "1"},
+        {"RecordID", "1"},
+        {"RecordType", "2"},
+        {"Time", "2024-03-05T08:28:16Z"},
+        {"TimeKind", "clock"},
+        {"TimeZoneKnown", "true"},
+        {"CorrectedTime", "2024-03-05T09:28:18Z"},
+        {"Severity", "warning"},
+        {"SeverityFrom", "standard"},
+        {"State", "open"},
+        {"StillPresent", "true"},
+        {"Direction", "asserted"},
+        {"Generator", "controller 20h, LUN 0, channel 0"},
+        {"Sensor", "CPU Tmp"},
+        {"SensorNumber", "48"},
+        {"SensorType", "Temperature"},
+        {"SensorTypeCode", "1"},
+        {"EventType", "Threshold"},
+        {"EventTypeCode", "1"},
+        {"Offset", "7"},
+        {"Entity", "Processor"},
+        {"EntityID", "3"},
+        {"EntityInstance", "1"},
+        {"Text", "above the upper non-critical threshold"},
+        {"Reading", "90"},
+        {"Threshold", "85"},
+        {"Unit", all[0].at("Unit")},
+        {"Part", "Processor 1"},
+        {"PartCertain", all[0].at("PartCertain")},
+        {"Sentence", "Processor 1, CPU Tmp: above the upper non-critical threshold (reading 90 " +
+                         all[0].at("Unit") + ", threshold 85 " + all[0].at("Unit") + ")"},
+        {"Raw", "010002b0e5e66520000401300157645f"}};
+    EXPECT_EQ(all[0], temperature);
+
+    EXPECT_EQ(all[1].at("NonStandardRecord"), "true");
+    EXPECT_EQ(all[1].at("TimeKind"), "since start");
+    EXPECT_EQ(all[1].at("SecondsSinceStart"), "536870912");
+    EXPECT_EQ(all[1].at("Direction"), "deasserted");
+    EXPECT_EQ(all[1].count("Time") + all[1].count("Sensor") + all[1].count("State"), 0u);
+
+    EXPECT_EQ(all[2].at("ManufacturerID"), "32473");
+    EXPECT_EQ(all[2].at("MakerData"), "010203040506");
+    EXPECT_EQ(all[2].count("Severity") + all[2].count("Direction") + all[2].count("Offset"), 0u);
+
+    EXPECT_EQ(all[3].at("TimeKind"), "none");
+    EXPECT_EQ(all[3].at("State"), "open");
+}
+
+TEST_F(StandardClasses, AFindingNamesItsEventsAndWhatItIsConcludedFrom) {
+    const auto events = Collect(kEvents, {"IPMI_Event"});
+    const auto all = Collect(kEvents, {"IPMI_Finding"});
+    ASSERT_EQ(all.size(), 2u);
+    EXPECT_EQ(all[0].at("Severity"), "warning");
+    EXPECT_EQ(all[0].at("State"), "open");
+    EXPECT_EQ(all[0].at("Events"), "[" + events[0].at("Key") + "]");
+    EXPECT_EQ(all[0].at("FirstCause"), events[0].at("Key"));
+    EXPECT_EQ(all[0].at("FirstTime"), events[0].at("Time"));
+    EXPECT_EQ(all[0].at("Count"), "1");
+    EXPECT_EQ(all[0].at("StillPresent"), "true");
+    EXPECT_THAT(all[0].at("Evidence"), HasSubstr("CPU Tmp reads 95 "));
+    EXPECT_EQ(all[1].at("Title"), "Power Supply sensor 40h: no longer: power supply present");
+    EXPECT_EQ(all[1].count("FirstTime") + all[1].count("StillPresent"), 0u);
+}
+
 }  // namespace
 }  // namespace standard
