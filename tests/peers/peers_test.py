@@ -94,10 +94,13 @@ class SideBySide(unittest.TestCase):
                 return subprocess.run(["timeout", "60", *command], capture_output=True, check=True,
                                       text=True, errors="replace", env=environment).stdout
             with tempfile.TemporaryDirectory() as folder:
-                cls.ours = [instance["properties"] for instance in json.loads(
+                instances = json.loads(
                     run(str(PROGRAM), "collect", "--from", f"lan:127.0.0.1:{port}", "--user",
                         "root", "--workaround", "opensesspriv", "--format", "json", "--class",
-                        "QORSG_IPMILogRecord"))["instances"]]
+                        "QORSG_IPMILogRecord", "--class", "IPMI_Event"))["instances"]
+                cls.ours, cls.standard = (
+                    [instance["properties"] for instance in instances if instance["class"] == name]
+                    for name in ("QORSG_IPMILogRecord", "IPMI_Event"))
                 cls.tool = list(csv.reader(
                     run("ipmitool", "-I", "lanplus", "-C", "3", "-H", "127.0.0.1", "-p", str(port),
                         "-U", "root", "-P", "secret", "-c", "sel", "elist").splitlines()))
@@ -139,6 +142,55 @@ class SideBySide(unittest.TestCase):
                 # ipmitool has the unit once, after the threshold
                 units = {other[1] for other in theirs} - {""}
                 self.assertEqual(units | {unit, limit_unit}, {unit.lower()})
+
+    def test_the_standards_reading_has_words_wherever_a_peer_has(self):
+        for event, ours, tool, free in zip(self.events, self.standard, self.tool, self.free):
+            with self.subTest(event=event, ours=ours, tool=tool, free=free):
+                theirs = re.sub(r" ; .*|^Event Offset = .*", "", free[6])
+                if {tool[4].strip(), theirs} - {"", "reserved", "Unspecified"}:
+                    self.assertNotIn("not defined by IPMI", ours["Text"])
+                self.assertEqual(ours["Sensor"], self.names[event[1] - 1])
+                self.assertIn(ours["Direction"].title(), tool)
+
+    def test_the_standards_reading_converts_as_they_do(self):
+        for event, ours, tool, free in zip(self.events, self.standard, self.tool, self.free):
+            if event[2] & 0x7F != THRESHOLD:
+                continue
+            with self.subTest(event=event, ours=ours, tool=tool, free=free):
+                for text, pattern in (tool[6], "%s"), (free[6], "(?:Sensor )?%s ="):
+                    theirs = readings(text, pattern % "Reading", pattern % "Threshold")
+                    for mine, other in zip((ours["Reading"], ours["Threshold"]), theirs):
+                        self.assertAlmostEqual(mine, other[0], delta=0.006)
+
+    def test_severities_differ_from_ipmi_sel_where_their_page_says_so(self):
+        page, event_type, sensor_type = {}, 0, 0
+        for line in (SOURCE / "docs/severities.md").read_text().splitlines():
+            if line.startswith("## "):
+                event_type = re.search(r"event type (..)h", line)
+                sensor_type = re.search(r"sensor type (..)h", line)
+            elif re.match(r"\| \d", line):
+                cells = [cell.strip() for cell in line.strip("|").split("|")]
+                key = (int(event_type[1], 16), int(sensor_type[1], 16) if sensor_type else 0,
+                       int(cells[0]))
+                page[key] = cells[2], cells[5], cells[6]
+        same = {"information": "nominal", "ok": "nominal", "warning": "warning",
+                "critical": "critical", "fatal": "critical", "none": "-"}
+        seen = 0
+        for event, ours, free in zip(self.events, self.standard, self.free):
+            specific = event[2] == SENSOR_SPECIFIC
+            if event[2] & DEASSERTION or not (specific or event[2] == THRESHOLD):
+                continue
+            row = page.get((event[2], event[0] if specific else 0, event[3] & 15))
+            state = free[5].lower().replace("n/a", "-")
+            with self.subTest(event=event, ours=ours, free=free, row=row):
+                if row is None:
+                    self.assertNotIn("Severity", ours)
+                    continue
+                seen += 1
+                self.assertEqual(ours.get("Severity", "none"), row[0])
+                self.assertEqual(state, row[1])
+                self.assertEqual(same[row[0]] == state and row[0] != "fatal", not row[2])
+        self.assertEqual(seen, 204 + 12 * len(ANALOG))
 
     def test_offsets_mean_the_same(self):
         numbered, said = texts(), {}
