@@ -376,6 +376,7 @@ private:
         const std::uint8_t access = Data2();
         const bool logical = (access & 0x80) != 0;
         if (!logical) SayNumber("private bus ", access & 0x07);
+        SayNumber("LUN ", access >> 3 & 0x03);
         if (!Extends3()) return;
         const std::uint8_t device = Data3();
         if (!logical) {
@@ -387,13 +388,14 @@ private:
     }
 
     void SessionAudit() {
+        constexpr std::uint8_t kDeactivated = 1;
         if (Extends2()) {
             const std::uint8_t user = Data2() & 0x3F;
             if (user != 0) SayNumber("user ID ", user);
         }
         if (Extends3()) {
             const std::uint8_t byte = Data3();
-            Say(At(kDeactivationCauses, byte >> 4 & 0x03));
+            if (record_.offset() == kDeactivated) Say(At(kDeactivationCauses, byte >> 4 & 0x03));
             SayNumber("channel ", Low(byte));
         }
     }
