@@ -170,8 +170,7 @@ private:
         inventory_.problems.push_back(where + ": " + text);
     }
     std::string PastTheEnd(std::size_t at) const {
-        return Format("begins at byte %zu, past the end of the device's %zu bytes", at,
-                      bytes_.size());
+        return Format("begins at byte %zu, past the end (%zu bytes)", at, bytes_.size());
     }
     bool Blank() const {
         return std::all_of(bytes_.begin(), bytes_.end(),
@@ -198,7 +197,7 @@ private:
         }
         const bool whole = length <= area.size();
         if (!whole) {
-            Problem(name, Format("runs past the end of the device's %zu bytes", bytes_.size()));
+            Problem(name, Format("runs past the end (%zu bytes)", bytes_.size()));
         }
         area = area.first(std::min(length, area.size()));
         const bool sound = whole && AddsUpToZero(area);
@@ -303,7 +302,7 @@ private:
         Bytes data = bytes_.subspan(*at + kRecordHeader);
         const std::size_t length = header[2];
         if (length > data.size()) {
-            Problem(name, Format("runs past the end of the device's %zu bytes", bytes_.size()));
+            Problem(name, Format("runs past the end (%zu bytes)", bytes_.size()));
             *at = bytes_.size();
             return false;
         }

@@ -150,12 +150,12 @@ std::optional<unsigned> Bcd(std::uint8_t byte) {
     return (byte >> 4) * 10 + (byte & 0x0F);
 }
 
-std::string DateText(Bytes field) {
+std::optional<YearWeek> ReadDate(Bytes field) {
     constexpr unsigned kCentury = 2000;  // the oldest kind is of 2003
     const auto year = Bcd(field[0]);
     const auto week = Bcd(field[1]);
-    if (!year || !week || *week < 1 || *week > 53) return {};
-    return ipmisel::Format("%u-W%02u", kCentury + *year, *week);
+    if (!year || !week || *week < 1 || *week > 53) return std::nullopt;
+    return YearWeek{kCentury + *year, *week};
 }
 
 }  // namespace
@@ -167,6 +167,10 @@ std::optional<SpdKind> RecognizeSpd(Bytes bytes) {
     });
     if (layout == kLayouts.end() || !layout->sizesFit(bytes)) return std::nullopt;
     return layout->kind;
+}
+
+std::string YearWeekText(const YearWeek& when) {
+    return ipmisel::Format("%u-W%02u", when.year, when.week);
 }
 
 std::optional<bool> SpdChecksumMatches(SpdKind kind, Bytes bytes) {
@@ -214,7 +218,7 @@ std::optional<MemoryModule> ReadSpd(Bytes bytes) {
         module.serialNumber =
             ipmisel::Format("%02X%02X%02X%02X", serial[0], serial[1], serial[2], serial[3]);
     }
-    if (!IsBlank(identity->manufactured)) module.manufactured = DateText(identity->manufactured);
+    if (!IsBlank(identity->manufactured)) module.manufactured = ReadDate(identity->manufactured);
     return module;
 }
 

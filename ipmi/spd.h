@@ -41,14 +41,22 @@ struct SpdIdentity {
 /// Empty when the bytes end within it.
 std::optional<SpdIdentity> ReadSpdIdentity(SpdKind kind, std::span<const std::uint8_t> bytes);
 
+/// A week of a year, counted from 1.
+struct YearWeek {
+    unsigned year = 0;
+    unsigned week = 0;
+};
+/// "2012-W34".
+std::string YearWeekText(const YearWeek& when);
+
 /// A memory module as far as its data say. An empty text is not known.
 struct MemoryModule {
     std::string type;                      ///< "DDR3"
     std::optional<std::uint32_t> sizeMiB;  ///< of all ranks, without the bits for error correction
     std::string manufacturer;
     std::string partNumber;
-    std::string serialNumber;           ///< eight hexadecimal digits
-    std::string manufactured;           ///< year and week: "2012-W34"
+    std::string serialNumber;  ///< eight hexadecimal digits
+    std::optional<YearWeek> manufactured;
     std::vector<std::string> problems;  ///< a checksum that is wrong, an image that is cut
 };
 

@@ -5,6 +5,18 @@
 
 namespace standard {
 
+std::string PartText(const Part& part) {
+    std::string text = part.name;
+    const auto add = [&](const char* what, const std::string& value) {
+        if (value.empty()) return;
+        if (!text.empty()) text += ", ";
+        text += what + value;
+    };
+    add("part number ", part.partNumber);
+    add("serial number ", part.serialNumber);
+    return text;
+}
+
 PartEvidence EntityParts::OfEvent(const Event& event) const {
     const SensorFacts* const facts = event.agreeingSensor();
     return facts == nullptr ? PartEvidence() : OfSensor(facts->sensor);

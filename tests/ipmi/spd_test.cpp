@@ -49,7 +49,7 @@ TEST(Spd, ReadsIdentityAndDateOfEachKind) {
     EXPECT_EQ(second->manufacturer, "Ramaxel Technology");
     EXPECT_EQ(second->partNumber, "RML1520");
     EXPECT_EQ(second->serialNumber, "01020304");
-    EXPECT_EQ(second->manufactured, "2008-W52");
+    EXPECT_EQ(YearWeekText(*second->manufactured), "2008-W52");
 
     Image ddr3 = Ddr3Image();
     ddr3[120] = 0x12;
@@ -60,7 +60,7 @@ TEST(Spd, ReadsIdentityAndDateOfEachKind) {
     EXPECT_EQ(third->manufacturer, "Micron Technology");
     EXPECT_EQ(third->partNumber, "18JSF1G72PZ-1G6");
     EXPECT_EQ(third->serialNumber, "A1B2C3D4");
-    EXPECT_EQ(third->manufactured, "2012-W34");
+    EXPECT_EQ(YearWeekText(*third->manufactured), "2012-W34");
 
     const auto fourth = ReadSpd(WholeDdr4());
     ASSERT_TRUE(fourth);
@@ -68,7 +68,7 @@ TEST(Spd, ReadsIdentityAndDateOfEachKind) {
     EXPECT_EQ(fourth->manufacturer, "Hynix Semiconductor (Hyundai Electronics)");
     EXPECT_EQ(fourth->partNumber, "HMA82GR7AFR4N-UH");
     EXPECT_EQ(fourth->serialNumber, "A0A1A2A3");
-    EXPECT_EQ(fourth->manufactured, "2017-W09");
+    EXPECT_EQ(YearWeekText(*fourth->manufactured), "2017-W09");
     EXPECT_THAT(fourth->problems, IsEmpty());
 }
 
@@ -134,15 +134,18 @@ TEST(Spd, WhatIsNotProgrammedIsLeftOut) {
         {325, Image(4, 0xFF), &MemoryModule::serialNumber},
         {329, Image(20, 0xFF), &MemoryModule::partNumber},
         {329, Image(20, ' '), &MemoryModule::partNumber},
-        {323, {0x00, 0x00}, &MemoryModule::manufactured},
-        {323, {0x17, 0x54}, &MemoryModule::manufactured},
-        {323, {0x1A, 0x09}, &MemoryModule::manufactured},
         {320, {0x07, 0x01}, &MemoryModule::manufacturer},
     };
     for (const auto& c : cases) {
         Image image = WholeDdr4();
         std::copy(c.bytes.begin(), c.bytes.end(), image.begin() + static_cast<long>(c.at));
         EXPECT_EQ((*ReadSpd(image)).*c.field, "") << c.at << " " << int{c.bytes[0]};
+    }
+    for (const auto& [year, week] : {std::pair{0x00, 0x00}, {0x17, 0x54}, {0x1A, 0x09}}) {
+        Image image = WholeDdr4();
+        image[323] = static_cast<std::uint8_t>(year);
+        image[324] = static_cast<std::uint8_t>(week);
+        EXPECT_FALSE(ReadSpd(image)->manufactured) << year << " " << week;
     }
 }
 

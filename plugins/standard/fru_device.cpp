@@ -1,0 +1,164 @@
+#include "plugins/standard/fru_device.h"
+
+#include <algorithm>
+#include <string_view>
+#include <utility>
+#include <variant>
+
+#include "base/text.h"
+#include "ipmi/fru_device_reader.h"
+
+namespace standard {
+namespace {
+
+using ipmisel::Format;
+
+/// A text of one character throughout, which stands where nobody has written anything.
+bool IsFiller(std::string_view text) {
+    constexpr std::string_view kFillers = "0._-*#?xX";
+    return !text.empty() && kFillers.find(text[0]) != std::string_view::npos &&
+           text.find_first_not_of(text[0]) == std::string_view::npos;
+}
+
+/// The first of the texts that says something.
+std::string First(const std::string& one, const std::string& other) {
+    if (!one.empty() && !IsFiller(one)) return one;
+    return IsFiller(other) ? std::string() : other;
+}
+
+std::string CodeText(const std::optional<Answer>& answer) {
+    return answer ? Format("completion code %02xh", answer->completionCode) : "no answer";
+}
+
+/// A device and the LUN of its commands.
+struct Place {
+    FruDevice device;
+    std::uint8_t lun = ipmi::kBmcLun;
+};
+
+std::vector<Place> FindDevices(const std::vector<ipmi::SdrRecord>& repository) {
+    constexpr std::uint8_t kNoDevice = 0xFF;
+    std::vector<Place> places(1);
+    // The controller's own inventory is that of the entity which its locator names.
+    for (const ipmi::SdrRecord& record : repository) {
+        const auto* const locator = std::get_if<ipmi::ControllerLocator>(&record.body);
+        if (locator == nullptr || locator->slaveAddress != ipmi::kBmcAddress) continue;
+        places[0].device.entities.emplace_back(locator->entity, locator->slaveAddress,
+                                               locator->channel);
+    }
+    for (const ipmi::SdrRecord& record : repository) {
+        const auto* const locator = std::get_if<ipmi::FruLocator>(&record.body);
+        if (locator == nullptr || !locator->isLogical || locator->deviceId == kNoDevice) continue;
+        auto place = std::find_if(places.begin(), places.end(), [&](const Place& known) {
+            return known.device.deviceId == locator->deviceId &&
+                   known.device.controllerAddress == locator->accessAddress;
+        });
+        if (place == places.end()) {
+            place = places.emplace(places.end());
+            place->device.deviceId = locator->deviceId;
+            place->device.controllerAddress = locator->accessAddress;
+        }
+        if (place->device.name.empty()) place->device.name = locator->name;
+        place->lun = locator->lun;
+        const EntityKey entity(locator->entity, locator->accessAddress, locator->channel);
+        auto& entities = place->device.entities;
+        // What a locator says of device 0 is nearer than what the controller's own one does.
+        if (place == places.begin()) std::erase(entities, entity);
+        if (std::find(entities.begin(), entities.end(), entity) == entities.end()) {
+            entities.insert(place == places.begin() ? entities.begin() : entities.end(), entity);
+        }
+    }
+    return places;
+}
+
+void Decode(FruDevice* device, const std::vector<std::uint8_t>& bytes) {
+    device->module = ipmi::ReadSpd(bytes);
+    if (!device->module) device->inventory = ipmi::ReadFruInventory(bytes);
+    const auto& problems = device->module ? device->module->problems : device->inventory->problems;
+    device->problems.insert(device->problems.end(), problems.begin(), problems.end());
+}
+
+/// Reads a device; false when it is not there.
+bool Read(Controller& controller, Place* place) {
+    const auto atLun = [&](ipmi::Command command) {
+        command.lun = place->lun;
+        return command;
+    };
+    FruDevice& device = place->device;
+    const auto answer = controller.Send(atLun(ipmi::GetFruInventoryAreaInfo(device.deviceId)));
+    if (answer && (answer->completionCode == ipmi::kNotPresent ||
+                   answer->completionCode == ipmi::kInvalidCommand)) {
+        return false;
+    }
+    const auto info = answer && answer->Completed() ? ipmi::ParseFruAreaInfo(answer->data)
+                                                    : std::optional<ipmi::FruAreaInfo>();
+    if (!info) {
+        device.problems.push_back("Get FRU Inventory Area Info: " + (answer && answer->Completed()
+                                                                         ? "a short answer"
+                                                                         : CodeText(answer)));
+        return true;
+    }
+    ipmi::FruDeviceReader reader(device.deviceId, *info);
+    std::optional<Answer> last;
+    while (const auto command = reader.NextRequest()) {
+        last = controller.Send(atLun(*command));
+        if (!last) break;
+        reader.TakeAnswer(last->completionCode, last->data);
+    }
+    const std::size_t read = reader.bytes().size();
+    if (!reader.complete()) {
+        // An absent device may well have a size: what stands in its place gives it.
+        if (read == 0 && last && last->completionCode == ipmi::kNotPresent) return false;
+        device.problems.push_back(
+            Format("%zu of %u bytes could be read: ", read, unsigned{info->size}) +
+            (last && last->Completed() ? "a short answer" : CodeText(last)));
+        if (read == 0) return true;
+    }
+    Decode(&device, reader.bytes());
+    return true;
+}
+
+}  // namespace
+
+std::string FruDevice::Manufacturer() const {
+    if (module) return module->manufacturer;
+    if (!inventory) return {};
+    return First(inventory->product ? inventory->product->manufacturer : "",
+                 inventory->board ? inventory->board->manufacturer : "");
+}
+
+std::string FruDevice::Product() const {
+    if (!inventory) return {};
+    return First(inventory->product ? inventory->product->name : "",
+                 inventory->board ? inventory->board->product : "");
+}
+
+std::string FruDevice::PartNumber() const {
+    if (module) return module->partNumber;
+    if (!inventory) return {};
+    return First(inventory->product ? inventory->product->partNumber : "",
+                 inventory->board ? inventory->board->partNumber : "");
+}
+
+std::string FruDevice::SerialNumber() const {
+    if (module) return module->serialNumber;
+    if (!inventory) return {};
+    return First(inventory->product ? inventory->product->serialNumber : "",
+                 inventory->board ? inventory->board->serialNumber : "");
+}
+
+std::vector<FruDevice> ReadFruDevices(Controller& controller,
+                                      const std::vector<ipmi::SdrRecord>& repository) {
+    std::vector<FruDevice> devices;
+    for (Place& place : FindDevices(repository)) {
+        const bool here = place.device.controllerAddress == ipmi::kBmcAddress;
+        if (!here) {
+            place.device.problems.push_back(
+                Format("behind the controller at %02xh: not read", place.device.controllerAddress));
+        }
+        if (!here || Read(controller, &place)) devices.push_back(std::move(place.device));
+    }
+    return devices;
+}
+
+}  // namespace standard
