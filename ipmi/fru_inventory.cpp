@@ -56,15 +56,14 @@ std::string HexNumber(Bytes bytes) { return bytes.empty() ? "" : "0x" + ipmisel:
 class FieldReader {
 public:
     /// `fields` is what stands between the area's fixed part and its checksum.
-    FieldReader(const char* area, Bytes fields, std::uint8_t language,
-                std::vector<std::string>* problems)
-        : area_(area), rest_(fields), language_(language), problems_(problems) {}
+    FieldReader(const char* area, Bytes fields, std::uint8_t language)
+        : area_(area), rest_(fields), language_(language) {}
 
     /// The next field; `name` is what it is called where the fields end before it.
     std::string Next(const char* name) {
         std::string text;
         if (!Read(&text)) {
-            if (!missing_ && !broken_) Problem(Format("fields end before the %s", name));
+            if (!missing_ && marked_) Problem(Format("fields end before the %s", name));
             missing_ = true;
         }
         return text;
@@ -77,6 +76,9 @@ public:
         }
         return fields;
     }
+    /// Whether what was read cannot be a list of fields.
+    bool broken() const { return broken_; }
+    const std::vector<std::string>& problems() const { return problems_; }
 
 private:
     bool Read(std::string* text) {
@@ -88,7 +90,7 @@ private:
             return false;
         }
         if (rest_[0] == kEndOfFields) {
-            ended_ = true;
+            ended_ = marked_ = true;
             return false;
         }
         const std::uint8_t typeLength = rest_[0];
@@ -111,6 +113,7 @@ private:
             case TextEncoding::kBcdPlus:
                 if (IsBcdPlus(bytes)) return WithoutPadding(DecodeBcdPlus(bytes, all));
                 Problem(Format("field %u is no BCD plus", number_));
+                broken_ = true;
                 return HexNumber(bytes);
             case TextEncoding::kSixBit:
                 return WithoutPadding(DecodeSixBit(bytes, all));
@@ -120,17 +123,16 @@ private:
         return WithoutPadding(IsEnglish(language_) ? DecodeLatin1(bytes) : DecodeUtf16(bytes));
     }
 
-    void Problem(const std::string& text) {
-        problems_->push_back(std::string(area_) + ": " + text);
-    }
+    void Problem(const std::string& text) { problems_.push_back(std::string(area_) + ": " + text); }
 
     const char* area_;
     Bytes rest_;
     std::uint8_t language_;
-    std::vector<std::string>* problems_;
+    std::vector<std::string> problems_;
     unsigned number_ = 0;
     bool ended_ = false;
-    bool broken_ = false;   ///< ended without its mark
+    bool marked_ = false;  ///< by the end mark
+    bool broken_ = false;
     bool missing_ = false;  ///< has told of the first field that is not there
 };
 
@@ -138,7 +140,8 @@ private:
 
 class InventoryReader {
 public:
-    explicit InventoryReader(Bytes bytes) : bytes_(bytes) {}
+    InventoryReader(Bytes bytes, std::size_t size)
+        : bytes_(bytes), size_(std::max(size, bytes.size())) {}
 
     FruInventory Read() {
         if (bytes_.size() < kHeaderLength) {
@@ -153,6 +156,7 @@ public:
             return std::move(inventory_);
         }
         trusted_ = AddsUpToZero(header);
+        inventory_.sound = trusted_;
         if (!trusted_) Problem("header", "checksum is wrong");
         if (const std::size_t at = header[1] * kUnit; at >= bytes_.size()) {
             Problem("internal use area", PastTheEnd(at));
@@ -177,72 +181,90 @@ private:
                            [&](std::uint8_t byte) { return byte == bytes_[0]; });
     }
 
-    /// The area that begins at `begin`, with its checksum; empty when there is none that can be
-    /// read. `fixed` is the length of what stands before its fields.
-    Bytes Area(const char* name, std::size_t begin, std::size_t fixed) {
-        if (begin == 0) return {};
+    /// Where an area was found.
+    struct Area {
+        const char* name;
+        Bytes bytes;  ///< as far as they could be had
+        bool whole;
+        bool sound;  ///< whole, with the right checksum
+
+        /// All between the fixed part and, where the area is whole, its checksum.
+        FieldReader Fields(std::size_t fixed, std::uint8_t language) const {
+            return {name, bytes.subspan(fixed, bytes.size() - fixed - (whole ? 1 : 0)), language};
+        }
+    };
+
+    /// The area that begins at `begin`; empty when there is none that can be read. `fixed` is the
+    /// length of what stands before its fields.
+    std::optional<Area> FindArea(const char* name, std::size_t begin, std::size_t fixed) {
+        if (begin == 0) return std::nullopt;
         if (begin >= bytes_.size()) {
             Problem(name, PastTheEnd(begin));
-            return {};
+            return std::nullopt;
         }
-        Bytes area = bytes_.subspan(begin);
-        if ((area[0] & kFormatVersionBits) != kFormatVersion) {
-            Problem(name, Format("format version is %u, not 1", area[0] & kFormatVersionBits));
-            return {};
+        const Bytes rest = bytes_.subspan(begin);
+        if ((rest[0] & kFormatVersionBits) != kFormatVersion) {
+            Problem(name, Format("format version is %u, not 1", rest[0] & kFormatVersionBits));
+            return std::nullopt;
         }
-        const std::size_t length = area.size() > 1 ? area[1] * kUnit : 0;
+        const std::size_t length = rest.size() > 1 ? rest[1] * kUnit : 0;
         if (length == 0) {
-            Problem(name, area.size() > 1 ? "length is 0" : "is cut after its first byte");
-            return {};
+            Problem(name, rest.size() > 1 ? "length is 0" : "is cut after its first byte");
+            return std::nullopt;
         }
-        const bool whole = length <= area.size();
-        if (!whole) {
-            Problem(name, Format("runs past the end (%zu bytes)", bytes_.size()));
-        }
-        area = area.first(std::min(length, area.size()));
-        const bool sound = whole && AddsUpToZero(area);
+        const bool whole = length <= rest.size();
+        if (!whole) Problem(name, Format("runs past the end (%zu bytes)", bytes_.size()));
+        const Bytes bytes = rest.first(std::min(length, rest.size()));
+        const bool sound = whole && AddsUpToZero(bytes);
         if (whole && !sound) Problem(name, "checksum is wrong");
+        inventory_.sound = inventory_.sound && sound;
         // What a damaged header points at is only taken when it proves itself.
-        if (!trusted_ && !sound) return {};
-        if (area.size() < fixed + 1) {
+        if (!trusted_ && !sound) return std::nullopt;
+        if (bytes.size() < fixed + 1) {
             Problem(name, "is too short");
-            return {};
+            return std::nullopt;
         }
         extents_.push_back({name, begin, begin + length});
-        return area;
+        return Area{name, bytes, whole, sound};
     }
 
-    /// The fields of an area: all between its fixed part and, where it is whole, its checksum.
-    FieldReader Fields(const char* name, Bytes area, std::size_t fixed, std::uint8_t language) {
-        const bool whole = area.size() == area[1] * kUnit;
-        return {name, area.subspan(fixed, area.size() - fixed - (whole ? 1 : 0)), language,
-                &inventory_.problems};
+    /// Whether the fields are those of an area. What could not be had of the device is not held
+    /// against them.
+    bool Accept(const Area& area, const FieldReader& fields) {
+        const bool cut = !area.whole && bytes_.size() < size_;
+        if (fields.broken() && !area.sound && !cut) {
+            Problem(area.name, "its fields are not read, they are damaged too");
+            return false;
+        }
+        auto& problems = inventory_.problems;
+        problems.insert(problems.end(), fields.problems().begin(), fields.problems().end());
+        return true;
     }
 
     void ReadChassis(std::size_t begin) {  // 10
         constexpr const char* kName = "chassis area";
         constexpr std::size_t kFixed = 3;
-        const Bytes area = Area(kName, begin, kFixed);
-        if (area.empty()) return;
+        const auto area = FindArea(kName, begin, kFixed);
+        if (!area) return;
         constexpr std::uint8_t kEnglish = 0;  // the area names no language
-        FieldReader fields = Fields(kName, area, kFixed, kEnglish);
+        FieldReader fields = area->Fields(kFixed, kEnglish);
         FruChassis chassis;
-        chassis.type = area[2];
+        chassis.type = area->bytes[2];
         chassis.partNumber = fields.Next("part number");
         chassis.serialNumber = fields.Next("serial number");
         chassis.custom = fields.Rest();
-        inventory_.chassis = std::move(chassis);
+        if (Accept(*area, fields)) inventory_.chassis = std::move(chassis);
     }
 
     void ReadBoard(std::size_t begin) {  // 11
         constexpr const char* kName = "board area";
         constexpr std::size_t kFixed = 6;
         constexpr std::int64_t kStart = 820454400;  // 1996-01-01
-        const Bytes area = Area(kName, begin, kFixed);
-        if (area.empty()) return;
-        FieldReader fields = Fields(kName, area, kFixed, area[2]);
+        const auto area = FindArea(kName, begin, kFixed);
+        if (!area) return;
+        FieldReader fields = area->Fields(kFixed, area->bytes[2]);
         FruBoard board;
-        const std::int64_t minutes = area[3] | area[4] << 8 | area[5] << 16;
+        const std::int64_t minutes = area->bytes[3] | area->bytes[4] << 8 | area->bytes[5] << 16;
         if (minutes != 0) board.manufactured = kStart + minutes * 60;
         board.manufacturer = fields.Next("manufacturer");
         board.product = fields.Next("product name");
@@ -250,15 +272,15 @@ private:
         board.partNumber = fields.Next("part number");
         board.fruFile = fields.Next("FRU file ID");
         board.custom = fields.Rest();
-        inventory_.board = std::move(board);
+        if (Accept(*area, fields)) inventory_.board = std::move(board);
     }
 
     void ReadProduct(std::size_t begin) {  // 12
         constexpr const char* kName = "product area";
         constexpr std::size_t kFixed = 3;
-        const Bytes area = Area(kName, begin, kFixed);
-        if (area.empty()) return;
-        FieldReader fields = Fields(kName, area, kFixed, area[2]);
+        const auto area = FindArea(kName, begin, kFixed);
+        if (!area) return;
+        FieldReader fields = area->Fields(kFixed, area->bytes[2]);
         FruProduct product;
         product.manufacturer = fields.Next("manufacturer");
         product.name = fields.Next("product name");
@@ -268,7 +290,7 @@ private:
         product.assetTag = fields.Next("asset tag");
         product.fruFile = fields.Next("FRU file ID");
         product.custom = fields.Rest();
-        inventory_.product = std::move(product);
+        if (Accept(*area, fields)) inventory_.product = std::move(product);
     }
 
     void ReadMultiRecords(std::size_t begin) {  // 16
@@ -342,6 +364,7 @@ private:
     }
 
     Bytes bytes_;
+    std::size_t size_;      ///< of the device
     bool trusted_ = false;  ///< the header's checksum is right
     FruInventory inventory_;
     std::vector<Extent> extents_;
@@ -349,7 +372,9 @@ private:
 
 }  // namespace
 
-FruInventory ReadFruInventory(Bytes bytes) { return InventoryReader(bytes).Read(); }
+FruInventory ReadFruInventory(Bytes bytes, std::size_t size) {
+    return InventoryReader(bytes, size).Read();
+}
 
 std::string ChassisTypeName(std::uint8_t type) {
     constexpr std::array<const char*, 0x25> kNames{"",

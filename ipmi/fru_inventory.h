@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <span>
@@ -61,11 +62,14 @@ struct FruInventory {
     std::optional<FruProduct> product;
     std::vector<FruMultiRecord> multiRecords;
     std::vector<std::string> problems;  ///< what is wrong with the bytes, a line each
+    /// Whether header and areas are whole, with right checksums.
+    bool sound = true;
 };
 
-/// Reads the bytes of a device, all that there are of them. What is damaged is told in the
-/// problems, and what can be had beside it is had; bytes that are no inventory give problems alone.
-FruInventory ReadFruInventory(std::span<const std::uint8_t> bytes);
+/// Reads a device of `size` bytes of which `bytes` could be had. What is damaged is told in the
+/// problems, and what can be had beside it is had. Bytes that are no inventory give problems alone,
+/// and so does an area whose checksum and fields are both wrong: something else stands there.
+FruInventory ReadFruInventory(std::span<const std::uint8_t> bytes, std::size_t size);
 
 /// The name of a chassis type (SMBIOS type 3, DSP0134 7.4.1); empty for one that it does not have.
 std::string ChassisTypeName(std::uint8_t type);

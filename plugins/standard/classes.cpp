@@ -8,8 +8,8 @@ namespace standard {
 namespace {
 
 // In the order in which they are collected.
-const std::array kClasses{&kControllerClass, &kEventLogClass, &kSensorClass, &kEventClass,
-                          &kFindingClass};
+const std::array kClasses{&kControllerClass, &kEventLogClass, &kSensorClass,
+                          &kFruClass,        &kEventClass,    &kFindingClass};
 
 const auto kInfos = [] {
     std::array<NQORTQR20::fdrClassInfo, kClasses.size()> infos{};

@@ -19,8 +19,6 @@ const ClassEntry* FindClass(std::string_view name);
 
 /// Writes Part, PartNumber, SerialNumber and PartCertain, or PartCandidates.
 void WritePart(const PartEvidence& evidence, Output& output);
-/// Name, part number and serial number as far as they are known.
-std::string CandidateText(const Part& part);
 
 // Each stands with the code that writes it.
 extern const ClassEntry kControllerClass;
@@ -28,5 +26,6 @@ extern const ClassEntry kEventLogClass;
 extern const ClassEntry kSensorClass;
 extern const ClassEntry kEventClass;
 extern const ClassEntry kFindingClass;
+extern const ClassEntry kFruClass;
 
 }  // namespace standard

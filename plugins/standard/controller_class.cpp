@@ -61,9 +61,14 @@ void Write(NodePass& pass, Output& output) {
     Node& node = pass.node();
     output.Begin(kName);
     output.Integer("Node", node.number());
-    const GuidReading guid = ReadGuid(node.Guid(), std::nullopt);
+    const auto& system = pass.Smbios().system;
+    const GuidReading guid = ReadGuid(node.Guid(), system ? system->uuid : std::nullopt);
     output.Text("GUID", guid.text);
     output.Text("GUIDOrder", guid.order);
+    const SystemIdentity identity = pass.Identity();
+    output.Text("SystemManufacturer", identity.manufacturer);
+    output.Text("SystemProduct", identity.product);
+    output.Text("SystemSerialNumber", identity.serialNumber);
     if (const auto& id = node.DeviceId()) {
         output.Text("FirmwareVersion", ipmi::FirmwareVersionText(*id));
         output.Text("AuxiliaryRevision", ipmi::AuxiliaryRevisionText(*id));

@@ -169,13 +169,6 @@ void WriteEvents(NodePass& pass, Output& output) {
 
 }  // namespace
 
-std::string CandidateText(const Part& part) {
-    std::string text = part.name;
-    if (!part.partNumber.empty()) text += ", part number " + part.partNumber;
-    if (!part.serialNumber.empty()) text += ", serial number " + part.serialNumber;
-    return text;
-}
-
 void WritePart(const PartEvidence& evidence, Output& output) {
     if (evidence.parts.size() == 1) {
         const Part& part = evidence.parts.front();

@@ -1,6 +1,7 @@
 #include "plugins/standard/fru_device.h"
 
 #include <algorithm>
+#include <span>
 #include <string_view>
 #include <utility>
 #include <variant>
@@ -71,9 +72,9 @@ std::vector<Place> FindDevices(const std::vector<ipmi::SdrRecord>& repository) {
     return places;
 }
 
-void Decode(FruDevice* device, const std::vector<std::uint8_t>& bytes) {
+void Decode(FruDevice* device, const std::vector<std::uint8_t>& bytes, std::size_t size) {
     device->module = ipmi::ReadSpd(bytes);
-    if (!device->module) device->inventory = ipmi::ReadFruInventory(bytes);
+    if (!device->module) device->inventory = ipmi::ReadFruInventory(bytes, size);
     const auto& problems = device->module ? device->module->problems : device->inventory->problems;
     device->problems.insert(device->problems.end(), problems.begin(), problems.end());
 }
@@ -114,7 +115,7 @@ bool Read(Controller& controller, Place* place) {
             (last && last->Completed() ? "a short answer" : CodeText(last)));
         if (read == 0) return true;
     }
-    Decode(&device, reader.bytes());
+    Decode(&device, reader.bytes(), info->size);
     return true;
 }
 
@@ -147,10 +148,27 @@ std::string FruDevice::SerialNumber() const {
                  inventory->board ? inventory->board->serialNumber : "");
 }
 
+bool FruDevice::IsSound() const {
+    return (module && module->problems.empty()) || (inventory && inventory->sound);
+}
+
+std::optional<FruDevice> ReadOwnFruDevice(Controller& controller) {
+    Place place;
+    if (!Read(controller, &place)) return std::nullopt;
+    return std::move(place.device);
+}
+
 std::vector<FruDevice> ReadFruDevices(Controller& controller,
-                                      const std::vector<ipmi::SdrRecord>& repository) {
+                                      const std::vector<ipmi::SdrRecord>& repository,
+                                      const std::optional<FruDevice>& own) {
+    std::vector<Place> places = FindDevices(repository);
     std::vector<FruDevice> devices;
-    for (Place& place : FindDevices(repository)) {
+    if (own) {
+        FruDevice& device = devices.emplace_back(*own);
+        device.name = std::move(places[0].device.name);
+        device.entities = std::move(places[0].device.entities);
+    }
+    for (Place& place : std::span(places).subspan(1)) {
         const bool here = place.device.controllerAddress == ipmi::kBmcAddress;
         if (!here) {
             place.device.problems.push_back(

@@ -44,13 +44,20 @@ struct FruDevice {
     std::string Product() const;
     std::string PartNumber() const;
     std::string SerialNumber() const;
+    /// Whether the checksums of what was read are right.
+    bool IsSound() const;
 };
 
-/// The FRU devices of a controller: device 0, then the logical devices of the locators in their
-/// order. Get FRU Inventory Area Info comes first, then all of the device is read. A device that is
-/// not there, by the controller's own answer, is left out; one behind another controller is listed
-/// and not read, since its number means another device here.
+/// The controller's own FRU device 0, without what a locator tells of it. Get FRU Inventory Area
+/// Info comes first, then all of the device is read. Empty for a device that is not there, by the
+/// controller's own answer.
+std::optional<FruDevice> ReadOwnFruDevice(Controller& controller);
+
+/// The FRU devices of a controller: `own`, as ReadOwnFruDevice had it, then the logical devices of
+/// the locators in their order, read in the same way. One behind another controller is listed and
+/// not read, since its number means another device here.
 std::vector<FruDevice> ReadFruDevices(Controller& controller,
-                                      const std::vector<ipmi::SdrRecord>& repository);
+                                      const std::vector<ipmi::SdrRecord>& repository,
+                                      const std::optional<FruDevice>& own);
 
 }  // namespace standard

@@ -2,17 +2,53 @@
 
 #include <set>
 #include <utility>
+#include <variant>
 
 #include "plugins/standard/event_state.h"
 
 namespace standard {
 
 NodePass::NodePass(unsigned number, std::string systemName, NQORTQR20::SPLibrary& library,
-                   const SeverityRules& rules)
+                   const SeverityRules& rules, SmbiosFacts smbios)
     : node_(number, library),
       systemName_(std::move(systemName)),
       rules_(rules),
-      parts_(std::make_unique<EntityParts>()) {}
+      smbios_(std::move(smbios)) {}
+
+const std::vector<FruDevice>& NodePass::FruDevices() {
+    if (!fruDevices_) {
+        fruDevices_ = ReadFruDevices(node_.controller(), node_.Repository(), OwnFruDevice());
+    }
+    return *fruDevices_;
+}
+
+const std::optional<FruDevice>& NodePass::OwnFruDevice() {
+    if (!ownFruDevice_) ownFruDevice_ = ReadOwnFruDevice(node_.controller());
+    return *ownFruDevice_;
+}
+
+PartEvidence NodePass::PartOf(const ipmi::Sensor& sensor) {
+    if (!sensorParts_) sensorParts_ = MakeParts();
+    return sensorParts_->OfSensor(sensor);
+}
+
+void NodePass::ReadSensors() {
+    if (sensorsRead_) return;
+    for (const ipmi::Sensor& sensor : node_.Sensors()) {
+        facts_.sensors.push_back({.sensor = sensor, .reading = {}, .thresholds = {}});
+    }
+    sensorsRead_ = true;
+}
+
+Parts NodePass::MakeParts() {
+    ReadSensors();
+    PartFacts facts{.devices = FruDevices(), .associations = {}, .smbios = smbios_};
+    for (const ipmi::SdrRecord& record : node_.Repository()) {
+        const auto* const association = std::get_if<ipmi::EntityAssociation>(&record.body);
+        if (association != nullptr) facts.associations.push_back(*association);
+    }
+    return {std::move(facts), facts_};
+}
 
 const std::vector<Event>& NodePass::Events() {
     if (events_) return *events_;
@@ -25,10 +61,11 @@ const std::vector<Event>& NodePass::Events() {
     if (clock.offsetSeconds && clock.uncertaintySeconds) {
         facts_.clock = {.offset = *clock.offsetSeconds, .uncertainty = *clock.uncertaintySeconds};
     }
-    for (const ipmi::Sensor& sensor : node_.Sensors()) {
-        facts_.sensors.push_back({.sensor = sensor, .reading = {}, .thresholds = {}});
-    }
+    ReadSensors();
     if (!facts_.log.empty()) facts_.filters = node_.Filters();
+    parts_ = MakeParts();
+    // What events are known by where there is no GUID.
+    if (!facts_.guid) facts_.serialNumber = Identity().serialNumber;
 
     events_ = DeriveEvents(facts_, Tools());
     std::set<ipmi::SensorKey> open;

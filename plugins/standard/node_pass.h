@@ -1,6 +1,5 @@
 #pragma once
 
-#include <memory>
 #include <optional>
 #include <string>
 #include <vector>
@@ -8,7 +7,11 @@
 #include "plugins/standard/events.h"
 #include "plugins/standard/facts.h"
 #include "plugins/standard/finding.h"
+#include "plugins/standard/fru_device.h"
 #include "plugins/standard/node.h"
+#include "plugins/standard/parts.h"
+#include "plugins/standard/smbios_facts.h"
+#include "plugins/standard/system_identity.h"
 
 namespace standard {
 
@@ -16,26 +19,41 @@ namespace standard {
 /// first wants it.
 class NodePass {
 public:
+    /// `rules` is borrowed; `smbios` is empty where it is not the node's own.
     NodePass(unsigned number, std::string systemName, NQORTQR20::SPLibrary& library,
-             const SeverityRules& rules);
+             const SeverityRules& rules, SmbiosFacts smbios);
     NodePass(const NodePass&) = delete;
     NodePass& operator=(const NodePass&) = delete;
 
     Node& node() { return node_; }
+    const SmbiosFacts& Smbios() const { return smbios_; }
+    const std::vector<FruDevice>& FruDevices();
+    /// Manufacturer, product and serial number of the system.
+    SystemIdentity Identity() { return IdentifySystem(smbios_, OwnFruDevice()); }
+    /// The part of a sensor.
+    PartEvidence PartOf(const ipmi::Sensor& sensor);
     /// The events, with the present readings of the sensors that have open ones.
     const std::vector<Event>& Events();
     /// From the events and the present readings of all sensors.
     const std::vector<Finding>& Findings();
 
 private:
+    const std::optional<FruDevice>& OwnFruDevice();
+    void ReadSensors();
+    Parts MakeParts();
     DerivationTools Tools();
     void ReadSensorOf(SensorFacts* facts);
 
     Node node_;
     std::string systemName_;
     const SeverityRules& rules_;
-    std::unique_ptr<PartLookup> parts_;
+    SmbiosFacts smbios_;
+    std::optional<std::optional<FruDevice>> ownFruDevice_;
+    std::optional<std::vector<FruDevice>> fruDevices_;
+    bool sensorsRead_ = false;
     NodeFacts facts_;
+    std::optional<Parts> sensorParts_;  // without the log
+    std::optional<Parts> parts_;
     std::optional<std::vector<Event>> events_;  // point into facts_
     std::optional<std::vector<Finding>> findings_;
 };

@@ -5,15 +5,10 @@
 
 namespace standard {
 
-std::string PartText(const Part& part) {
+std::string CandidateText(const Part& part) {
     std::string text = part.name;
-    const auto add = [&](const char* what, const std::string& value) {
-        if (value.empty()) return;
-        if (!text.empty()) text += ", ";
-        text += what + value;
-    };
-    add("part number ", part.partNumber);
-    add("serial number ", part.serialNumber);
+    if (!part.partNumber.empty()) text += ", part number " + part.partNumber;
+    if (!part.serialNumber.empty()) text += ", serial number " + part.serialNumber;
     return text;
 }
 

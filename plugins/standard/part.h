@@ -20,7 +20,7 @@ struct Part {
 
 /// Name, part number and serial number as far as known: "DIMM_A1, part number M16G, serial number
 /// 7".
-std::string PartText(const Part& part);
+std::string CandidateText(const Part& part);
 
 /// What the evidence says of the part that an event is about: nothing, one part, or several of
 /// which it is one.

@@ -154,7 +154,7 @@ bool MadeAfter(const std::optional<std::int64_t>& made, const ipmi::SelRecord& r
 
 }  // namespace
 
-Parts::Parts(PartFacts facts, const NodeFacts& node) : facts_(std::move(facts)), node_(node) {
+Parts::Parts(PartFacts facts, const NodeFacts& node) : facts_(std::move(facts)), node_(&node) {
     for (std::size_t i = 0; i < node.log.size(); ++i) {
         placeOf_.emplace(node.log[i].bytes, i);
         if (TellsOfRemoval(node.log[i])) removals_.push_back(i);
@@ -188,7 +188,7 @@ Parts::Found Parts::OfDevices(const std::vector<const FruDevice*>& devices,
     for (const FruDevice* device : devices) {
         found.Add({PartOf(*device, key.entity), device->entities, MadeAt(*device)});
     }
-    found.certain = found.candidates.size() == 1;
+    found.certain = found.candidates.size() == 1 && devices[0]->IsSound();
     return found;
 }
 
@@ -203,7 +203,7 @@ std::optional<Parts::Found> Parts::BySmbios(const EntityKey& key) const {
         return memory ? Labelled(facts_.smbios.memoryDevices, number, SlotOf).size()
                       : Labelled(facts_.smbios.processors, number, SocketOf).size();
     };
-    for (const SensorFacts& sensor : node_.sensors) {
+    for (const SensorFacts& sensor : node_->sensors) {
         const ipmi::Entity& entity = sensor.sensor.entity;
         if (entity.id == key.entity.id && labelled(entity.instance) != 1) return std::nullopt;
     }
@@ -376,12 +376,12 @@ bool Parts::IsGoneSince(const Event& event, const Candidate& candidate) const {
     return std::any_of(std::upper_bound(removals_.begin(), removals_.end(), place->second),
                        removals_.end(), [&](std::size_t at) {
                            Event removal;
-                           removal.record = node_.log[at];
+                           removal.record = node_->log[at];
                            if (removal.sensorKey() == event.sensorKey() &&
                                removal.record.sensorType == event.record.sensorType) {
                                return MayBeOfOnePart(removal.record, event.record);
                            }
-                           const SensorFacts* const facts = node_.FindSensor(removal.sensorKey());
+                           const SensorFacts* const facts = node_->FindSensor(removal.sensorKey());
                            if (facts == nullptr || !ipmi::IsPhysicalEntity(facts->sensor.entity.id))
                                return false;
                            const auto& entities = candidate.entities;

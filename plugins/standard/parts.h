@@ -32,7 +32,7 @@ struct PartFacts {
 /// the part was made, has the part's name and not the numbers of what is there now.
 class Parts : public PartLookup {
 public:
-    /// `node` is borrowed.
+    /// `node` is borrowed; its log is looked at here.
     Parts(PartFacts facts, const NodeFacts& node);
 
     PartEvidence OfEvent(const Event& event) const override;
@@ -57,7 +57,7 @@ private:
     bool IsGoneSince(const Event& event, const Candidate& candidate) const;
 
     PartFacts facts_;
-    const NodeFacts& node_;
+    const NodeFacts* node_;
     std::map<ipmi::SelBytes, std::size_t>
         placeOf_;                        ///< of each record in the log; equals: the first
     std::vector<std::size_t> removals_;  ///< places of records that tell of a removal

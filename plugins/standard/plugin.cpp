@@ -38,13 +38,17 @@ std::vector<std::unique_ptr<NodePass>> Nodes(TCPluginCallbacks* context,
                                              const SeverityRules& rules) {
     std::vector<std::unique_ptr<NodePass>> nodes;
     const int count = NQORTQR20::SPLibrary::GetNumberBMCNode();
+    const NQORTQR20::TPluginManagerProvider* provider = nullptr;
+    NQORTQR20::fdrGetHandle(context, &provider);
+    // The tables of the machine do not say which of several nodes a part belongs to.
+    const SmbiosFacts smbios = count == 1 ? ReadSmbios(provider) : SmbiosFacts();
     for (int i = 0; i < count; ++i) {
         NQORTQR20::SPLibrary* const library = NQORTQR20::SPLibrary::GetSplibraryInstance(i);
         if (library == nullptr) continue;
         const char* name = nullptr;
         NQORTQR20::fdrGetSystemName(context, i, &name);
-        nodes.push_back(std::make_unique<NodePass>(static_cast<unsigned>(i) + 1,
-                                                   name == nullptr ? "" : name, *library, rules));
+        nodes.push_back(std::make_unique<NodePass>(
+            static_cast<unsigned>(i) + 1, name == nullptr ? "" : name, *library, rules, smbios));
     }
     return nodes;
 }

@@ -153,6 +153,8 @@ void Write(NodePass& pass, Output& output) {
             output.Texts("States", StateTexts(sensor, *state.reading));
         }
         output.Text("Status", StatusOf(sensor, state));
+        const PartEvidence part = pass.PartOf(sensor);
+        if (part.parts.size() == 1) output.Text("Part", part.parts.front().name);
         output.End();
     }
 }

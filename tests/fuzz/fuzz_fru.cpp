@@ -28,7 +28,7 @@ void ReadDevice(std::span<const std::uint8_t> bytes) {
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     const std::span<const std::uint8_t> bytes(data, size);
-    for (const auto& record : ipmi::ReadFruInventory(bytes).multiRecords) {
+    for (const auto& record : ipmi::ReadFruInventory(bytes, size).multiRecords) {
         ipmi::MultiRecordText(record);
     }
     ipmi::ReadSpd(bytes);

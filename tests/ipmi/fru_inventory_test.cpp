@@ -18,7 +18,8 @@ using testing::HasSubstr;
 using testing::IsEmpty;
 using testing::StartsWith;
 
-FruInventory Read(const FruImage& image) { return ReadFruInventory(image.Bytes()); }
+FruInventory Read(const FruBytes& image) { return ReadFruInventory(image, image.size()); }
+FruInventory Read(const FruImage& image) { return Read(image.Bytes()); }
 
 /// The board's area with these fields and no others, and what is read of it.
 FruInventory ReadBoard(std::uint8_t language, const std::vector<FruBytes>& fields) {
@@ -139,8 +140,7 @@ TEST(FruInventory, DamageIsToldAndTheRestIsRead) {
         bool chassis, board, product;
         std::size_t multiRecords;
     } cases[] = {
-        {1, 0x40, "internal use area: begins at byte 512, past the end (", true, true,
-         true, 1},
+        {1, 0x40, "internal use area: begins at byte 512, past the end (", true, true, true, 1},
         {2, 0x7F, "chassis area: begins at byte 1016, past the end", false, true, true, 1},
         {5, 0x7F, "multi-record area: begins at byte 1016, past the end", true, true, true, 0},
         {2, 0x00, "", false, true, true, 1},
@@ -151,7 +151,7 @@ TEST(FruInventory, DamageIsToldAndTheRestIsRead) {
         {chassis + 1, 0, "chassis area: length is 0", false, true, true, 1},
         {chassis + 1, 200, "chassis area: runs past the end (", true, true, true, 1},
         {board + 20, 'X', "board area: checksum is wrong", true, true, true, 1},
-        {product + 20, 'X', "product area: checksum is wrong", true, true, true, 1},
+        {product + 4, 'X', "product area: checksum is wrong", true, true, true, 1},
         {records + 5, 0, "multi-record 1: checksum is wrong", true, true, true, 1},
         {records, 0xC1, "multi-record 1: checksum of the header is wrong", true, true, true, 0},
     };
@@ -162,7 +162,7 @@ TEST(FruInventory, DamageIsToldAndTheRestIsRead) {
             image[7] = 0;
             image[7] = ZeroChecksum(FruBytes(image.begin(), image.begin() + 8));
         }
-        const FruInventory inventory = ReadFruInventory(image);
+        const FruInventory inventory = Read(image);
         if (*c.problem != 0) {
             EXPECT_THAT(inventory.problems, Contains(StartsWith(c.problem))) << c.at;
         } else {
@@ -175,12 +175,33 @@ TEST(FruInventory, DamageIsToldAndTheRestIsRead) {
     }
 }
 
+// One whose length or fields lead somewhere else holds no fields at all.
+TEST(FruInventory, AnAreaWhoseChecksumAndFieldsAreWrongIsNotRead) {
+    const FruBytes whole = WholeFruImage().Bytes();
+    for (const std::size_t at : {9, 11}) {  // length of the area, length of its first field
+        FruBytes image = whole;
+        image[at] = 0xFF;
+        const FruInventory inventory = Read(image);
+        EXPECT_FALSE(inventory.chassis && at == 11);
+        EXPECT_TRUE(inventory.board && inventory.product);
+        EXPECT_FALSE(inventory.sound);
+    }
+    FruBytes image(256, 0x41);  // something else, behind a header that fits
+    const FruBytes header{1, 0, 0, 1, 0, 0, 0, 0xFE, 1, 0x25};
+    std::copy(header.begin(), header.end(), image.begin());
+    const FruInventory inventory = Read(image);
+    EXPECT_FALSE(inventory.board);
+    EXPECT_THAT(inventory.problems,
+                ElementsAre("board area: runs past the end (256 bytes)",
+                            "board area: its fields are not read, they are damaged too"));
+}
+
 // Where the header cannot be believed, an area is taken that proves itself by its own checksum.
 TEST(FruInventory, AHeaderWithAWrongChecksumLeavesTheSoundAreas) {
     FruBytes image = WholeFruImage().Bytes();
     image[7] ^= 0x01;
     image[8 + 4] ^= 0x01;  // the chassis area too
-    const FruInventory inventory = ReadFruInventory(image);
+    const FruInventory inventory = Read(image);
     EXPECT_FALSE(inventory.chassis);
     EXPECT_TRUE(inventory.board && inventory.product);
     EXPECT_THAT(inventory.problems,
@@ -199,7 +220,7 @@ TEST(FruInventory, WhatIsNoInventoryHasProblemsAlone) {
         {FruBytes{0x82, 0x08, 0x08, 0, 0, 0, 0, 0}, "header: format version is 2, not 1"},
     };
     for (const auto& c : cases) {
-        const FruInventory inventory = ReadFruInventory(c.image);
+        const FruInventory inventory = Read(c.image);
         EXPECT_THAT(inventory.problems, ElementsAre(c.problem));
         EXPECT_FALSE(inventory.chassis || inventory.board || inventory.product);
     }
@@ -208,7 +229,8 @@ TEST(FruInventory, WhatIsNoInventoryHasProblemsAlone) {
 TEST(FruInventory, AnImageCutAtAnyLengthKeepsWhatIsWhole) {
     const FruBytes whole = WholeFruImage().Bytes();
     for (std::size_t length = 8; length < whole.size(); ++length) {
-        const FruInventory inventory = ReadFruInventory(std::span(whole).first(length));
+        const FruInventory inventory =
+            ReadFruInventory(std::span(whole).first(length), whole.size());
         EXPECT_FALSE(inventory.problems.empty()) << length;
         if (inventory.chassis) {
             EXPECT_THAT("CH-1", StartsWith(inventory.chassis->partNumber)) << length;

@@ -47,7 +47,7 @@ class FruDeviceTest : public BmcTest {
 protected:
     std::vector<FruDevice> Read(const std::vector<ipmi::SdrRecord>& repository) {
         Controller controller(*FreshLibrary());
-        return ReadFruDevices(controller, repository);
+        return ReadFruDevices(controller, repository, ReadOwnFruDevice(controller));
     }
 };
 
@@ -111,7 +111,8 @@ TEST_F(FruDeviceTest, WhatFailsIsToldAndWhatWasReadIsUsed) {
 
 TEST(FruDevice, NumbersToOrderByAreTheProductsElseTheBoards) {
     FruDevice device;
-    device.inventory = ipmi::ReadFruInventory(WholeFruImage().Bytes());
+    const FruBytes image = WholeFruImage().Bytes();
+    device.inventory = ipmi::ReadFruInventory(image, image.size());
     EXPECT_EQ(device.PartNumber(), "P-1");
     EXPECT_EQ(device.SerialNumber(), "SN01");
     EXPECT_EQ(device.Manufacturer(), "Acme Systems");

@@ -54,7 +54,7 @@ FruDevice Device(std::string name, ipmi::Entity entity, const FruBytes& image) {
     device.name = std::move(name);
     device.entities = {EntityKey(entity, 0x20, 0)};
     device.module = ipmi::ReadSpd(image);
-    if (!device.module) device.inventory = ipmi::ReadFruInventory(image);
+    if (!device.module) device.inventory = ipmi::ReadFruInventory(image, image.size());
     return device;
 }
 
@@ -87,8 +87,7 @@ protected:
         node.sensors.clear();
         for (const ipmi::SdrRecord& record : records) {
             for (const ipmi::Sensor& sensor : record.Sensors()) {
-                node.sensors.push_back(
-                    {.sensor = sensor, .reading = {}, .thresholds = {}, .factors = {}});
+                node.sensors.emplace_back().sensor = sensor;
             }
         }
     }
@@ -104,7 +103,7 @@ protected:
     }
     static std::vector<std::string> Texts(const PartEvidence& evidence) {
         std::vector<std::string> texts;
-        for (const Part& part : evidence.parts) texts.push_back(PartText(part));
+        for (const Part& part : evidence.parts) texts.push_back(CandidateText(part));
         return texts;
     }
 };
