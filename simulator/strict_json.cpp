@@ -1,6 +1,7 @@
 #include "simulator/strict_json.h"
 
 #include <algorithm>
+#include <cmath>
 #include <cerrno>
 #include <cstddef>
 #include <cstring>
@@ -170,6 +171,13 @@ std::uint32_t JsonValue::Number(std::uint32_t least, std::uint32_t most) const {
         Refuse("must be " + range + ", not " + value_.dump());
     }
     return value_.get<std::uint32_t>();
+}
+
+double JsonValue::Real() const {
+    if (!value_.is_number()) RefuseKind("a number");
+    const double number = value_.get<double>();
+    if (!std::isfinite(number) || number < 0) Refuse("must be finite and not below 0");
+    return number;
 }
 
 std::int32_t JsonValue::Integer(std::int32_t least, std::int32_t most) const {

@@ -36,6 +36,8 @@ public:
     bool IsNull() const;
     std::string Text() const;
     bool Flag() const;
+    /// Not below 0, and finite.
+    double Real() const;
     std::uint32_t Number(std::uint32_t least, std::uint32_t most) const;
     /// A whole number that may be negative.
     std::int32_t Integer(std::int32_t least, std::int32_t most) const;

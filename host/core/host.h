@@ -13,6 +13,7 @@
 
 #include "host/core/sink.h"
 #include "tqr/classes.h"
+#include "tqr/datetime.h"
 #include "tqr/log.h"
 #include "tqr/plugin.h"
 
@@ -40,6 +41,10 @@ struct Notice {
 using LogConsumer = std::function<void(NQORTQR20::ILogger::ETQRLogSeverity, std::string_view)>;
 
 void SetMachineFacts(MachineFacts facts);
+/// Now by this machine's clock, whatever the facts of the collection say.
+NQORTQR20::TCIMDateTime SystemTime();
+/// The local time of those facts, from now on.
+void SetLocalTime(std::string localTime);
 const MachineFacts& GetMachineFacts();
 
 /// What the user has set for the plug-ins: fdrGetOption and fdrGetSystemName answer from it.

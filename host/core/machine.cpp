@@ -25,6 +25,8 @@ namespace tqrhost {
 
 void SetMachineFacts(MachineFacts facts) { Facts() = std::move(facts); }
 
+void SetLocalTime(std::string localTime) { Facts().localTime = std::move(localTime); }
+
 const MachineFacts& GetMachineFacts() { return Facts(); }
 
 }  // namespace tqrhost
@@ -40,9 +42,17 @@ std::string TOSSpecific::GetMachineTypeFromID() { return Facts().machineType; }
 
 TCIMDateTime TOSSpecific::GetLocalTime() {
     if (Facts().localTime) return TCIMDateTime(Facts().localTime->c_str());
+    return tqrhost::SystemTime();
+}
+
+}  // namespace NQORTQR20
+
+namespace tqrhost {
+
+NQORTQR20::TCIMDateTime SystemTime() {
     timeval now{};
     std::tm local{};
-    TCIMDateTime time;
+    NQORTQR20::TCIMDateTime time;
     if (gettimeofday(&now, nullptr) == 0 && localtime_r(&now.tv_sec, &local) != nullptr) {
         time.Set(
             static_cast<unsigned short>(local.tm_year + 1900),
@@ -54,4 +64,4 @@ TCIMDateTime TOSSpecific::GetLocalTime() {
     return time;
 }
 
-}  // namespace NQORTQR20
+}  // namespace tqrhost

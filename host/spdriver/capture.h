@@ -2,6 +2,7 @@
 
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "host/spdriver/source.h"
 
@@ -18,6 +19,8 @@ public:
 
 /// Wraps the ways to the nodes of a source so that every exchange is appended to the capture file.
 /// Throws SourceError when the file cannot be written.
-std::shared_ptr<CaptureWriter> RecordTo(const std::string& file, Source& source);
+/// `classes` are those that are collected.
+std::shared_ptr<CaptureWriter> RecordTo(const std::string& file, Source& source,
+                                        const std::vector<std::string>& classes = {});
 
 }  // namespace tqrhost

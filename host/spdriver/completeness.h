@@ -19,10 +19,14 @@ struct SourceAccount {
     std::optional<unsigned> announced;  ///< empty when it was not asked, or did not say
     unsigned read = 0;
     bool asked = true;  ///< whether a record of it was
+    /// Instances made of them; empty when no class with one for each record was asked for.
+    std::optional<unsigned> exported = {};
     /// Records that were announced and, though the source was read, did not come.
     unsigned Missing() const {
         return asked && announced && *announced > read ? *announced - read : 0;
     }
+    /// Records that came and did not get into the report.
+    unsigned NotExported() const { return exported && *exported < read ? read - *exported : 0; }
 };
 /// How whole the reading of a node is, as the host saw it go by.
 struct NodeCompleteness {
@@ -30,7 +34,8 @@ struct NodeCompleteness {
     SourceAccount log;
     SourceAccount sensors;
     std::vector<ReadFault> faults;
-    /// Event log and sensor repository were read as far as they were announced, without a fault.
+    /// Event log and sensor repository were read as far as they were announced, without a fault,
+    /// and exported as far as they were read.
     bool Whole() const;
 };
 /// One for each node of the open machine.

@@ -35,7 +35,7 @@ const char* StopText(StopReason reason) {
 bool NodeCompleteness::Whole() const {
     const bool faulty = std::any_of(faults.begin(), faults.end(),
                                     [](const ReadFault& fault) { return fault.ofLogOrSensors; });
-    return !faulty && log.Missing() == 0 && sensors.Missing() == 0;
+    return !faulty && log.Missing() == 0 && log.NotExported() == 0 && sensors.Missing() == 0;
 }
 
 CompletenessTracker::CompletenessTracker(std::unique_ptr<LoopGuard> guard)

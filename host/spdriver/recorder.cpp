@@ -1,7 +1,9 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
+#include <cstdint>
 #include <cstdio>
 #include <cstring>
 #include <memory>
@@ -10,15 +12,17 @@
 #include <span>
 #include <string>
 #include <utility>
+#include <vector>
 
 #include "base/hex.h"
+#include "base/text.h"
 #include "host/spdriver/capture.h"
 #include "tqr/datetime.h"
 
 namespace tqrhost {
 namespace {
 
-std::string FactsLine(const Source& source) {
+std::string FactsLine(const Source& source, const std::vector<std::string>& classes) {
     nlohmann::ordered_json smbios = nlohmann::ordered_json::array();
     for (const auto& structure : source.facts.smbios) smbios.push_back(ipmisel::HexText(structure));
     const nlohmann::ordered_json line = {
@@ -30,6 +34,7 @@ std::string FactsLine(const Source& source) {
         {"local_time", source.facts.localTime.value_or("")},
         {"smbios", smbios},
         {"nodes", source.nodes.size()},
+        {"classes", classes},
     };
     // The machine's own texts need not be UTF-8.
     return line.dump(-1, ' ', false, nlohmann::ordered_json::error_handler_t::replace) + "\n";
@@ -38,9 +43,10 @@ std::string FactsLine(const Source& source) {
 /// The capture file. Every line goes out by itself, so that a run that is cut leaves what it read.
 class CaptureFile : public CaptureWriter {
 public:
-    CaptureFile(const std::string& name, const Source& source) {
+    CaptureFile(const std::string& name, const Source& source,
+                const std::vector<std::string>& classes) {
         // A file that was there before is no one's to remove.
-        int file = open(name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666);
+        int file = open(name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600);
         const bool created = file >= 0;
         if (!created && errno == EEXIST) {
             file = open(name.c_str(), O_WRONLY | O_TRUNC | O_CLOEXEC);
@@ -48,7 +54,7 @@ public:
         if (file >= 0) file_.reset(fdopen(file, "w"));
         if (file_) {
             setvbuf(file_.get(), nullptr, _IOLBF, BUFSIZ);
-            Write(FactsLine(source));
+            Write(FactsLine(source, classes));
         }
         if (file_ && !failed_) return;
         const std::string reason = std::strerror(errno);
@@ -72,41 +78,60 @@ private:
     bool failed_ = false;
 };
 
+/// Writes down what passes. The time that the plug-ins see stands still between two exchanges, so
+/// that a replay can show them the same at Get SEL Time, from which they make the controller's
+/// clock.
 class RecordingTransport : public Transport {
 public:
-    RecordingTransport(std::unique_ptr<Transport> transport, std::size_t node,
+    RecordingTransport(std::unique_ptr<Transport> transport, std::size_t node, bool clockRuns,
                        std::shared_ptr<CaptureFile> capture)
-        : transport_(std::move(transport)), node_(node), capture_(std::move(capture)) {}
+        : transport_(std::move(transport)),
+          node_(node),
+          clockRuns_(clockRuns),
+          capture_(std::move(capture)) {}
     std::optional<Response> Exchange(const RequestFrame& request) override {
+        const std::int64_t before = Now().TotalMicroseconds();
         auto response = transport_->Exchange(request);
         if (response && response->empty()) response.reset();
-        capture_->Write("{\"node\": " + std::to_string(node_) + ", \"request\": \"" +
-                        ipmisel::HexText(request.bytes()) + "\", \"response\": " +
-                        (response ? "\"" + ipmisel::HexText(*response) + "\"" : "null") + "}\n");
+        if (clockRuns_) {
+            std::string now = SystemTime().ToString();
+            SetLocalTime(std::move(now));
+        }
+        std::string line = "{\"node\": " + std::to_string(node_) + ", \"request\": \"" +
+                           ipmisel::HexText(request.bytes()) + "\", \"response\": " +
+                           (response ? "\"" + ipmisel::HexText(*response) + "\"" : "null");
+        if (request.code() == ipmi::kGetSelTime) {
+            const auto took = static_cast<double>(Now().TotalMicroseconds() - before) / 1e6;
+            line += ", \"at\": \"" + Now().ToString() +
+                    "\", \"took\": " + ipmisel::Format("%.6f", std::max(took, 0.0));
+        }
+        capture_->Write(line + "}\n");
         return response;
     }
 
 private:
+    static NQORTQR20::TCIMDateTime Now() { return NQORTQR20::TOSSpecific::GetLocalTime(); }
+
     std::unique_ptr<Transport> transport_;
     std::size_t node_;
+    bool clockRuns_;
     std::shared_ptr<CaptureFile> capture_;
 };
 
 }  // namespace
 
-std::shared_ptr<CaptureWriter> RecordTo(const std::string& file, Source& source) {
-    // The time is held still from here on, so that the replay gives the report that is made now.
-    if (!source.facts.localTime) {
-        source.facts.localTime = NQORTQR20::TOSSpecific::GetLocalTime().ToString();
-    }
-    auto capture = std::make_shared<CaptureFile>(file, source);
+std::shared_ptr<CaptureWriter> RecordTo(const std::string& file, Source& source,
+                                        const std::vector<std::string>& classes) {
+    const bool clockRuns = !source.facts.localTime;
+    if (clockRuns) source.facts.localTime = SystemTime().ToString();
+    auto capture = std::make_shared<CaptureFile>(file, source, classes);
     for (std::size_t node = 0; node < source.nodes.size(); ++node) {
         SourceNode& recorded = source.nodes[node];
         if (recorded.pipeline) {
             recorded.transport = std::make_unique<PipelineTransport>(std::move(recorded.pipeline));
         }
-        recorded.transport =
-            std::make_unique<RecordingTransport>(std::move(recorded.transport), node, capture);
+        recorded.transport = std::make_unique<RecordingTransport>(std::move(recorded.transport),
+                                                                  node, clockRuns, capture);
     }
     return capture;
 }

@@ -1,93 +1,172 @@
 #include <algorithm>
 #include <cerrno>
+#include <chrono>
 #include <cstddef>
 #include <cstring>
 #include <fstream>
+#include <map>
 #include <memory>
+#include <nlohmann/json.hpp>
 #include <optional>
 #include <string>
-#include <unordered_map>
 #include <utility>
 #include <vector>
 
+#include "base/text.h"
 #include "host/spdriver/kinds.h"
 #include "host/spdriver/stop_gate.h"
 #include "simulator/strict_json.h"
+#include "tqr/datetime.h"
 
-// A capture: one JSON object a line. The first holds the facts of the machine, every other one
-// exchange: {"node": 0, "request": "0120...", "response": "00..." or null}.
+// A capture: one JSON object a line (docs/capture.md). The first holds the facts of the machine,
+// every other one exchange: {"node": 0, "request": "0120...", "response": "00..." or null}.
 
 namespace tqrhost {
 namespace {
 
 using ipmisel::JsonValue;
+using NQORTQR20::TCIMDateTime;
 
 constexpr std::uint32_t kVersion = 1;
-constexpr std::uint32_t kMostNodes = 1024;
+constexpr std::uint32_t kMaxNodes = 1024;
+/// Far more than a machine's SMBIOS takes, which stands in the first line.
+constexpr std::size_t kMaxLine = std::size_t{4} << 20;
+constexpr std::size_t kMaxMissing = 100;
 
-/// What identifies a request: all of it but the padding of its frame.
-std::string KeyOf(const RequestFrame& request) {
-    std::string key{static_cast<char>(request.netFn()), static_cast<char>(request.lun()),
-                    static_cast<char>(request.command())};
-    key.append(request.data().begin(), request.data().end());
-    return key;
+std::string TextOf(std::int64_t microseconds, short utcOffsetMinutes) {
+    using namespace std::chrono;
+    const sys_time<std::chrono::microseconds> time(std::chrono::microseconds(microseconds) +
+                                                   minutes(utcOffsetMinutes));
+    const auto day = floor<days>(time);
+    const year_month_day date(day);
+    const hh_mm_ss clock(time - day);
+    TCIMDateTime text;
+    text.Set(static_cast<unsigned short>(static_cast<int>(date.year())),
+             static_cast<unsigned short>(static_cast<unsigned>(date.month())),
+             static_cast<unsigned>(date.day()), static_cast<unsigned short>(clock.hours().count()),
+             static_cast<unsigned short>(clock.minutes().count()),
+             static_cast<unsigned short>(clock.seconds().count()),
+             static_cast<unsigned>(clock.subseconds().count()), utcOffsetMinutes);
+    return text.ToString();
 }
+
+/// When the controllers were asked for their time, in the order in which they were. The time that
+/// the plug-ins see is the one before the next question, and after an answer the one when it came.
+class ReplayClock {
+public:
+    void Add(const std::string& at, double tookSeconds) {
+        const TCIMDateTime answered(at.c_str());
+        const auto took = static_cast<std::int64_t>(std::min(tookSeconds, kMaxSeconds) * 1e6 + 0.5);
+        times_.push_back(
+            {TextOf(answered.TotalMicroseconds() - took, answered.GetUTCOffset()), at});
+    }
+    void Answered(bool time) {
+        if (time && next_ < times_.size()) {
+            SetLocalTime(times_[next_++].after);
+        } else if (!time && next_ < times_.size()) {
+            SetLocalTime(times_[next_].before);
+        }
+    }
+
+private:
+    static constexpr double kMaxSeconds = 24 * 60 * 60;
+    struct Times {
+        std::string before, after;
+    };
+    std::vector<Times> times_;
+    std::size_t next_ = 0;
+};
 
 /// The exchanges of one node. The same request is answered in the order recorded; after its last
 /// answer that one is given again.
 class ReplayTransport : public Transport {
 public:
+    explicit ReplayTransport(std::shared_ptr<ReplayClock> clock) : clock_(std::move(clock)) {}
     void Add(const RequestFrame& request, std::optional<Response> response) {
-        answers_[KeyOf(request)].recorded.push_back(std::move(response));
+        answers_[request.ToCommand()].recorded.push_back(std::move(response));
     }
     std::optional<Response> Exchange(const RequestFrame& request) override {
-        const auto found = answers_.find(KeyOf(request));
-        if (found == answers_.end()) return std::nullopt;
+        const auto found = answers_.find(request.ToCommand());
+        if (found == answers_.end()) {
+            NoteMissing(request);
+            return std::nullopt;
+        }
         Answers& answers = found->second;
         const std::size_t position = std::min(answers.given, answers.recorded.size() - 1);
         ++answers.given;
+        clock_->Answered(request.code() == ipmi::kGetSelTime);
         return answers.recorded[position];
     }
+    /// The recording ends with a Get SEL Info that this pass has not asked.
+    bool HasLaterLogInfo() const {
+        const auto found = answers_.find(ipmi::GetSelInfo());
+        return found != answers_.end() && found->second.given > 0 &&
+               found->second.given < found->second.recorded.size();
+    }
+    const std::vector<ReadFault>& Missing() const { return missing_; }
 
 private:
     struct Answers {
         std::vector<std::optional<Response>> recorded;
         std::size_t given = 0;
     };
-    std::unordered_map<std::string, Answers> answers_;
+
+    void NoteMissing(const RequestFrame& request) {
+        const std::string name(ipmi::CommandName(request.code()));
+        ReadFault fault{name.empty() ? ipmisel::Format("NetFn %02x command %02x", request.netFn(),
+                                                       request.command())
+                                     : name,
+                        "", "not in the capture", true};
+        if (missing_.size() < kMaxMissing &&
+            std::find(missing_.begin(), missing_.end(), fault) == missing_.end()) {
+            missing_.push_back(std::move(fault));
+        }
+    }
+
+    std::shared_ptr<ReplayClock> clock_;
+    std::map<ipmi::Command, Answers> answers_;
+    std::vector<ReadFault> missing_;
 };
 
+using Nodes = std::vector<std::unique_ptr<ReplayTransport>>;
+
 /// The nodes whose number the first line says.
-std::size_t ReadFacts(const JsonValue& line, MachineFacts* facts) {
+std::size_t ReadFacts(const JsonValue& line, Source* source) {
+    MachineFacts& facts = source->facts;
     std::size_t nodes = 0;
     line.Object({
         {"ipmisel_capture", [](const JsonValue& v) { v.Number(kVersion, kVersion); }, true},
-        {"machine_type", [&](const JsonValue& v) { facts->machineType = v.Text(); }},
-        {"integrated_bmc", [&](const JsonValue& v) { facts->integratedBmc = v.Flag(); }},
-        {"ipmi_driver", [&](const JsonValue& v) { facts->ipmiDriver = v.Flag(); }},
-        {"ipmi_lan", [&](const JsonValue& v) { facts->ipmiLan = v.Flag(); }},
+        {"machine_type", [&](const JsonValue& v) { facts.machineType = v.Text(); }},
+        {"integrated_bmc", [&](const JsonValue& v) { facts.integratedBmc = v.Flag(); }},
+        {"ipmi_driver", [&](const JsonValue& v) { facts.ipmiDriver = v.Flag(); }},
+        {"ipmi_lan", [&](const JsonValue& v) { facts.ipmiLan = v.Flag(); }},
         {"local_time",
          [&](const JsonValue& v) {
-             if (!v.IsNull()) facts->localTime = v.Text();
+             if (!v.IsNull()) facts.localTime = v.Text();
          }},
         {"smbios",
          [&](const JsonValue& v) {
-             v.List([&](const JsonValue& s) { facts->smbios.push_back(s.Hex()); });
+             v.List([&](const JsonValue& s) { facts.smbios.push_back(s.Hex()); });
          }},
-        {"nodes", [&](const JsonValue& v) { nodes = v.Number(0, kMostNodes); }, true},
+        {"nodes", [&](const JsonValue& v) { nodes = v.Number(0, kMaxNodes); }, true},
+        {"classes",
+         [&](const JsonValue& v) {
+             v.List([&](const JsonValue& name) { source->classes.push_back(name.Text()); });
+         }},
     });
     return nodes;
 }
 
-void ReadExchange(const JsonValue& line,
-                  const std::vector<std::unique_ptr<ReplayTransport>>& nodes) {
+void ReadExchange(const JsonValue& line, const Nodes& nodes, ReplayClock* clock) {
     std::size_t node = 0;
     std::optional<RequestFrame> request;
     std::optional<Response> response;
+    std::string at;
+    double took = 0;
     line.Object({
         {"node",
          [&](const JsonValue& v) {
-             node = v.Number(0, kMostNodes);
+             node = v.Number(0, kMaxNodes);
              if (node >= nodes.size()) v.Refuse("the first line announces fewer nodes");
          },
          true},
@@ -104,8 +183,38 @@ void ReadExchange(const JsonValue& line,
              if (response->empty()) v.Refuse("begins with a completion code, or is null");
          },
          true},
+        {"at",
+         [&](const JsonValue& v) {
+             at = v.Text();
+             if (TCIMDateTime(at.c_str()).ToString() != at) {
+                 v.Refuse("is no time; write it as in 20240305120000.000000+060");
+             }
+         }},
+        {"took", [&](const JsonValue& v) { took = v.Real(); }},
     });
+    if (!at.empty()) clock->Add(at, took);
     nodes[node]->Add(*request, std::move(response));
+}
+
+/// The next line without its end, at most kMaxLine bytes and one more; empty at the end of the
+/// file. `whole` says whether the line has its end.
+std::optional<std::string> ReadLine(std::istream& in, bool* whole) {
+    std::string line;
+    for (int c = in.get(); c != std::istream::traits_type::eof(); c = in.get()) {
+        if (c == '\n') {
+            *whole = true;
+            return line;
+        }
+        line += static_cast<char>(c);
+        if (line.size() > kMaxLine) break;
+    }
+    *whole = false;
+    if (line.empty()) return std::nullopt;
+    return line;
+}
+
+[[noreturn]] void Refuse(const std::string& reason, const char* advice) {
+    throw SourceError(reason + "; " + advice);
 }
 
 }  // namespace
@@ -113,33 +222,50 @@ void ReadExchange(const JsonValue& line,
 Source OpenReplay(const std::vector<std::string>& places, const SourceOptions& /*options*/) {
     const std::string& place = places.front();
     Source source;
-    std::vector<std::unique_ptr<ReplayTransport>> nodes;
+    Nodes nodes;
+    const auto clock = std::make_shared<ReplayClock>();
     std::size_t number = 0;
+    bool cutShort = false;
     const auto readLine = [&](const JsonValue& line) {
-        if (number > 1) return ReadExchange(line, nodes);
-        const std::size_t count = ReadFacts(line, &source.facts);
-        while (nodes.size() < count) nodes.push_back(std::make_unique<ReplayTransport>());
+        if (number > 1) return ReadExchange(line, nodes, clock.get());
+        const std::size_t count = ReadFacts(line, &source);
+        while (nodes.size() < count) nodes.push_back(std::make_unique<ReplayTransport>(clock));
     };
     errno = 0;
     std::ifstream in(place, std::ios::binary);
-    try {
-        for (std::string line; std::getline(in, line);) {
-            ipmisel::ReadStrictJson(line, place, readLine, ++number);
+    bool whole = true;
+    while (const auto line = ReadLine(in, &whole)) {
+        ++number;
+        if (line->size() > kMaxLine) {
+            Refuse(ipmisel::Format("%s:%zu: the line is longer than %zu bytes", place.c_str(),
+                                   number, kMaxLine),
+                   "name another file with --from");
         }
-    } catch (const ipmisel::JsonFileError& error) {
-        throw SourceError(std::string(error.what()) +
-                          "; correct the file or name another with --from");
+        // The last line of a recording that was ended from outside.
+        cutShort = !whole && number > 1 && !nlohmann::json::accept(*line, true);
+        if (cutShort) break;
+        try {
+            ipmisel::ReadStrictJson(*line, place, readLine, number);
+        } catch (const ipmisel::JsonFileError& error) {
+            Refuse(error.what(), "correct the file or name another with --from");
+        }
     }
     if (in.bad() || (number == 0 && errno != 0)) {
-        throw SourceError(place + ": cannot be read: " + std::strerror(errno) +
-                          "; name another with --from");
+        Refuse(place + ": cannot be read: " + std::strerror(errno), "name another with --from");
     }
-    if (number == 0) {
-        throw SourceError(place + ": is empty, not a capture; name another with --from");
-    }
+    if (number == 0) Refuse(place + ": is empty, not a capture", "name another with --from");
     for (auto& node : nodes) {
+        const ReplayTransport* const replay = node.get();
         source.nodes.push_back(
             {"replay:" + place, std::make_unique<StopGate>(std::move(node)), nullptr});
+        source.nodes.back().endPass = [replay] { return replay->HasLaterLogInfo(); };
+        source.nodes.back().missing = [replay, cutShort] {
+            std::vector<ReadFault> faults;
+            if (cutShort)
+                faults.push_back({"the capture", "", "ends in the middle of a line", true});
+            faults.insert(faults.end(), replay->Missing().begin(), replay->Missing().end());
+            return faults;
+        };
     }
     return source;
 }

@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "host/core/host.h"
+#include "host/spdriver/completeness.h"
 #include "host/spdriver/pipeline.h"
 #include "host/spdriver/transport.h"
 
@@ -57,6 +58,8 @@ struct SourceNode {
     /// The pass is over; whether Get SEL Info is to be asked a last time, since the log is known to
     /// have changed after it was read. Null for never.
     std::function<bool()> endPass = {};
+    /// What else is known to be missing when the pass is over. Null for nothing.
+    std::function<std::vector<ReadFault>()> missing = {};
 };
 
 /// A node that could not be opened.
@@ -70,6 +73,7 @@ struct Source {
     MachineFacts facts;
     std::vector<SourceNode> nodes;
     std::vector<UnreachableNode> unreachable;
+    std::vector<std::string> classes;  ///< what a capture was made of; empty when that is not known
 };
 
 /// Opens "inband", "lan:HOST", "sim:FILE", "replay:FILE". Several sources must all be of a kind
@@ -81,6 +85,8 @@ Source OpenSources(const std::vector<std::string>& sources, const SourceOptions&
 /// Makes the nodes and facts of a source the machine that SPLibrary and the core speak of; until
 /// the next call, or CloseMachine.
 void OpenMachine(Source source);
+/// The nodes of the open machine's sources that could not be opened.
+const std::vector<UnreachableNode>& GetUnreachable();
 /// The pass over the open machine is over: what is still to be seen of its nodes is asked for.
 void EndPass();
 void CloseMachine();

@@ -37,6 +37,7 @@ struct OpenNode {
     std::string source;
     std::unique_ptr<NQORTQR20::SPLibrary> library;
     std::function<bool()> endPass;
+    std::function<std::vector<ReadFault>()> missing;
 };
 constexpr std::size_t kTransferBuffer = 256;
 
@@ -50,18 +51,25 @@ std::vector<OpenNode>& Nodes() {
     return nodes;
 }
 
+std::vector<UnreachableNode>& Unreachable() {
+    static std::vector<UnreachableNode> unreachable;
+    return unreachable;
+}
+
 }  // namespace
 
 void OpenMachine(Source source) {
     CloseMachine();
     SetMachineFacts(std::move(source.facts));
+    Unreachable() = std::move(source.unreachable);
     for (SourceNode& node : source.nodes) {
         if (node.pipeline) {
             node.transport = std::make_unique<PipelineTransport>(std::move(node.pipeline));
         }
         auto library = std::make_unique<NQORTQR20::SPLibrary>(std::move(node.transport),
                                                               GetMachineFacts().integratedBmc);
-        Nodes().push_back({std::move(node.name), std::move(library), std::move(node.endPass)});
+        Nodes().push_back({std::move(node.name), std::move(library), std::move(node.endPass),
+                           std::move(node.missing)});
     }
 }
 
@@ -86,12 +94,18 @@ std::vector<NodeCompleteness> GetCompleteness() {
     for (const OpenNode& node : Nodes()) {
         accounts.push_back(CompletenessOf(*node.library));
         accounts.back().source = node.source;
+        if (!node.missing) continue;
+        auto& faults = accounts.back().faults;
+        for (ReadFault& fault : node.missing()) faults.push_back(std::move(fault));
     }
     return accounts;
 }
 
+const std::vector<UnreachableNode>& GetUnreachable() { return Unreachable(); }
+
 void CloseMachine() {
     Nodes().clear();
+    Unreachable().clear();
     SetMachineFacts({});
 }
 

@@ -58,10 +58,11 @@ struct Machine {
 };
 
 std::shared_ptr<tqrhost::CaptureWriter> Record(const CollectOptions& options,
-                                               tqrhost::Source& source) {
+                                               tqrhost::Source& source,
+                                               const std::vector<std::string>& classes) {
     if (!options.record) return nullptr;
     try {
-        return tqrhost::RecordTo(*options.record, source);
+        return tqrhost::RecordTo(*options.record, source, classes);
     } catch (const tqrhost::SourceError& error) {
         throw Failure(kExitUsage, error.what());
     }
@@ -80,16 +81,15 @@ tqrhost::ReadingNeeds NeedsOf(const std::vector<std::string>& wanted,
     return needs;
 }
 
-/// One for each node. The nodes of lan: sources follow each other as they were named.
-std::vector<SystemInfo> SystemsOf(const std::vector<std::string>& sources, std::size_t nodes) {
-    std::vector<SystemInfo> systems(nodes);
-    for (std::size_t node = 0; node < nodes; ++node) {
-        const bool oneEach = sources.size() == nodes;
-        SystemInfo& system = systems[node];
-        system.source = sources[oneEach ? node : 0];
-        const auto colon = system.source.find(':');
-        system.name = colon == std::string::npos ? system.source : system.source.substr(colon + 1);
-        if (!system.source.starts_with("lan:")) {  // of a file its name alone
+/// One for each node, called by its host or file.
+std::vector<SystemInfo> SystemsOf(const std::vector<tqrhost::SourceNode>& nodes) {
+    std::vector<SystemInfo> systems;
+    for (const tqrhost::SourceNode& node : nodes) {
+        SystemInfo& system = systems.emplace_back();
+        system.source = node.name;
+        system.name = node.name.substr(node.name.find(':') + 1);
+        // Of a file its name alone.
+        if (!node.name.starts_with("lan:")) {
             system.name = std::filesystem::path(system.name).stem().string();
         }
     }
@@ -115,12 +115,22 @@ int CollectTo(const CollectOptions& options, ReportOutput& output) {
     const auto begin = std::chrono::steady_clock::now();
     // The plug-ins first: without them nobody is asked for a password.
     const std::unique_ptr<tqrhost::PluginSet> plugins = LoadPlugins(options.plugins);
-    const std::vector<std::string> wanted = ClassesToCollect(
-        options.report.classes, FindFormat(options.report.format)->classes, *plugins);
+    const auto ofFormat = FindFormat(options.report.format)->classes;
+    std::vector<std::string> wanted = ClassesToCollect(options.report.classes, ofFormat, *plugins);
     tqrhost::Source source = OpenSource(options.access);
+    // A capture answers what was asked for when it was made, if the format can be made of that.
+    const bool suffices = std::all_of(ofFormat.begin(), ofFormat.end(), [&](std::string_view name) {
+        return std::find(source.classes.begin(), source.classes.end(), name) !=
+               source.classes.end();
+    });
+    if (options.report.classes.empty() && !source.classes.empty() && suffices) {
+        wanted = ClassesToCollect(source.classes, {}, *plugins);
+    }
+    for (const tqrhost::UnreachableNode& node : source.unreachable) Say(node.reason);
     StopSignals::BeginCollecting();
     tqrhost::ReadLiveNodes(source, NeedsOf(wanted, *plugins));
-    const std::shared_ptr<tqrhost::CaptureWriter> capture = Record(options, source);
+    const std::shared_ptr<tqrhost::CaptureWriter> capture = Record(options, source, wanted);
+    const std::vector<SystemInfo> systems = SystemsOf(source.nodes);
     const Machine machine(std::move(source));
 
     const auto nodes = static_cast<std::size_t>(NQORTQR20::SPLibrary::GetNumberBMCNode());
@@ -128,7 +138,7 @@ int CollectTo(const CollectOptions& options, ReportOutput& output) {
                           .plugin = plugins->Plugins().front()->Info(),
                           .machineType = tqrhost::GetMachineFacts().machineType,
                           .nodes = nodes,
-                          .systems = SystemsOf(options.access.Sources(), nodes),
+                          .systems = systems,
                           .collected = {NQORTQR20::TOSSpecific::GetLocalTime().TotalMicroseconds() /
                                         kMicrosecondsPerSecond},
                           .classes = plugins->Classes(),
@@ -151,6 +161,10 @@ int CollectTo(const CollectOptions& options, ReportOutput& output) {
     end.notices = TellNotices();
     end.completeness = tqrhost::GetCompleteness();
     end.exported = sink.Exported();
+    for (std::size_t node = 0; node < end.exported.size(); ++node) {
+        end.completeness[node].log.exported = end.exported[node];
+    }
+    end.unreachable = tqrhost::GetUnreachable();
     end.plugins = plan.Statuses();
     end.status = plan.Status();
     end.systems = head.systems;

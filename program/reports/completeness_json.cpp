@@ -32,6 +32,12 @@ Json CompletenessJson(const ReportEnd& end) {
         json["faults"] = std::move(faults);
         nodes.push_back(std::move(json));
     }
+    // What could not be opened is no node.
+    for (const tqrhost::UnreachableNode& node : end.unreachable) {
+        nodes.push_back(
+            {{"source", node.name},
+             {"faults", Json::array({{{"what", "opening"}, {"problem", node.reason}}})}});
+    }
     return nodes;
 }
 

@@ -62,8 +62,16 @@ std::string MissingText(const ReportEnd& end) {
         std::string part;
         AppendPart(", ", NotRead("log records", account.log), &part);
         AppendPart(", ", NotRead("sensor records", account.sensors), &part);
+        if (const unsigned lost = account.log.NotExported(); lost != 0) {
+            AppendPart(", ",
+                       std::to_string(lost) + " of " + std::to_string(account.log.read) +
+                           " log records not exported",
+                       &part);
+        }
         AppendPart(", ", FirstFault(account), &part);
-        if (end.completeness.size() > 1) part.insert(0, "node " + std::to_string(node + 1) + ": ");
+        if (end.completeness.size() > 1) {
+            part.insert(0, "node " + std::to_string(node + 1) + " (" + account.source + "): ");
+        }
         AppendPart("; ", part, &text);
     }
     return text;
@@ -118,6 +126,9 @@ Outcome OutcomeOf(const ReportEnd& end) {
                 "name a machine that has one with --from"};
     }
     std::string missing = StopText(end.stopped);
+    for (const tqrhost::UnreachableNode& node : end.unreachable) {
+        AppendPart("; ", node.name + " could not be opened", &missing);
+    }
     AppendPart("; ", MissingText(end), &missing);
     // What was stopped is no failure of the plug-in, whatever it made of the silence.
     if (end.status.code != NQORTQR20::kStatusOk && end.stopped == tqrhost::StopReason::kNone) {

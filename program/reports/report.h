@@ -12,6 +12,7 @@
 #include "host/core/plugin_set.h"
 #include "host/core/sink.h"
 #include "host/spdriver/completeness.h"
+#include "host/spdriver/source.h"
 #include "host/spdriver/stop.h"
 #include "program/reports/output_file.h"
 #include "tqr/status.h"
@@ -58,6 +59,7 @@ struct ReportEnd {
     /// Log records written, by node: the fewest of the classes with one instance for each record.
     /// Empty when no such class was asked for.
     std::vector<unsigned> exported;
+    std::vector<tqrhost::UnreachableNode> unreachable{};
     std::vector<tqrhost::PluginStatus> plugins{};
     std::vector<SystemInfo> systems{};  ///< by node, with what the controllers said of themselves
     std::optional<double> seconds{};    ///< that the collection took

@@ -77,8 +77,9 @@ TEST(Capture, AReplayAnswersWhatWasRecorded) {
     std::ifstream in(file);
     std::getline(std::getline(in, facts), first);
     EXPECT_THAT(facts, StartsWith("{\"ipmisel_capture\":1,\"machine_type\":\"SIM-1\","));
-    EXPECT_EQ(first,
-              R"({"node": 0, "request": "01200a004800000000000000000000", "response": null})");
+    EXPECT_THAT(first,
+                StartsWith(R"({"node": 0, "request": "01200a004800000000000000000000", )"
+                           R"("response": null, "at": ")"));
 
     const Source replay = OpenSources({"replay:" + file}, {});
     EXPECT_EQ(replay.facts.machineType, "SIM-1");
@@ -93,6 +94,65 @@ TEST(Capture, AReplayAnswersWhatWasRecorded) {
     EXPECT_EQ(replay.nodes[1].transport->Exchange(ReadRequest(kGetSelEntry, 1)), std::nullopt);
     EXPECT_EQ(replay.nodes[0].transport->Exchange(ReadRequest(kGetSelEntry, 2)), std::nullopt);
     EXPECT_EQ(replay.nodes[0].transport->Exchange(StorageRequest(kGetSelInfo)), std::nullopt);
+}
+
+/// A controller that takes its time, and the clock that a plug-in sees around the question.
+TEST(Capture, AReplayShowsTheClockAsItWasAtTheQuestion) {
+    const ipmiseltest::TemporaryFolder folder;
+    const std::string file = (folder.path() / "capture").string();
+    const std::string server =
+        folder.Write("s.json", R"({"bmcs": [{"latency_us": 20000, "sel": {"time": 5}}]})");
+    const auto times = [](Source source) {
+        tqrhost::SetMachineFacts(source.facts);
+        std::vector<std::string> seen;
+        const auto see = [&seen] {
+            seen.push_back(NQORTQR20::TOSSpecific::GetLocalTime().ToString());
+        };
+        for (int i = 0; i < 2; ++i) {
+            source.nodes[0].transport->Exchange(StorageRequest(kGetSelInfo));
+            see();
+            source.nodes[0].transport->Exchange(StorageRequest(kGetSelTime));
+            see();
+        }
+        tqrhost::SetMachineFacts({});
+        return seen;
+    };
+    Source source = OpenSources({"sim:" + server}, {});
+    std::vector<std::string> recorded;
+    {
+        const auto capture = tqrhost::RecordTo(file, source, {"A", "B"});
+        recorded = times(std::move(source));
+        EXPECT_TRUE(capture->Finish());
+    }
+    EXPECT_LT(recorded[0], recorded[1]);
+    Source replay = OpenSources({"replay:" + file}, {});
+    EXPECT_THAT(replay.classes, ElementsAre("A", "B"));
+    EXPECT_EQ(times(std::move(replay)), recorded);
+}
+
+TEST(Capture, OneThatEndsInTheMiddleOfALineIsReplayedAsFarAsItGoes) {
+    const ipmiseltest::TemporaryFolder folder;
+    const std::string text =
+        "{\"ipmisel_capture\": 1, \"nodes\": 1}\n"
+        "{\"node\": 0, \"request\": \"01200a004800000000\", \"response\": \"0001000000\"}\n"
+        "{\"node\": 0, \"request\": \"01200a004000000000\", \"response\": \"00\"}";
+    const std::size_t lastLine = text.rfind('\n') + 1;
+    for (std::size_t length = lastLine; length <= text.size(); ++length) {
+        Source source =
+            OpenSources({"replay:" + folder.Write("capture", text.substr(0, length))}, {});
+        EXPECT_TRUE(source.nodes[0].transport->Exchange(StorageRequest(kGetSelTime)));
+        std::vector<std::string> problems;
+        for (const auto& fault : source.nodes[0].missing()) problems.push_back(fault.problem);
+        const bool cut = length > lastLine && length < text.size();
+        EXPECT_EQ(problems.size(), cut ? 1u : 0u) << length;
+        // What it lacks is reported, once.
+        for (int i = 0; i < 2; ++i) {
+            source.nodes[0].transport->Exchange(StorageRequest(kGetSelEntry));
+        }
+        ASSERT_EQ(source.nodes[0].missing().size(), cut ? 2u : 1u);
+        EXPECT_EQ(source.nodes[0].missing().back(),
+                  (ReadFault{"Get SEL Entry", "", "not in the capture", true}));
+    }
 }
 
 TEST(Capture, WhatCannotBeWrittenIsTold) {
@@ -121,10 +181,15 @@ TEST(Capture, ABadFileIsRefusedByLineKeyAndReason) {
         {exchange("0, \"request\": \"01200a004000000000\", \"response\": \"\"}"),
          ":2: response: begins with a completion code"},
         {exchange("0, \"request\": \"01200a004000000000\"}"), ":2: response: is missing"},
+        {exchange("0, \"request\": \"01200a004000000000\", \"response\": null, \"at\": \"now\"}"),
+         ":2: at: is no time"},
+        {exchange("0, \"request\": \"01200a004000000000\", \"response\": null, \"took\": -1}"),
+         ":2: took: must be finite and not below 0"},
+        {exchange(std::string(std::size_t{5} << 20, ' ')), ":2: the line is longer than 4194304"},
     };
     const ipmiseltest::TemporaryFolder folder;
     for (const auto& c : cases) {
-        const std::string file = folder.Write("capture", c.text);
+        const std::string file = folder.Write("capture", c.text + (c.text.empty() ? "" : "\n"));
         EXPECT_THAT(Refusal({"replay:" + file}), StartsWith(file + c.message)) << c.text;
     }
     EXPECT_THAT(Refusal({"replay:/nonexistent"}), StartsWith("/nonexistent: cannot be read: "));

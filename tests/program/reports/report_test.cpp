@@ -156,6 +156,7 @@ TEST(Outcome, SaysHowItWentAndWhatIsMissing) {
     tqrhost::NodeCompleteness fru = whole;
     fru.faults = {{"Read FRU Data", "0003", "no response", false}};
     tqrhost::NodeCompleteness part = whole;
+    part.source = "lan:b";
     part.log.read = 3;
     part.sensors = {7, 6};
     part.faults = {{"Read FRU Data", "0001", "no response", false},
@@ -165,6 +166,8 @@ TEST(Outcome, SaysHowItWentAndWhatIsMissing) {
     const std::string missing =
         "2 of 5 log records not read, 1 of 7 sensor records not read, Get SEL Entry 0004: short "
         "answer";
+    tqrhost::NodeCompleteness dropped = whole;
+    dropped.log.exported = 4;
     const struct {
         int status;
         bool hasBmc;
@@ -175,7 +178,8 @@ TEST(Outcome, SaysHowItWentAndWhatIsMissing) {
     } cases[] = {
         {0, true, StopReason::kNone, {whole, fru}, 0, ""},
         {0, true, StopReason::kNone, {part}, 4, partly + missing},
-        {0, true, StopReason::kNone, {whole, part}, 4, partly + "node 2: " + missing},
+        {0, true, StopReason::kNone, {whole, part}, 4, partly + "node 2 (lan:b): " + missing},
+        {0, true, StopReason::kNone, {dropped}, 4, partly + "1 of 5 log records not exported"},
         {0, true, StopReason::kDeadline, {fru}, 4, partly + "the deadline has passed"},
         {3, true, StopReason::kInterrupted, {part}, 4, partly + "interrupted; " + missing},
         {4, true, StopReason::kNone, {whole}, 1, "the pass ended with status 4 (Out of memory)"},
@@ -188,6 +192,12 @@ TEST(Outcome, SaysHowItWentAndWhatIsMissing) {
         EXPECT_EQ(outcome.problem, c.problem);
         EXPECT_EQ(outcome.advice.empty(), c.exitStatus == 0);
     }
+    ReportEnd end;
+    end.completeness = {whole};
+    end.unreachable = {{"lan:a", "lan:a: no answer"}, {"lan:c", "lan:c: no answer"}};
+    EXPECT_EQ(OutcomeOf(end).exitStatus, 4);
+    EXPECT_EQ(OutcomeOf(end).problem,
+              partly + "lan:a could not be opened; lan:c could not be opened");
 }
 
 }  // namespace
