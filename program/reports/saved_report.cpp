@@ -177,6 +177,12 @@ SavedReport::SavedReport(const std::string& file) : file_(file) {
         if (notice.is_string()) end_.notices.push_back(notice.get<std::string>());
     }
     for (const Json& node : ListAt(json, "completeness")) {
+        if (!node.contains("node")) {  // could not be opened
+            const Json& faults = ListAt(node, "faults");
+            end_.unreachable.push_back(
+                {TextAt(node, "source"), faults.empty() ? "" : TextAt(faults.front(), "problem")});
+            continue;
+        }
         end_.completeness.push_back(CompletenessOf(node));
         const Json& log = ObjectAt(node, "log");
         if (log.contains("exported")) end_.exported.push_back(NumberAt(log, "exported"));
