@@ -79,9 +79,8 @@ constexpr auto kPowerUnit =
         "power input lost (AC)", "soft power control failed, no reaction to a power-on request",
         "power unit failed", "failure predicted");
 constexpr auto kMemory =
-    Row("correctable ECC or other correctable memory error",
-        "uncorrectable ECC or other uncorrectable memory error", "memory parity error",
-        "memory scrub failed (stuck bit)", "memory device disabled",
+    Row("correctable memory error (ECC or other)", "uncorrectable memory error (ECC or other)",
+        "memory parity error", "memory scrub failed (stuck bit)", "memory device disabled",
         "logging limit of correctable memory errors reached", "memory present",
         "memory configuration error", "spare memory", "memory throttled",
         "memory critically overheated");

@@ -174,8 +174,9 @@ std::string SensorText(const Event& event) {
 std::string SubjectText(const Event& event) {
     std::string part = PartText(event.part);
     std::string sensor = SensorText(event);
-    if (part.empty() || part == sensor) return sensor;
-    return sensor.empty() ? part : part + ", " + sensor;
+    const bool isNamed = event.sensor != nullptr && !event.sensor->sensor.name.empty();
+    if (part.empty()) return sensor;
+    return isNamed && part != sensor ? part + ", " + sensor : part;
 }
 
 }  // namespace standard

@@ -36,7 +36,8 @@ std::string PartText(const PartEvidence& evidence);
 /// What an event's sensor is called: its name, else its type and number; empty for a record that is
 /// no sensor event.
 std::string SensorText(const Event& event);
-/// Part and sensor, which stand before what happened; a name that both have once.
+/// Part and sensor, which stand before what happened; a name that both have once, a sensor without
+/// a name only where there is no part.
 std::string SubjectText(const Event& event);
 
 }  // namespace standard

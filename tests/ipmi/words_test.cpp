@@ -66,7 +66,7 @@ TEST(EventOffset, SaysWhatTheStandardSays) {
         {0x0B, 0x09, 0x05, "non-redundant, insufficient resources"},
         {0x6F, 0x07, 0x0A, "processor throttled"},
         {0x6F, 0x08, 0x03, "power supply input lost (AC/DC)"},
-        {0x6F, 0x0C, 0x01, "uncorrectable ECC or other uncorrectable memory error"},
+        {0x6F, 0x0C, 0x01, "uncorrectable memory error (ECC or other)"},
         {0x6F, 0x10, 0x02, "log cleared"},
         {0x6F, 0x13, 0x0B, "bus degraded"},
         {0x6F, 0x22, 0x0E, "power state unknown"},

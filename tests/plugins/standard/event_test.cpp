@@ -40,8 +40,7 @@ TEST(EventText, IsOneForEveryKindOfRecord) {
         const char* sentence;
         const char* vendorData;
     } expected[] = {
-        {"Memory sensor 80h: correctable ECC or other correctable memory error, memory module 4",
-         ""},
+        {"Memory sensor 80h: correctable memory error (ECC or other), memory module 4", ""},
         {"Power Supply sensor 71h: no longer: power supply input lost (AC/DC)", ""},
         {"Processor sensor 91h: vendor-specific event, type 70h, offset 3", "1234"},
         {"OEM sensor 91h: vendor-specific event, sensor type C1h, offset 3", ""},
@@ -89,6 +88,17 @@ TEST(EventText, NamesAPartThatIsCalledAsItsSensorOnceAndNoneOfASoftwareEvent) {
     EXPECT_EQ(events[0].part.parts.size(), 1u);
     EXPECT_EQ(events[1].sentence, "Watchdog: hard reset by the watchdog");
     EXPECT_TRUE(events[1].part.parts.empty());
+}
+
+TEST(EventText, NamesASensorWithoutANameOnlyWhereThereIsNoPart) {
+    LogBuilder log;
+    log.Event(kMemory, 0x80, kAsserted, {0x30, 0xFF, 0x04});
+    Event event = log.Derive()[0];
+    EXPECT_EQ(SubjectText(event), "Memory sensor 80h");
+    event.part.parts.push_back({.name = "DIMM 4", .partNumber = {}, .serialNumber = {}});
+    EXPECT_EQ(SubjectText(event), "DIMM 4");
+    event.part.parts.push_back({.name = "DIMM 5", .partNumber = {}, .serialNumber = {}});
+    EXPECT_EQ(SubjectText(event), "one of DIMM 4, DIMM 5");
 }
 
 TEST(EventText, TakesASensorByOwnerLunAndNumberNeverByItsNumberAlone) {

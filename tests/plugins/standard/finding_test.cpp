@@ -33,14 +33,14 @@ TEST(Finding, TenCorrectedErrorsOfOneModuleAreOneWithACount) {
     ASSERT_EQ(findings.size(), 2u);
     EXPECT_EQ(findings[0].severity, ipmi::Severity::kCritical);
     EXPECT_EQ(findings[0].title,
-              "Memory sensor 82h: uncorrectable ECC or other uncorrectable memory error, memory "
+              "Memory sensor 82h: uncorrectable memory error (ECC or other), memory "
               "module 4 (12 events)");
     EXPECT_EQ(findings[0].events.size(), 12u);
     EXPECT_THAT(findings[0].evidence,
-                ElementsAre("2026-03-09T12:00:00Z: Memory sensor 80h: correctable ECC or other "
-                            "correctable memory error, memory module 4",
-                            "2026-03-09T12:00:30Z: Memory sensor 82h: uncorrectable ECC or other "
-                            "uncorrectable memory error, memory module 4",
+                ElementsAre("2026-03-09T12:00:00Z: Memory sensor 80h: correctable memory error "
+                            "(ECC or other), memory module 4",
+                            "2026-03-09T12:00:30Z: Memory sensor 82h: uncorrectable memory error "
+                            "(ECC or other), memory module 4",
                             "10 more events"));
     EXPECT_THAT(findings[1].events, ElementsAre(10));
 }
