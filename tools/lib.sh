@@ -35,3 +35,4 @@ install_packages() {
 build_packages=(g++ cmake ninja-build pkg-config libfreeipmi-dev libcli11-dev nlohmann-json3-dev)
 test_packages=(googletest libgcrypt20-dev openipmi python3)
 peer_packages=(ipmitool freeipmi-tools file)
+package_packages=(debhelper fakeroot help2man lintian lowdown)
