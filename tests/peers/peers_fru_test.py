@@ -237,7 +237,7 @@ class SideBySide(unittest.TestCase):
                         for one, other in zip(mine, values):
                             self.assertTrue(same(one, other))
                         compared += 1
-        self.assertGreaterEqual(compared, 2 * 20 + 2 * 5 + 2 * 9)
+        self.assertGreaterEqual(compared, 60)  # of the images made here alone
 
     def test_values_of_multi_records(self):
         compared = 0

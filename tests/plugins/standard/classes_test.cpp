@@ -13,6 +13,8 @@
 #include "plugins/standard/sensor_class.h"
 #include "simulator/server_file.h"
 #include "tests/support/bmc_fixture.h"
+#include "tests/support/fru_image.h"
+#include "tests/support/spd_image.h"
 #include "tests/support/temporary_folder.h"
 
 namespace standard {
@@ -53,6 +55,8 @@ std::string Shown(const tqrhost::PropertyValue& value) {
     };
     return std::visit(Visitor(), value);
 }
+
+std::string ServerWithInventory();
 
 class StandardClasses : public Test {
 protected:
@@ -186,9 +190,10 @@ TEST_F(StandardClasses, WhatIsWrittenStandsInTheClassTableWithItsType) {
         fdrPropertyType::kText,    fdrPropertyType::kByteList, fdrPropertyType::kReference,
         fdrPropertyType::kInteger, fdrPropertyType::kReal,     fdrPropertyType::kBoolean,
         fdrPropertyType::kTime,    fdrPropertyType::kTextList};  // in the order of PropertyValue
-    for (const ClassEntry* entry : {&kControllerClass, &kEventLogClass, &kSensorClass}) {
+    for (const ClassEntry* entry :
+         {&kControllerClass, &kEventLogClass, &kSensorClass, &kFruClass}) {
         const NQORTQR20::fdrClassInfo* table = &entry->info;
-        Collect(kServer, {table->name});
+        Collect(entry == &kFruClass ? ServerWithInventory() : kServer, {table->name});
         EXPECT_FALSE(written.instances.empty());
         std::map<std::string, fdrPropertyType> known;
         for (std::uint32_t i = 0; i < table->propertyCount; ++i) {
@@ -202,6 +207,87 @@ TEST_F(StandardClasses, WhatIsWrittenStandsInTheClassTableWithItsType) {
             }
         }
     }
+}
+
+/// One with inventory areas, a memory module, and a device behind another controller.
+std::string ServerWithInventory() {
+    const auto hex = [](const std::vector<std::uint8_t>& bytes) {
+        std::string text;
+        for (const std::uint8_t byte : bytes) text += ipmisel::Format("%02x", byte);
+        return text;
+    };
+    return R"({"bmcs": [{"sdr": {"records": [
+        "0100 51 12 0e 20 00 00 bf 00 00 00 07 01 00 c3 424d43",
+        "0200 51 11 11 20 02 80 00 00 10 00 08 01 00 c6 44494d4d2034",
+        "0300 51 11 0e 82 02 80 00 00 10 00 c2 61 00 c3 535031"]}, "fru": {"0": ")" +
+           hex(ipmiseltest::WholeFruImage().Bytes()) + R"(", "2": ")" +
+           hex(ipmiseltest::Ddr3Image()) + R"("}}]})";
+}
+
+TEST_F(StandardClasses, AnInventoryHasEveryFieldOfItsDevice) {
+    const auto devices = Collect(ServerWithInventory(), {"IPMI_FRU"});
+    ASSERT_THAT(devices, SizeIs(3));
+    const std::map<std::string, std::string> expected{
+        {"Node", "1"},
+        {"DeviceID", "0"},
+        {"Entity", "System Board 1"},
+        {"EntityID", "7"},
+        {"EntityInstance", "1"},
+        {"EntityIsDeviceRelative", "false"},
+        {"Manufacturer", "Acme Systems"},
+        {"Product", "S-1"},
+        {"PartNumber", "P-1"},
+        {"SerialNumber", "SN01"},
+        {"ChassisType", "Rack Mount Chassis"},
+        {"ChassisPartNumber", "CH-1"},
+        {"ChassisSerialNumber", "CHS01"},
+        {"ChassisCustom", "[Rack 7]"},
+        {"BoardManufactured", "2024-06-15T13:20:00Z"},
+        {"BoardManufacturer", "Acme"},
+        {"BoardProduct", "Mainboard"},
+        {"BoardSerialNumber", "BS01"},
+        {"BoardPartNumber", "BP-1"},
+        {"BoardFRUFile", "F1"},
+        {"BoardCustom", "[first][second]"},
+        {"ProductManufacturer", "Acme Systems"},
+        {"ProductName", "S-1"},
+        {"ProductPartNumber", "P-1"},
+        {"ProductVersion", "A00"},
+        {"ProductSerialNumber", "SN01"},
+        {"ProductAssetTag", "T9"},
+        {"ProductFRUFile", "F2"},
+        {"ProductCustom", "[third]"},
+        {"MultiRecords", "[OEM record c0h; manufacturer ID 32473; data 0xab]"}};
+    EXPECT_EQ(devices[0], expected);
+    EXPECT_EQ(devices[1].at("Name"), "DIMM 4");
+    EXPECT_EQ(devices[1].at("ModuleSerialNumber"), "A1B2C3D4");
+    EXPECT_EQ(devices[1].at("ModuleType"), "DDR3");
+    EXPECT_EQ(devices[2].at("ControllerAddress"), "130");
+    EXPECT_EQ(devices[2].at("Problems"), "[behind the controller at 82h: not read]");
+    EXPECT_EQ(devices[2].count("SerialNumber"), 0u);
+}
+
+TEST_F(StandardClasses, ASystemIsNamedByItsInventoryAndEachDeviceReadOnce) {
+    const auto reads = [&] {
+        return std::count_if(requests.begin(), requests.end(), [](const auto& frame) {
+            return frame[2] == ipmi::kReadFruData.netFn && frame[4] == ipmi::kReadFruData.number;
+        });
+    };
+    Collect(ServerWithInventory(), {"IPMI_FRU"});
+    const auto once = reads();
+    requests.clear();
+    const auto instances = Collect(ServerWithInventory(),
+                                   {"IPMI_Controller", "IPMI_Sensor", "IPMI_FRU", "IPMI_Event"});
+    EXPECT_EQ(instances[0].at("SystemManufacturer"), "Acme Systems");
+    EXPECT_EQ(instances[0].at("SystemProduct"), "S-1");
+    EXPECT_EQ(instances[0].at("SystemSerialNumber"), "SN01");
+    EXPECT_EQ(reads(), once);
+    requests.clear();
+    Collect(ServerWithInventory(), {"IPMI_Controller"});
+    EXPECT_EQ(std::count_if(requests.begin(), requests.end(),
+                            [](const auto& frame) { return frame[4] == ipmi::kGetSdr.number; }),
+              0)
+        << "no repository for device 0";
 }
 
 TEST_F(StandardClasses, EachRecordIsReadOnceForAllClasses) {
@@ -280,7 +366,8 @@ TEST(EnterpriseName, IsFoundByItsNumberAlone) {
     EXPECT_EQ(EnterpriseName(1, file + "x"), "");
 }
 
-// An event of the temperature of kServer, one of its BIOS, an OEM record, and a supply that is gone.
+// An event of the temperature of kServer, one of its BIOS, an OEM record, and a supply that is
+// gone.
 constexpr const char* kEvents = R"({"local_time": "20240305130000.000000+000", "bmcs": [{
   "guid": "00000000000000000000000000000001",
   "sel": {"utc_offset_minutes": 60, "time": 1709643598, "entries": [
