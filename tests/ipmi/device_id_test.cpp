@@ -33,12 +33,14 @@ TEST(DeviceId, NamesEveryFieldOfTheAnswer) {
 
 TEST(DeviceId, KeepsFlagsAndReservedBitsOutOfTheNumbers) {
     auto answer = kAnswer;
+    answer[1] = 0x01;  // no SDRs of its own
     answer[2] = 0x8A;  // update in progress, major 10
     answer[3] = 0x05;
     answer[4] = 0x51;
     answer[8] = 0xF1;
     const auto id = ParseDeviceId(answer);
     ASSERT_TRUE(id);
+    EXPECT_FALSE(id->providesSdrs);
     EXPECT_TRUE(id->updateInProgress);
     EXPECT_EQ(FirmwareVersionText(*id), "10.05");
     EXPECT_EQ(IpmiVersionText(*id), "1.5");

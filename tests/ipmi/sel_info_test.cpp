@@ -23,6 +23,12 @@ TEST(SelInfo, NamesEveryFieldAndIsNoneWhenCut) {
     EXPECT_FALSE(info->partialAddSupported);
     EXPECT_TRUE(info->reserveSupported);
     EXPECT_TRUE(info->allocationSupported);
+    auto other = answer;
+    other.back() = 0x74;  // every flag the other way round
+    const auto flags = ParseSelInfo(other);
+    EXPECT_FALSE(flags->overflow || flags->deleteSupported || flags->reserveSupported ||
+                 flags->allocationSupported);
+    EXPECT_TRUE(flags->partialAddSupported);
     for (std::size_t length = 0; length < answer.size(); ++length) {
         EXPECT_FALSE(ParseSelInfo(std::span(answer).first(length))) << length;
     }

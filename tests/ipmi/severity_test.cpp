@@ -88,7 +88,8 @@ TEST(Severity, OfAFaultIsOkWhenItIsDeassertedAndThereIsNoneWithoutWords) {
     }
 }
 
-// Every row of docs/severities.md is what the table says, and every offset that has words has its row.
+// Every row of docs/severities.md is what the table says, and every offset that has words has its
+// row.
 TEST(Severity, IsThatOfItsPage) {
     std::ifstream page(IPMISEL_DOCS "/severities.md");
     ASSERT_TRUE(page);
@@ -136,16 +137,16 @@ TEST(Exclusion, IsOfStatesThatCannotHoldTogether) {
         std::uint8_t earlier;
         bool excludes;
     } cases[] = {
-        {0x01, 0x01, 1, 0, true},  {0x01, 0x01, 1, 4, true},   {0x01, 0x01, 3, 0, false},
-        {0x01, 0x01, 3, 4, true},  {0x01, 0x01, 6, 11, true},  {0x01, 0x01, 7, 9, false},
-        {0x01, 0x01, 8, 7, false}, {0x04, 0x0D, 0, 1, true},   {0x07, 0x08, 0, 3, true},
-        {0x07, 0x08, 2, 1, true},  {0x07, 0x08, 8, 1, false},  {0x07, 0x08, 2, 2, false},
-        {0x08, 0x15, 1, 0, true},  {0x0A, 0x04, 0, 6, true},   {0x0B, 0x08, 0, 5, true},
-        {0x0B, 0x08, 1, 5, false}, {0x0B, 0x08, 3, 1, false},  {0x0B, 0x08, 4, 5, true},
-        {0x0B, 0x08, 6, 1, true},  {0x6F, 0x08, 0, 1, false},  {0x6F, 0x08, 5, 3, true},
-        {0x6F, 0x22, 0, 5, true},  {0x6F, 0x22, 14, 0, false}, {0x6F, 0x25, 0, 1, true},
-        {0x6F, 0x25, 0, 2, false}, {0x6F, 0x27, 1, 0, true},   {0x6F, 0x2C, 4, 7, true},
-        {0x6F, 0x0C, 6, 0, false}, {0x70, 0x08, 0, 1, false},
+        {0x01, 0x01, 1, 0, true},  {0x01, 0x01, 1, 4, true},  {0x01, 0x01, 3, 0, false},
+        {0x01, 0x01, 3, 4, true},  {0x01, 0x01, 6, 11, true}, {0x01, 0x01, 7, 9, false},
+        {0x01, 0x01, 8, 7, false}, {0x04, 0x0D, 0, 1, true},  {0x07, 0x08, 0, 3, true},
+        {0x07, 0x08, 2, 1, true},  {0x07, 0x08, 8, 1, false}, {0x07, 0x08, 2, 2, false},
+        {0x08, 0x15, 1, 0, true},  {0x0A, 0x04, 0, 6, true},  {0x0B, 0x08, 0, 5, true},
+        {0x0B, 0x08, 1, 5, false}, {0x0B, 0x08, 3, 1, false}, {0x0B, 0x08, 3, 5, true},
+        {0x0B, 0x08, 4, 5, true},  {0x0B, 0x08, 6, 1, true},  {0x6F, 0x08, 0, 1, false},
+        {0x6F, 0x08, 5, 3, true},  {0x6F, 0x22, 0, 5, true},  {0x6F, 0x22, 14, 0, false},
+        {0x6F, 0x25, 0, 1, true},  {0x6F, 0x25, 0, 2, false}, {0x6F, 0x27, 1, 0, true},
+        {0x6F, 0x2C, 4, 7, true},  {0x6F, 0x0C, 6, 0, false}, {0x70, 0x08, 0, 1, false},
     };
     for (const auto& c : cases) {
         EXPECT_EQ(Excludes(c.eventType, c.sensorType, c.asserted, c.earlier), c.excludes)

@@ -88,6 +88,15 @@ TEST(EventState, AReplacedPartResolvesWhatWasOpenBefore) {
                                          "resolved by 6", "open", "-"));
 }
 
+TEST(EventState, APartThatCameByAnotherSensorOfItsPlaceIsAbsentNoLonger) {
+    LogBuilder log;
+    const ipmi::Entity supply{.id = 0x0A, .instance = 1};
+    log.Sensor(0x71, kPowerSupply, 0x6F, "PS1 Status", supply);
+    log.Sensor(0x75, 0x08, 0x08, "PS1 Presence", supply);
+    log.Event(0x08, 0x75, 0x08, Offset(0)).Event(kPowerSupply, 0x71, kAsserted, Offset(0));
+    EXPECT_THAT(States(log), ElementsAre("resolved by 1", "-"));
+}
+
 TEST(EventState, AClearedLogResolvesEverythingBefore) {
     LogBuilder log;
     log.Event(kPowerSupply, 0x71, kAsserted, Offset(1))

@@ -148,7 +148,7 @@ TEST(Panic, PiecesOfOneWriterInSequenceAreJoined) {
     log.Record(0xF0, piece(0x20, 0, "Fatal excep"))
         .Record(0xF0, piece(0x20, 1, "tion in int"))
         .Event(0x20, 0x01, kAsserted, {0x01, 0xFF, 0xFF})
-        .Record(0xF0, piece(0x20, 2, "errupt\n"))
+        .Record(0xF0, piece(0x20, 2, "errupt\x7F\n"))
         .Record(0xF0, piece(0x20, 0, "Oops"))
         .Record(0xF0, piece(0x20, 2, "missing"))
         .Record(0xF0, piece(0x40, 3, "elsewhere"));
@@ -209,6 +209,20 @@ TEST(EventTime, IsCorrectedAfterTheLastPlaceWhereTheClockWasSet) {
     EXPECT_EQ(events[8].correctedTime, kNoon + 3603 - 120);
 }
 
+TEST(EventTime, AStepOfOneSecondIsTheClocksResolutionAndOneOfTwoIsNot) {
+    for (const std::uint32_t step : {1U, 2U}) {
+        LogBuilder log;
+        log.Event(0x12, 0x0B, kAsserted, {0xC5, 0x00, 0xFF})
+            .At(kNoon + step)
+            .Event(0x12, 0x0B, kAsserted, {0xC5, 0x80, 0xFF})
+            .At(kNoon)
+            .Event(0x14, 0x01, kAsserted, {0x00, 0xFF, 0xFF});
+        const auto events = log.Derive();
+        EXPECT_EQ(events[1].clockChanged, step == 2);
+        EXPECT_EQ(events[2].clockChanged, step == 2);
+    }
+}
+
 TEST(EventTime, IsNotCorrectedByLessThanIsUncertain) {
     LogBuilder log;
     log.node.clock = ClockFacts{.offset = -0.9, .uncertainty = 1};
@@ -225,7 +239,7 @@ TEST(EventSeverity, IsTheUsersElseThePlatformsElseTheTables) {
     ipmi::EventFilter filter;
     filter.enabled = true;
     filter.severity = ipmi::PefSeverity::kNonRecoverable;
-    filter.generator = {0xFF, 0xFF};
+    filter.generator = {0x20, 0x00};
     filter.sensorType = filter.sensorNumber = filter.directionAndType = 0xFF;
     filter.offsets = 0x0002;
     log.node.filters.push_back(filter);
