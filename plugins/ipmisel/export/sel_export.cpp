@@ -27,6 +27,21 @@ constexpr std::size_t kEntityLength = 128;
 constexpr std::size_t kSensorNameLength = 17;
 
 /// What is the same for all records of one export.
+/// The first sensor of the cache with each number: a repository may have 65,000, a log as many
+/// events.
+using SensorIndex = std::array<const IPMISDREntry*, 256>;
+
+SensorIndex IndexSensors(const SDRCache* cache) {
+    SensorIndex index{};
+    if (cache == nullptr) return index;
+    for (const IPMISDREntry* const entry : *cache) {
+        if (entry != nullptr && index[entry->sensorNumber] == nullptr) {
+            index[entry->sensorNumber] = entry;
+        }
+    }
+    return index;
+}
+
 struct Export {
     int node;
     TCPluginCallbacks* context;
@@ -36,6 +51,7 @@ struct Export {
     int recordIdOffset;
     std::vector<IPMIExtendedSELDataEntry>* extendedEntries;
     ClockDifference clock;
+    SensorIndex sensors;
 };
 
 struct Record {
@@ -125,7 +141,7 @@ const IPMISDREntry* FindSensor(const Record& record) {
         WriteLog(kTrace, "SDR cache is empty.");
         return nullptr;
     }
-    return GetSensorSDR(record.entry.SensorNumber(), cache);
+    return record.exported.sensors[record.entry.SensorNumber()];
 }
 
 s_SDR_Mod_Units UnitsOf(const IPMISDREntry& sensor) {
@@ -370,8 +386,15 @@ unsigned ExportSEL(int node, TCPluginCallbacks* context, fdriIOHandle* output,
                    std::vector<IPMIExtendedSELDataEntry> extendedEntries, SPLibrary* library) {
     using namespace ipmisel;
     TraceScope trace("ExportSEL()", {" function entered.", " function complete.", kTrace});
-    const Export exported{node,  context,        output,           mapping,
-                          cache, recordIdOffset, &extendedEntries, MeasureClock(context, library)};
+    const Export exported{node,
+                          context,
+                          output,
+                          mapping,
+                          cache,
+                          recordIdOffset,
+                          &extendedEntries,
+                          MeasureClock(context, library),
+                          IndexSensors(cache)};
     for (unsigned i = 0; i < count; ++i) {
         if (!ExportRecord(exported, entries[i], static_cast<int>(i))) return trace.Fail();
     }
