@@ -1,0 +1,44 @@
+# Completion of ipmisel for fish; what there is to complete comes from the program's own help.
+
+function __ipmisel_help
+    set -l words (commandline -opc)
+    set -l program $words[1]
+    for word in $words[2..-1]
+        if not string match -q -- '-*' $word
+            $program $word --help 2>/dev/null
+            return
+        end
+    end
+    $program --help 2>/dev/null
+end
+
+function __ipmisel_complete
+    set -l words (commandline -opc)
+    set -l previous $words[-1]
+    set -l help (__ipmisel_help)
+    if string match -q -- '--*' $previous
+        set -l takes (string match -rg -- "^  (?:-.,)?$previous ([A-Z].*)" $help)[1]
+        switch (string replace -r ' .*' '' -- "$takes")
+            case '*:*'
+                string split ', ' (string replace -r '=.*' '' (string replace -r '^[^:]*:' '' -- $takes))
+                return
+            case 'FILE*'
+                __fish_complete_path (commandline -ct)
+                return
+            case 'CLASS*'
+                $words[1] classes 2>/dev/null | string replace -r ' +' \t
+                return
+            case 'SOURCE*'
+                printf '%s\n' inband lan: sim: replay:
+                return
+            case '?*'
+                return
+        end
+    end
+    string match -rg -- '^  (?:-.,)?(--[a-z-]+)' $help
+    if set -l at (contains -i -- Subcommands: $help)
+        string match -rg -- '^  ([a-z][a-z-]*) ' $help[(math $at + 1)..-1]
+    end
+end
+
+complete -c ipmisel -f -a '(__ipmisel_complete)'
