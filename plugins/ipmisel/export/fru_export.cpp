@@ -13,7 +13,7 @@ namespace {
 
 using Strings = std::vector<std::string>;
 
-/// The first of the strings that are told, which decides about all of them.
+/// The first of the strings that are exported, which decides about all of them.
 constexpr std::size_t kFirstString = 3;
 /// What the strings from kFirstString on are. What stands before and after them is not told.
 constexpr std::array<const char*, 4> kStringProperties{"Vendor", "Name", "SerialNumber",

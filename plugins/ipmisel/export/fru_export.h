@@ -30,8 +30,8 @@ bool ExportFruDeviceZero(NQORTQR20::TCPluginCallbacks* context, IPMIRequestFRULo
                          IPMIVPDEntry* collector);
 
 /// The devices that the sensor repository locates; their inventory is read into `locators`. Of
-/// memory modules that answer their serial presence detect data, maker and numbers are told.
-/// Whether there was an instance.
+/// memory modules that answer their serial presence detect data, manufacturer and numbers are
+/// exported. Whether there was an instance.
 bool ExportLocatedFrus(const FruNode& node, IPMIRequestFRULocator* request,
                        std::vector<IPMIFRULocator>* locators, IPMIVPDEntry* collector);
 

@@ -33,9 +33,10 @@ public:
     /// out, with a log line; 1 when there was one, else 0.
     unsigned GenerateCIMInstance(NQORTQR20::fdriIOHandle* output, const char* className) const;
 
-    /// The maker of a memory module from its JEDEC code (JEP106): `twoBytes` false, up to six
-    /// continuation bytes 0x7F and the code; true, the number of continuation bytes and the code,
-    /// both with a parity bit. At most 7 resp. 2 bytes are read. Empty when it cannot be told.
+    /// The manufacturer of a memory module from its JEDEC code (JEP106): `twoBytes` false, up to
+    /// six continuation bytes 0x7F and the code; true, the number of continuation bytes and the
+    /// code, both with a parity bit. At most 7 resp. 2 bytes are read. Empty when it cannot be
+    /// told.
     static std::string getMDManufacturer(const unsigned char* code, bool twoBytes);
     /// Whether a NUL-terminated text may be shown: not empty, characters 0x20 to 0x7E only.
     static bool IsASCIIStr(const unsigned char* text);

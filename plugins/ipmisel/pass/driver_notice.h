@@ -22,7 +22,7 @@ bool ShowsLinks(const NoticeSetting& setting);
 std::string DriverNoticePlain();
 std::string DriverNoticeMarkup();
 
-/// Tells the person who collects that the machine has a BMC and no driver to reach it with.
+/// Notifies the person who collects that the machine has a BMC and no driver to reach it with.
 void ShowDriverNotice(NQORTQR20::TCPluginCallbacks* context, std::string_view machineType);
 
 }  // namespace ipmisel

@@ -24,7 +24,7 @@ std::vector<FirmwareQuery> QueriesFor(FirmwareKind kind) {
     return queries;
 }
 
-/// Several nodes are told apart as in the inventory.
+/// Several nodes are distinguished as in the inventory.
 void Write(Node& node, const char* className, FirmwareElement element) {
     if (node.count > 1) element.name = Format("Node %d : ", node.number) + element.name;
     IPMIVPDEntry& collector = *node.objects.vpdEntry;
