@@ -1,8 +1,8 @@
 #include "simulator/strict_json.h"
 
 #include <algorithm>
-#include <cmath>
 #include <cerrno>
+#include <cmath>
 #include <cstddef>
 #include <cstring>
 #include <fstream>

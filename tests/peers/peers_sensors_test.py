@@ -39,7 +39,7 @@ ANALOG += [(name, 0x01, UNSIGNED, 1, function, 1, 0, 0, -1, 20, (10, 5, 2, 30, 3
 # As they are in a record, and what they say.
 NAMES = [
     (0xC5, b"Latin", "Latin"), (0x84, bytes([0x29, 0xDC, 0xA6]), "IPMI"),
-    (0x46, bytes([0x01, 0x2B, 0x9C]), "012-9."), (0x03, "Ünï".encode("utf-16-le"), "Ünï"),
+    (0x46, bytes([0x01, 0x2B, 0x9C]), "012-9."), (0x03, "\u00dcn\u00ef".encode("utf-16-le"), "\u00dcn\u00ef"),
 ]
 LIMITS = ["LowerNonCritical", "LowerCritical", "LowerNonRecoverable", "UpperNonCritical",
           "UpperCritical", "UpperNonRecoverable"]

@@ -329,7 +329,8 @@ std::string AuxLogText(const Record& record) {
            " Extended Data: " + extended.GetExtendedDataString();
 }
 
-void FillArray(const ValueArray& array, const std::array<unsigned char, ipmi::kSelRecordSize>& bytes) {
+void FillArray(const ValueArray& array,
+               const std::array<unsigned char, ipmi::kSelRecordSize>& bytes) {
     const bool traced = LogEnabled(kTrace);
     WriteLog(kTrace, "Raw Hex Data values:");
     for (const unsigned char byte : bytes) {
