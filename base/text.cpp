@@ -19,84 +19,25 @@ void AppendBounded(char* destination, unsigned int size, const char* source, std
     destination[size - 1] = '\0';
 }
 
-/// One conversion of a format that FormatIntegers honours.
-struct Conversion {
-    bool left = false;
-    bool plus = false;
-    bool blank = false;
-    bool alternate = false;
-    bool zeros = false;
-    std::size_t width = 0;
-    char letter = 'd';
-    std::size_t length = 0;  ///< characters of the format that it takes, the percent sign included
-};
-
-/// Widths have at most three digits, so that a hostile format cannot ask for gigabytes.
-constexpr std::size_t kWidthDigits = 3;
-
-/// The conversion at the start of `format`; its length is 0 when there is none to be honoured.
-Conversion ScanConversion(std::string_view format) {
-    Conversion found;
-    std::size_t at = 1;
-    const auto current = [&] { return at < format.size() ? format[at] : '\0'; };
-    for (;; ++at) {
-        if (current() == '-') {
-            found.left = true;
-        } else if (current() == '+') {
-            found.plus = true;
-        } else if (current() == ' ') {
-            found.blank = true;
-        } else if (current() == '#') {
-            found.alternate = true;
-        } else if (current() == '0') {
-            found.zeros = true;
-        } else {
-            break;
-        }
-    }
-    for (std::size_t digits = 0; digits < kWidthDigits && current() >= '0' && current() <= '9';
-         ++digits, ++at) {
-        found.width = found.width * 10 + static_cast<std::size_t>(current() - '0');
-    }
-    found.letter = current();
-    if (found.letter != '\0' && std::strchr("dixXu", found.letter) != nullptr) {
-        found.length = at + 1;
-    }
-    return found;
+/// The length of the integer conversion at the start of a format, 0 when there is none: flags, a
+/// width of at most three digits, so that a hostile format cannot ask for gigabytes, and the
+/// letter.
+std::size_t ConversionLength(std::string_view format) {
+    constexpr std::size_t kWidthDigits = 3;
+    std::size_t at = std::min(format.find_first_not_of("-+ #0", 1), format.size());
+    const std::size_t digits = std::min(format.find_first_not_of("0123456789", at), format.size());
+    at = std::min(digits, at + kWidthDigits);
+    const bool isInteger = at < format.size() && std::strchr("dixXu", format[at]) != nullptr;
+    return isInteger && format[at] != '\0' ? at + 1 : 0;
 }
 
-std::string Convert(const Conversion& conversion, int value) {
-    const bool isSigned = conversion.letter == 'd' || conversion.letter == 'i';
-    const bool isHex = conversion.letter == 'x' || conversion.letter == 'X';
-    const bool negative = isSigned && value < 0;
-    const auto bits = static_cast<unsigned>(value);
-    const unsigned magnitude = negative ? 0U - bits : bits;
-
-    char buffer[16];
-    const auto [end, error] =
-        std::to_chars(std::begin(buffer), std::end(buffer), magnitude, isHex ? 16 : 10);
-    std::string digits(buffer, error == std::errc() ? end : buffer);
-    std::string prefix;
-    if (negative) {
-        prefix = "-";
-    } else if (isSigned && conversion.plus) {
-        prefix = "+";
-    } else if (isSigned && conversion.blank) {
-        prefix = " ";
-    } else if (isHex && conversion.alternate && magnitude != 0) {
-        prefix = "0x";
-    }
-    if (conversion.letter == 'X') {
-        for (std::string* part : {&prefix, &digits}) {
-            for (char& c : *part) c = static_cast<char>(std::toupper(c));
-        }
-    }
-    const std::size_t length = prefix.size() + digits.size();
-    const std::size_t fill = conversion.width > length ? conversion.width - length : 0;
-    if (conversion.left) return prefix + digits + std::string(fill, ' ');
-    if (conversion.zeros) return prefix + std::string(fill, '0') + digits;
-    return std::string(fill, ' ') + prefix + digits;
+// The format has been held to what is allowed.
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral"
+std::string Convert(const std::string& conversion, int value) {
+    return ipmisel::Format(conversion.c_str(), value);
 }
+#pragma GCC diagnostic pop
 
 }  // namespace
 
@@ -213,10 +154,10 @@ std::string FormatIntegers(std::string_view format, const int* values, std::size
             format.remove_prefix(2);
             continue;
         }
-        const Conversion conversion = format[0] == '%' ? ScanConversion(format) : Conversion{};
-        if (conversion.length != 0 && used < count) {
-            text += Convert(conversion, values[used++]);
-            format.remove_prefix(conversion.length);
+        const std::size_t length = format[0] == '%' ? ConversionLength(format) : 0;
+        if (length != 0 && used < count) {
+            text += Convert(std::string(format.substr(0, length)), values[used++]);
+            format.remove_prefix(length);
             continue;
         }
         text += format[0];

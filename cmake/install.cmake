@@ -9,3 +9,5 @@ install(TARGETS ipmisel_plugin ipmistandard_plugin LIBRARY DESTINATION lib/ipmis
 install(FILES plugins/ipmisel/texts/ipmisel.INI DESTINATION lib/ipmisel)
 install(FILES README.md CHANGELOG.md LICENSE NOTICE DESTINATION share/doc/ipmisel)
 install(DIRECTORY examples DESTINATION share/doc/ipmisel FILES_MATCHING PATTERN "*.json")
+install(DIRECTORY examples/prometheus DESTINATION share/doc/ipmisel/examples)
+install(DIRECTORY docs/schema DESTINATION share/doc/ipmisel FILES_MATCHING PATTERN "*.json")

@@ -220,6 +220,11 @@ private:
         zoneUnknown_ = zoneUnknown_ || event.timeZoneKnown == false;
     }
 
+    /// The sensor has a column of its own.
+    static std::string SubjectOf(const Event& event) {
+        const std::string part = PartText(event.part, event.partCandidates);
+        return part.empty() && event.sensor.empty() ? event.sensorType : part;
+    }
     /// What is over by itself has no state worth a word.
     static std::string StateText(const std::string& state) {
         if (state != "open" && state != "resolved") return "";
@@ -249,13 +254,13 @@ private:
                                  : "",
              Named("manufacturer's data ", event.makerData), Named("bytes ", raw)},
             "; ");
-        const std::string what = Element("details", Element("summary", HtmlText(WhatText(event))) +
-                                                        Element("p", HtmlText(detail)));
+        const std::string what = Element(
+            "details", Element("summary", HtmlText(event.text)) + Element("p", HtmlText(detail)));
         return Row(
             {{event.recordId ? std::to_string(*event.recordId) : "", "class=\"num\""},
              {event.time ? TimeElement(*event.time) : HtmlText(WhenText(event)), "class=\"when\""},
              {Badge(event.severity) + StateText(event.state)},
-             {HtmlText(PartText(event.part, event.partCandidates)), "class=\"part\""},
+             {HtmlText(SubjectOf(event)), "class=\"part\""},
              {HtmlText(event.sensor), "class=\"sensor\""},
              {what, "class=\"wide\""},
              {HtmlText(ReadingText(event)), "class=\"reading\""}},
@@ -327,8 +332,11 @@ private:
             std::string events;
             unsigned linked = 0;
             for (const std::string& key : f.events) {
-                const std::string link = LinkTo(key, std::to_string(++linked));
-                if (!link.empty()) events += " " + link;
+                const std::string name =
+                    f.events.size() == 1 ? "see it" : "no. " + std::to_string(linked + 1);
+                const std::string link = LinkTo(key, name);
+                if (!link.empty()) events += (events.empty() ? "" : ", ") + link;
+                ++linked;
                 if (linked == kMaxLinks) break;  // the others stand near
             }
             Definitions d;
@@ -337,11 +345,13 @@ private:
                 .Add("Serial number", f.serialNumber, kOrder)
                 .Add("First", f.firstTime);
             if (f.lastTime != f.firstTime) d.Add("Last", f.lastTime);
-            d.AddHtml("Events", (f.count ? std::to_string(*f.count) : "") +
-                                    (events.empty() ? "" : ": see" + events))
+            const bool counts = f.count && *f.count > 0;
+            d.AddHtml("Events", Listed({counts ? std::to_string(*f.count) : "", events}, ": "))
                 .Add("Now",
-                     f.stillPresent ? (*f.stillPresent ? "still present" : "no longer seen") : "")
-                .AddHtml("Began with", LinkTo(f.firstCause, "the first event of this burst"));
+                     f.stillPresent ? (*f.stillPresent ? "still present" : "no longer seen") : "");
+            if (std::find(f.events.begin(), f.events.end(), f.firstCause) == f.events.end()) {
+                d.AddHtml("Began with", LinkTo(f.firstCause, "the first event of this burst"));
+            }
             std::string evidence;
             for (const std::string& line : f.evidence) evidence += Element("li", HtmlText(line));
             list +=

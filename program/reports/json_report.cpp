@@ -19,6 +19,9 @@ public:
     void Finish(const ReportEnd& end) override {
         out_.Write("{\n  \"format\": " + JsonText(kFormatVersion));
         out_.Write(",\n  \"source\": " + JsonText(head_.source));
+        if (!head_.machineType.empty()) {
+            out_.Write(",\n  \"machine_type\": " + JsonText(head_.machineType));
+        }
         out_.Write(",\n  \"collected\": " + JsonText(TimeText(head_.collected)));
         const Outcome outcome = OutcomeOf(end);
         out_.Write(std::string(",\n  \"complete\": ") +

@@ -105,7 +105,10 @@ private:
             success.Sample({{"system", systems_.All()[i].name}}, good ? 1 : 0);
         }
         Metric collected(out_, "collection_timestamp_seconds", "When the collection was made.");
-        collected.Sample({}, static_cast<double>(head_.collected.seconds));
+        for (const SystemInfo& system : systems_.All()) {
+            collected.Sample({{"system", system.name}},
+                             static_cast<double>(head_.collected.seconds));
+        }
         Metric duration(out_, "collection_duration_seconds", "How long the collection took.");
         if (end.seconds) duration.Sample({}, *end.seconds);
     }

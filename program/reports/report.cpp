@@ -40,8 +40,8 @@ void AppendPart(const char* separator, const std::string& part, std::string* tex
 
 std::string NotRead(const char* what, const tqrhost::SourceAccount& account) {
     if (account.Missing() == 0) return {};
-    return std::to_string(account.Missing()) + " of " +
-           std::to_string(*account.announced) + " " + what + " not read";
+    return std::to_string(account.Missing()) + " of " + std::to_string(*account.announced) + " " +
+           what + " not read";
 }
 
 /// The first fault tells why; the report has them all.

@@ -14,8 +14,8 @@
 
 namespace ipmisel {
 
-/// The collection was stopped, and the time that is left for what had been read until then is over: no
-/// instance is taken any more.
+/// The collection was stopped, and the time that is left for what had been read until then is over:
+/// no instance is taken any more.
 bool OutputIsOver();
 
 /// Takes the instances of a collection to the report and counts log records by node on their way.

@@ -162,6 +162,7 @@ tqrhost::NodeCompleteness CompletenessOf(const Json& json) {
 SavedReport::SavedReport(const std::string& file) : file_(file) {
     const Json json = Parse(file, [](const Json&) {});
     head_.source = TextAt(json, "source");
+    head_.machineType = TextAt(json, "machine_type");
     head_.plugin = PluginOf(ObjectAt(json, "plugin"));
     for (const Json& plugin : ListAt(json, "plugins")) {
         end_.plugins.push_back({PluginOf(plugin), StatusOf(plugin)});

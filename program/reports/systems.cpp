@@ -1,10 +1,11 @@
 #include "program/reports/systems.h"
 
 #include <algorithm>
+#include <span>
 
 namespace ipmisel {
 
-Systems::Systems(const ReportHead& head) : systems_(head.systems) {
+Systems::Systems(const ReportHead& head) : systems_(head.systems), known_(head.nodes) {
     systems_.resize(std::max<std::size_t>(1, head.nodes));
 }
 
@@ -27,7 +28,7 @@ const SystemInfo& Systems::Of(Integer node) const {
 
 Json Systems::AsJson() const {
     Json list = Json::array();
-    for (const SystemInfo& system : systems_) {
+    for (const SystemInfo& system : std::span(systems_).first(known_)) {
         Json json = Json::object();
         const auto add = [&json](const char* key, const std::string& text) {
             if (!text.empty()) json[key] = text;

@@ -20,10 +20,12 @@ public:
     /// By node, from 1. A system of no known node has no name.
     const SystemInfo& Of(Integer node) const;
     const std::vector<SystemInfo>& All() const { return systems_; }
+    /// `systems` of a report.
     Json AsJson() const;
 
 private:
-    std::vector<SystemInfo> systems_;
+    std::vector<SystemInfo> systems_;  ///< at least one
+    std::size_t known_;
 };
 
 }  // namespace ipmisel

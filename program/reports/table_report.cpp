@@ -94,17 +94,18 @@ private:
                          when,
                          severity,
                          event.state == "open" ? "open" : "",
-                         part,
+                         part.empty() && event.sensor.empty() ? event.sensorType : part,
                          event.sensor,
-                         WhatText(event),
+                         event.text,
                          ReadingText(event)};
         } else {
             // Without a reading the part says enough; a limit is one of a sensor.
-            const bool ofSensor = event.reading.has_value() && !part.empty();
-            const std::string what =
-                ofSensor ? Listed({event.sensor, WhatText(event)}, ": ") : WhatText(event);
-            row.cells = {when, severity, part.empty() ? event.sensor : part,
-                         Listed({what, ReadingText(event)}, "; ")};
+            const bool ofSensor =
+                event.reading.has_value() && !part.empty() && part != event.sensor;
+            row.cells = {when, severity, SubjectText(event),
+                         Listed({Listed({ofSensor ? event.sensor : "", event.text}, ": "),
+                                 ReadingText(event)},
+                                "; ")};
         }
         for (std::string& cell : row.cells) cell = TerminalText(cell);
         table->Add(row);

@@ -65,8 +65,7 @@ std::string Link(const std::string& row, const std::string& element) {
 }  // namespace
 
 void Timeline::Add(const Event& event, const std::string& row) {
-    std::string text = TerminalText(
-        Listed({event.part.empty() ? event.sensor : event.part, WhatText(event)}, ": "));
+    std::string text = TerminalText(Listed({SubjectText(event), event.text}, ": "));
     if (Columns(text) > kTextColumns) text = Fit(text, kTextColumns - 3) + "...";
     points_.push_back({event.time, event.severity, row, std::move(text), ChangeOf(event)});
 }

@@ -43,8 +43,10 @@ std::string DurationText(double seconds) {
 
 std::string NumberText(double number) { return Format("%.6g", number); }
 
-std::string WhatText(const Event& event) {
-    return (event.IsDeasserted() ? "no longer: " : "") + event.text;
+std::string SubjectText(const Event& event) {
+    const std::string part = PartText(event.part, event.partCandidates);
+    if (!part.empty()) return part;
+    return event.sensor.empty() ? event.sensorType : event.sensor;
 }
 
 std::string ReadingText(const Event& event) {

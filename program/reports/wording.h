@@ -18,8 +18,8 @@ std::string WhenText(const Event& event);
 std::string DurationText(double seconds);
 /// At most six significant digits.
 std::string NumberText(double number);
-/// What happened: "no longer: ..." for a fault that was taken back.
-std::string WhatText(const Event& event);
+/// What an event is about, as closely as it is known: the part, else the sensor, else its type.
+std::string SubjectText(const Event& event);
 /// "80 degrees C, limit 69"; empty without a reading.
 std::string ReadingText(const Event& event);
 /// The part, or the parts of which it is one.

@@ -25,6 +25,7 @@ TEST_F(Collecting, TheJsonReportHoldsEveryPropertyInTheOrderWritten) {
     const Json expected = Json::parse(R"({
         "format": "ipmisel/1",
         "source": "",
+        "machine_type": "SIM-T",
         "collected": "2024-03-05T11:00:00Z",
         "complete": true,
         "systems": [{"name": "server"}],

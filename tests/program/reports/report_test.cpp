@@ -62,10 +62,7 @@ TEST_F(Table, AnEventIsOneLineWhereItFits) {
     hot.properties.insert(
         hot.properties.end(),
         {{"Reading", 80.5}, {"Threshold", 69.0}, {"Unit", std::string("degrees C")}});
-    Instance over = Event(2, "ok", "machine check");
-    for (auto& [name, value] : over.properties) {
-        if (name == "Direction") value = std::string("deasserted");
-    }
+    const Instance over = Event(2, "ok", "no longer: machine check");
     Instance young = Event(3, "", "boot?");
     young.properties.erase(young.properties.begin() + 3, young.properties.begin() + 5);
     young.properties.emplace_back("SecondsSinceStart", std::int64_t{3754});

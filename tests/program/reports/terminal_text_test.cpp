@@ -20,7 +20,8 @@ TEST(Text, NothingSteersATerminalOrBreaksJson) {
         {"  folded \n\t blanks \n", "folded blanks", ""},
         {"Grad \u00B0C \U0001F321", "Grad \u00B0C \U0001F321", ""},
         {"\"quoted\\\"", "\"quoted\\\"", "\"\\\"quoted\\\\\\\"\""},
-        {"\x1b[31m\r\x07\x7f", "\uFFFD[31m\uFFFD\uFFFD\uFFFD", "\"\\u001b[31m\\u000d\\u0007\\u007f\""},
+        {"\x1b[31m\r\x07\x7f", "\uFFFD[31m\uFFFD\uFFFD\uFFFD",
+         "\"\\u001b[31m\\u000d\\u0007\\u007f\""},
         {"\u009B31m", "\uFFFD31m", "\"\\u009b31m\""},          // CSI as one character
         {"\u202Ecba", "\uFFFDcba", "\"\\u202ecba\""},          // right to left
         {"\xF3\xA0\x80\xA1", "\uFFFD", "\"\\udb40\\udc21\""},  // a tag
