@@ -24,7 +24,8 @@ namespace standard {
 struct Parts::Candidate {
     Part part;
     std::vector<EntityKey> entities;
-    std::optional<std::int64_t> made;  ///< seconds since 1970-01-01
+    std::optional<std::int64_t> made;           ///< seconds since 1970-01-01
+    std::optional<unsigned> memoryModule = {};  ///< its number as the controller counts
 };
 
 struct Parts::Found {
@@ -144,6 +145,14 @@ bool MayBeOfOnePart(const ipmi::SelRecord& one, const ipmi::SelRecord& other) {
     const auto first = ipmi::DecodeEventData(one).memoryModule;
     const auto second = ipmi::DecodeEventData(other).memoryModule;
     return !first || !second || *first == *second;
+}
+
+/// Whether the record names that module itself.
+bool IsOfModule(const Event& event, unsigned number) {
+    if (event.data.memoryModule) return *event.data.memoryModule == number;
+    if (event.data.slotType == ipmi::kMemorySlot) return event.data.slotNumber == number;
+    return event.sensor != nullptr && IsMemory(event.sensor->sensor.entity.id) &&
+           event.sensor->sensor.entity.instance == number;
 }
 
 bool MadeAfter(const std::optional<std::int64_t>& made, const ipmi::SelRecord& record) {
@@ -288,13 +297,15 @@ Parts::Found Parts::ByMemoryModule(unsigned number) const {
         found.candidates = {std::move(candidate)};
     }
     found.certain = found.candidates.size() == 1;
-    if (!found.candidates.empty()) return found;
-    for (const auto* module : Counted(facts_.smbios.memoryDevices, number)) {
-        if (module->isInstalled()) found.Add({PartOf(*module), {}, {}});
+    if (found.candidates.empty()) {
+        for (const auto* module : Counted(facts_.smbios.memoryDevices, number)) {
+            if (module->isInstalled()) found.Add({PartOf(*module), {}, {}});
+        }
     }
     if (found.candidates.empty()) {
         found.Add({{ipmisel::Format("Memory Module %u", number), "", ""}, {}, {}});
     }
+    for (Candidate& candidate : found.candidates) candidate.memoryModule = number;
     return found;
 }
 
@@ -352,7 +363,8 @@ std::optional<Parts::Found> Parts::ByEventData(const Event& event) const {
         Found found;
         found.certain = processors.size() == 1;
         if (!found.certain) processors = Counted(all, *data.processorInstance);
-        for (const auto* processor : processors) found.Add({PartOf(*processor), {}, {}});
+        const EntityKey entity({ipmi::entity::kProcessor, *data.processorInstance}, 0, 0);
+        for (const auto* processor : processors) found.Add({PartOf(*processor), {entity}, {}});
         if (!found.candidates.empty()) return found;
     }
     if (data.fruDevice && event.sensorKey().owner == ipmi::kBmcAddress) {
@@ -373,22 +385,27 @@ bool Parts::IsGoneSince(const Event& event, const Candidate& candidate) const {
     if (MadeAfter(candidate.made, event.record)) return true;
     const auto place = placeOf_.find(event.record.bytes);
     if (place == placeOf_.end()) return false;
-    return std::any_of(std::upper_bound(removals_.begin(), removals_.end(), place->second),
-                       removals_.end(), [&](std::size_t at) {
-                           Event removal;
-                           removal.record = node_->log[at];
-                           if (removal.sensorKey() == event.sensorKey() &&
-                               removal.record.sensorType == event.record.sensorType) {
-                               return MayBeOfOnePart(removal.record, event.record);
-                           }
-                           const SensorFacts* const facts = node_->FindSensor(removal.sensorKey());
-                           if (facts == nullptr || !ipmi::IsPhysicalEntity(facts->sensor.entity.id))
-                               return false;
-                           const auto& entities = candidate.entities;
-                           const EntityKey key = KeyOf(facts->sensor);
-                           return std::find(entities.begin(), entities.end(), key) !=
-                                  entities.end();
-                       });
+    const auto later = std::upper_bound(removals_.begin(), removals_.end(), place->second);
+    return std::any_of(later, removals_.end(),
+                       [&](std::size_t at) { return Removes(node_->log[at], event, candidate); });
+}
+
+bool Parts::Removes(const ipmi::SelRecord& record, const Event& event,
+                    const Candidate& candidate) const {
+    Event removal;
+    removal.record = record;
+    removal.data = ipmi::DecodeEventData(record);
+    removal.sensor = node_->FindSensor(removal.sensorKey());
+    if (removal.sensorKey() == event.sensorKey() && record.sensorType == event.record.sensorType) {
+        return MayBeOfOnePart(record, event.record);
+    }
+    if (candidate.memoryModule && IsOfModule(removal, *candidate.memoryModule)) return true;
+    if (removal.sensor == nullptr) return false;
+    const ipmi::Sensor& sensor = removal.sensor->sensor;
+    if (!sensor.name.empty() && sensor.name == candidate.part.name) return true;
+    const auto& entities = candidate.entities;
+    return ipmi::IsPhysicalEntity(sensor.entity.id) &&
+           std::find(entities.begin(), entities.end(), KeyOf(sensor)) != entities.end();
 }
 
 PartEvidence Parts::OfSensor(const ipmi::Sensor& sensor) const {

@@ -55,6 +55,9 @@ private:
 
     /// Whether the part was taken out or exchanged after the event.
     bool IsGoneSince(const Event& event, const Candidate& candidate) const;
+    /// Whether a record that tells of a removal means the event's part.
+    bool Removes(const ipmi::SelRecord& record, const Event& event,
+                 const Candidate& candidate) const;
 
     PartFacts facts_;
     const NodeFacts* node_;

@@ -314,6 +314,28 @@ TEST_F(PartsTest, OneModuleTakenOutIsNotTheOthers) {
     EXPECT_THAT(Texts(OfEvent(1)), ElementsAre("DIMM_2"));
 }
 
+TEST_F(PartsTest, AModuleIsTakenOutByWhateverSensorTellsOfIt) {
+    facts.smbios.memoryDevices = {Module("DIMM_1", "S1"), Module("DIMM_2", "S2")};
+    Sensors({SensorRecord(3, kModule, 2, 0x25), SensorRecord(4, kModule, 1, 0x25)});
+    const struct {
+        std::uint8_t type, sensor, direction, data1, data2, data3;
+        bool gone;
+    } cases[] = {
+        {kMemorySensor, 9, 0xEF, 0x36, 0xFF, 2, true},  // by another sensor, its number
+        {kMemorySensor, 9, 0xEF, 0x36, 0xFF, 1, false},
+        {0x25, 3, 0x6F, 0x01, 0xFF, 0xFF, true},  // by the entity's presence
+        {0x25, 4, 0x6F, 0x01, 0xFF, 0xFF, false},
+    };
+    for (const auto& c : cases) {
+        node.log.clear();
+        Event(kMemorySensor, 0x80, 0x6F, 0x30, 0xFF, 2, 0x01);  // by the firmware
+        Event(c.type, c.sensor, c.direction, c.data1, c.data2, c.data3);
+        EXPECT_THAT(Texts(OfEvent()),
+                    ElementsAre(c.gone ? "DIMM_2" : "DIMM_2, part number M16G, serial number S2"))
+            << int{c.sensor} << " " << int{c.data3};
+    }
+}
+
 TEST_F(PartsTest, AnEventFromBeforeAPartWasMadeHasNotItsNumbers) {
     FruBytes module = Ddr3Image();
     module[120] = 0x26;  // 2026, week 20
