@@ -14,6 +14,9 @@ if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_L
   # At -O3 these compilers take a text put before a std::string for one that overlaps it.
   target_compile_options(ipmisel_flags INTERFACE -Wno-restrict)
 endif()
+if(IPMISEL_LAN)
+  target_compile_definitions(ipmisel_flags INTERFACE IPMISEL_LAN)
+endif()
 if(IPMISEL_M32)
   target_compile_options(ipmisel_flags INTERFACE -m32)
   target_link_options(ipmisel_flags INTERFACE -m32)

@@ -30,7 +30,7 @@ Source OpenInband(const std::vector<std::string>& places, const SourceOptions& o
 /// the missing driver can be reported. `timeout` is how long one request may go unanswered.
 Source OpenInbandDevice(const std::vector<std::filesystem::path>& devices, SystemSmbios smbios,
                         std::chrono::milliseconds timeout);
-#ifdef IPMISEL_FREEIPMI
+#ifdef IPMISEL_LAN
 /// BMCs over the network, each HOST, HOST:PORT, [ADDRESS] or [ADDRESS]:PORT. The sessions are
 /// opened together.
 Source OpenLan(const std::vector<std::string>& places, const SourceOptions& options);

@@ -24,7 +24,7 @@ struct Kind {
 
 constexpr Kind kKinds[] = {
     {"inband", "inband", false, OpenInband},
-#ifdef IPMISEL_FREEIPMI
+#ifdef IPMISEL_LAN
     {"lan:", "lan:HOST[:PORT]", true, OpenLan},
 #else
     {"lan:", "lan:HOST[:PORT]", true, nullptr},
@@ -88,7 +88,7 @@ Source OpenSources(const std::vector<std::string>& sources, const SourceOptions&
     return kind.open(places, askOnce);
 }
 
-#ifndef IPMISEL_FREEIPMI
+#ifndef IPMISEL_LAN
 std::span<const WorkaroundInfo> KnownWorkarounds() { return {}; }
 #endif
 

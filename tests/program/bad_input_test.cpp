@@ -84,7 +84,7 @@ TEST_F(BadInput, SourcesThatDoNotOpen) {
     if (!std::filesystem::exists("/dev/ipmi0")) {
         ExpectRefused({"collect", "--output", InPlace("report")}, 3, "--from");
     }
-#ifdef IPMISEL_FREEIPMI
+#ifdef IPMISEL_LAN
     const std::string lan = "lan:127.0.0.1:1";
     refused(lan, 2, "--password-file");
     refused(lan, 2, "empty", {"--password-file", folder.Write("empty", "")});

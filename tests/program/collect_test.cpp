@@ -135,7 +135,7 @@ TEST_F(Collecting, HelpAndVersionAreTheOutputThatWasAskedFor) {
     const Ended help = Run({"collect", "--help"});
     EXPECT_EQ(help.exitStatus, 0);
     EXPECT_THAT(help.out, AllOf(HasSubstr("table, json, ndjson"), HasSubstr("replay:FILE")));
-#ifdef IPMISEL_FREEIPMI
+#ifdef IPMISEL_LAN
     EXPECT_THAT(help.out, HasSubstr("\n  opensesspriv "));
 #endif
     EXPECT_THAT(Run({"--version"}).out, MatchesRegex("ipmisel [0-9.]+\n"));
@@ -293,8 +293,8 @@ TEST_F(Slow, ASecondSignalEndsItAtOnceAndLeavesNothing) {
 }
 
 TEST_F(Collecting, ThePasswordComesFromAFileOrIsAskedForUnseen) {
-#ifndef IPMISEL_FREEIPMI
-    GTEST_SKIP() << "built without FreeIPMI";
+#ifndef IPMISEL_LAN
+    GTEST_SKIP() << "built without access over the network";
 #endif
     if (!IpmiSim::Missing().empty()) GTEST_SKIP() << IpmiSim::Missing();
     const IpmiSim sim({});

@@ -48,7 +48,7 @@ TEST(Sources, WhatIsOfNoKindOrCannotBeJoinedIsRefused) {
     EXPECT_THAT(Refusal({"sim:"}), HasSubstr("write it as sim:FILE"));
     EXPECT_THAT(Refusal({"sim:a", "sim:b"}), HasSubstr("\"sim:a\" stands alone"));
     EXPECT_THAT(Refusal({"sim:/nonexistent"}), HasSubstr("cannot be read"));
-#ifndef IPMISEL_FREEIPMI
+#ifndef IPMISEL_LAN
     EXPECT_THAT(Refusal({"lan:h"}), StartsWith("this build has no source \"lan:h\""));
 #endif
 }

@@ -1,0 +1,32 @@
+#pragma once
+
+#include <string>
+
+namespace tqrhost {
+
+/// Why a session with a BMC cannot be opened.
+enum class OpeningError {
+    kNameUnknown,
+    kNameServerSilent,
+    kOutOfDescriptors,
+    kNetwork,
+    kPortClosed,
+    kNoAnswer,
+    kNoIpmi20,
+    kNoCipherSuite,
+    kUserUnknown,
+    kPasswordWrong,
+    kSilentAtPassword,
+    kKgWrong,
+    kPrivilegeRefused,
+    kBusy,
+    kRefused,
+    kProtocolBroken,
+    kSessionNumbers,
+    kStopped,
+};
+
+/// One line for the user: what failed at `place` and what to do.
+std::string Advice(const std::string& place, OpeningError error);
+
+}  // namespace tqrhost
