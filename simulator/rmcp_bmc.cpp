@@ -238,7 +238,12 @@ Packet RmcpBmc::Rakp2(const Packet& payload) {
     s->consoleRandom = Cut(payload, 8, 16);
     s->bmcRandom = Packet(16, static_cast<std::uint8_t>(sessionsOpened_));
     s->who = s->whoInRakp3 = Join({Cut(payload, 24, 1), Cut(payload, 27, 1), name});
-    if (options_.deviations.paddedUserName) s->whoInRakp3[0] &= 0x0F;
+    if (options_.deviations.paddedUserName) {
+        const Packet bare = Text(kUser);
+        s->whoInRakp3 = Join({{static_cast<std::uint8_t>(payload[24] & 0x0F)},
+                              Number(static_cast<std::uint32_t>(bare.size()), 1),
+                              bare});
+    }
     const Algorithms ours = AlgorithmsOf(options_.cipherSuite);
     const Crypto byPassword(ours.sha1(), Text(kPassword));
     const Crypto byKey(ours.sha1(), Text(options_.kg.empty() ? kPassword : options_.kg));

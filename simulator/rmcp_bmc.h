@@ -20,7 +20,7 @@ constexpr const char* kPassword = "secret";
 /// What a BMC does otherwise than the standard has it.
 struct RmcpDeviations {
     bool paddedUserName =
-        false;                   ///< codes over the name padded to 16 bytes; RAKP 3 without its bit
+        false;  ///< to 16 bytes; but for RAKP 3, which has not the name's bit either
     bool longRakp2Code = false;  ///< one byte too many
     bool noPrivilege = false;    ///< Open Session grants none
     bool noIpmi20 = false;       ///< denied in the capabilities

@@ -197,10 +197,9 @@ Codec::Codec(const Credentials& credentials, const CipherSuite& suite)
 Codec::~Codec() { Wipe(plain_); }
 
 /// Role, length of the user name, user name: what several codes are made over (13.31).
-std::array<std::uint8_t, 18> Codec::Role(bool nameOnly) const {
+std::array<std::uint8_t, 18> Codec::Role() const {
     std::array<std::uint8_t, 18> role{};
-    role[0] =
-        static_cast<std::uint8_t>(credentials_.privilege | (nameOnly ? kLookupByNameOnly : 0));
+    role[0] = static_cast<std::uint8_t>(credentials_.privilege | kLookupByNameOnly);
     role[1] = static_cast<std::uint8_t>(nameLength_);
     const ByteView name = Bytes(credentials_.user);
     std::copy_n(name.begin(), std::min(name.size(), kMaxUserName), role.begin() + 2);
@@ -270,7 +269,7 @@ Check Codec::ParseOpenSession(ByteView packet, std::uint8_t tag) {
 }
 
 Packet Codec::Rakp1(std::uint8_t tag) {
-    const auto role = Role(true);
+    const auto role = Role();
     Packet packet = SetupPacket(kRakp1, 28 + nameLength_);
     packet.U8(tag).Fill(3, 0).Append(managedId_).Append(consoleRandom_);
     packet.U8(role[0]).Fill(2, 0).Append(RoleBytes(role).subspan(1));
@@ -285,7 +284,7 @@ Check Codec::ParseRakp2(ByteView packet, std::uint8_t tag) {
     if (check != Check::kGood) return check;
     std::copy_n(&(*payload)[kRandomAt], managedRandom_.size(), managedRandom_.begin());
     std::copy_n(&(*payload)[kGuidAt], guid_.size(), guid_.begin());
-    const auto role = Role(true);
+    const auto role = Role();
     const Hmac::Code code = keyedByPassword_.Compute(
         {consoleId_, managedId_, consoleRandom_, managedRandom_, guid_, RoleBytes(role)});
     ByteView sent = payload->subspan(kCodeAt);
@@ -298,8 +297,15 @@ Check Codec::ParseRakp2(ByteView packet, std::uint8_t tag) {
 }
 
 Packet Codec::Rakp3(std::uint8_t tag) {
-    const auto role = Role(!credentials_.deviations.paddedUserName);
-    const Hmac::Code code = keyedByPassword_.Compute({managedRandom_, consoleId_, RoleBytes(role)});
+    auto role = Role();
+    std::size_t nameLength = nameLength_;
+    if (credentials_.deviations.paddedUserName) {
+        nameLength = std::min(credentials_.user.size(), kMaxUserName);
+        role[0] = credentials_.privilege;
+        role[1] = static_cast<std::uint8_t>(nameLength);
+    }
+    const Hmac::Code code = keyedByPassword_.Compute(
+        {managedRandom_, consoleId_, ByteView(role).first(2 + nameLength)});
     Packet packet = SetupPacket(kRakp3, 8 + keyedByPassword_.length());
     packet.U8(tag).U8(status::kNoErrors).Fill(2, 0).Append(managedId_);
     packet.Append(ByteView(code).first(keyedByPassword_.length()));
@@ -310,7 +316,7 @@ Packet Codec::Rakp3(std::uint8_t tag) {
 /// 13.31, 13.32: the session integrity key by the BMC's key or, without one, the password; from it
 /// K1 for integrity and K2 for confidentiality.
 void Codec::ComputeKeys() {
-    const auto role = Role(true);
+    const auto role = Role();
     const std::initializer_list<ByteView> over = {consoleRandom_, managedRandom_, RoleBytes(role)};
     Hmac sessionKey(DigestOf(suite_));
     const std::size_t length = sessionKey.length();

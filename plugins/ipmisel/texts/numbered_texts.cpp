@@ -5,6 +5,7 @@
 
 #include <array>
 #include <cerrno>
+#include <map>
 #include <utility>
 
 #include "base/text.h"
@@ -71,6 +72,24 @@ std::string_view FindPiece(std::string_view contents, std::string_view key) {
     }
 }
 
+/// What was found in the file, for as long as the bytes that are read are the same.
+class FoundTexts {
+public:
+    const std::string& Find(std::string_view contents, int number, std::size_t capacity) {
+        if (contents != contents_) {
+            contents_ = contents;
+            texts_.clear();
+        }
+        const auto [at, isNew] = texts_.try_emplace({number, capacity});
+        if (isNew) at->second = FindNumberedText(contents, number, capacity);
+        return at->second;
+    }
+
+private:
+    std::string contents_;
+    std::map<std::pair<int, std::size_t>, std::string> texts_;
+};
+
 }  // namespace
 
 std::string FindNumberedText(std::string_view contents, int number, std::size_t capacity) {
@@ -114,7 +133,8 @@ std::optional<std::string> NumberedText(NQORTQR20::TCPluginCallbacks* context, i
                                   path.c_str(), number));
         return std::nullopt;
     }
-    std::string text = FindNumberedText(*contents, number, capacity);
+    static thread_local FoundTexts found;
+    const std::string& text = found.Find(*contents, number, capacity);
     if (text.empty()) {
         WriteLog(kError, Format("Could not find data_number %d", number));
         return std::nullopt;
