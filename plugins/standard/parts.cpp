@@ -385,7 +385,8 @@ bool Parts::IsGoneSince(const Event& event, const Candidate& candidate) const {
     if (MadeAfter(candidate.made, event.record)) return true;
     const auto place = placeOf_.find(event.record.bytes);
     if (place == placeOf_.end()) return false;
-    const auto later = std::upper_bound(removals_.begin(), removals_.end(), place->second);
+    // The removal itself is about the part that went, too.
+    const auto later = std::lower_bound(removals_.begin(), removals_.end(), place->second);
     return std::any_of(later, removals_.end(),
                        [&](std::size_t at) { return Removes(node_->log[at], event, candidate); });
 }

@@ -302,6 +302,9 @@ TEST_F(PartsTest, AnEventFromBeforeAPartWasTakenOutHasNoNumbersOfTheNewOne) {
         Event(c.type, c.sensor, c.direction, c.offset);
         Event(kSupplySensor, 1, 0x6F, 0x01);
         EXPECT_THAT(Texts(OfEvent(0)), ElementsAre(c.gone ? "PS 1" : kNew)) << int{c.sensor};
+        if (c.gone) {
+            EXPECT_THAT(Texts(OfEvent(1)), ElementsAre("PS 1")) << int{c.sensor};
+        }
         EXPECT_THAT(Texts(OfEvent(2)), ElementsAre(kNew));
     }
 }
