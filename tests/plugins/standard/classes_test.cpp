@@ -68,6 +68,7 @@ protected:
         auto server = ipmisim::ParseServer(json, "test");
         tqrhost::Source source;
         source.facts.localTime = server.localTime;
+        source.facts.smbios = server.smbios;
         for (auto& bmc : server.bmcs) {
             source.nodes.push_back(
                 {"sim",
@@ -77,10 +78,10 @@ protected:
         tqrhost::OpenMachine(std::move(source));
         written.instances.clear();
         const tqrhost::OutputHandle output(written);
-        EXPECT_EQ(
-            GetData(nullptr, output.get(), classNames.data(), static_cast<int>(classNames.size()))
-                .code,
-            NQORTQR20::kStatusOk);
+        EXPECT_EQ(GetData(context.get(), output.get(), classNames.data(),
+                          static_cast<int>(classNames.size()))
+                      .code,
+                  NQORTQR20::kStatusOk);
         std::vector<std::map<std::string, std::string>> all;
         for (const auto& instance : written.instances) {
             auto& properties = all.emplace_back();
@@ -91,6 +92,7 @@ protected:
 
     ipmiseltest::InstanceRecorder written;
     std::vector<std::vector<std::uint8_t>> requests;
+    tqrhost::PluginContext context{"/nowhere"};
 };
 
 TEST_F(StandardClasses, AControllerTellsWhatItIsAndHowItIs) {
@@ -122,6 +124,22 @@ TEST_F(StandardClasses, AControllerTellsWhatItIsAndHowItIs) {
     EXPECT_THAT(all[1],
                 ElementsAre(Pair("ClockOffsetSeconds", "0"), Pair("ClockUncertaintySeconds", "0.5"),
                             Pair("Node", "2"), Pair("Time", "2024-03-05T12:00:00Z")));
+}
+
+TEST_F(StandardClasses, TheSystemIsKnownBySmbiosOrByItsInventory) {
+    // Type 1: manufacturer, product, version, serial number; the identity that the controller sends
+    // the other way round.
+    const std::string smbios = R"("smbios": ["011b0100 01020304 03020100 0504 0706 08090a0b0c0d0e0f
+        060000 4d616b657200 426f7800 3100 534e3700 00"])";
+    std::string oneLine = smbios;
+    oneLine.erase(oneLine.find('\n'), 1);
+    const auto all = Collect("{" + oneLine + R"(, "bmcs": [{
+        "guid": "0f0e0d0c 0b0a 0908 0706 050403020100"}]})",
+                             {"IPMI_Controller"});
+    EXPECT_EQ(all.at(0).at("SystemManufacturer"), "Maker");
+    EXPECT_EQ(all[0].at("SystemProduct"), "Box");
+    EXPECT_EQ(all[0].at("SystemSerialNumber"), "SN7");
+    EXPECT_EQ(all[0].at("GUIDOrder"), "IPMI");
 }
 
 TEST_F(StandardClasses, TheEventLogAsAWhole) {
@@ -170,6 +188,7 @@ TEST_F(StandardClasses, SensorsWithReadingLimitsAndStates) {
         {"UpperNonRecoverable", "90"},
         {"States", "[at or above upper non-critical threshold]"},
         {"Status", "warning"},
+        {"Part", "Processor 1"},
     };
     for (const auto& [name, value] : temperature) EXPECT_EQ(all[0].at(name), value) << name;
     EXPECT_EQ(all[0].count("NormalMaximum"), 0u);
@@ -313,8 +332,8 @@ TEST_F(StandardClasses, AHostThatRefusesEndsThePass) {
     tqrhost::OpenMachine(std::move(source));
     const tqrhost::OutputHandle output(written);
     const char* names[] = {"IPMI_Sensor"};
-    EXPECT_EQ(GetData(nullptr, output.get(), names, 1).code, NQORTQR20::kStatusFailed);
-    EXPECT_EQ(GetData(nullptr, output.get(), nullptr, 0).code, NQORTQR20::kStatusOk);
+    EXPECT_EQ(GetData(context.get(), output.get(), names, 1).code, NQORTQR20::kStatusFailed);
+    EXPECT_EQ(GetData(context.get(), output.get(), nullptr, 0).code, NQORTQR20::kStatusOk);
 }
 
 TEST(SensorStatus, StatesAreJudgedByTheirSeverity) {
