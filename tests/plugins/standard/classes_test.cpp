@@ -309,16 +309,48 @@ TEST_F(StandardClasses, ASystemIsNamedByItsInventoryAndEachDeviceReadOnce) {
         << "no repository for device 0";
 }
 
+/// A controller with a log of 512 temperature events, all taken back but those of sensor 1, and 100
+/// sensors with thresholds.
+std::string LargeServer() {
+    std::string entries, sensors;
+    for (int i = 1; i <= 512; ++i) {
+        const int number = i <= 2 ? 1 : 2 + (i - 3) / 2 % 99;
+        const bool back = i > 2 && i % 2 == 0;
+        entries += ipmisel::Format("%s\"%02x%02x 02 b0e5e665 2000 04 01 %02x %02x 595a50\"",
+                                   i == 1 ? "" : ", ", i & 0xFF, i >> 8, number, back ? 0x81 : 1);
+    }
+    for (int i = 1; i <= 100; ++i) {
+        sensors += ipmisel::Format(
+            "%s\"%02x00 51 01 2d 2000%02x 0301 7f680101 00000000 3f00 800100 00 0100 00 00 00 00 "
+            "00 "
+            "000000 0000 645f5a050a0f 0203 000000 c2 4130\"",
+            i == 1 ? "" : ", ", i, i);
+    }
+    return "{\"bmcs\": [{\"sel\": {\"entries\": [" + entries + "]}, \"sdr\": {\"records\": [" +
+           sensors + "]}}]}";
+}
+
 TEST_F(StandardClasses, EachRecordIsReadOnceForAllClasses) {
-    Collect(kServer, {"IPMI_Controller", "IPMI_EventLog", "IPMI_Sensor", "IPMI_Sensor"});
     const auto sent = [&](ipmi::CommandCode code) {
         return std::count_if(requests.begin(), requests.end(), [&](const auto& frame) {
             return frame[2] == code.netFn && frame[4] == code.number;
         });
     };
-    EXPECT_EQ(sent(ipmi::kGetSdr), 3);
-    EXPECT_EQ(sent(ipmi::kGetSensorReading), 3);
-    EXPECT_EQ(sent(ipmi::kGetSelInfo), 2);  // one for each node
+    std::vector<const char*> all;
+    for (std::uint32_t i = 0; i < fdrPluginClasses.classCount; ++i) {
+        all.push_back(fdrPluginClasses.classes[i].name);
+    }
+    Collect(LargeServer(), all);
+    EXPECT_EQ(sent(ipmi::kGetSelEntry), 512);
+    EXPECT_EQ(sent(ipmi::kGetSdr), 100);
+    EXPECT_EQ(sent(ipmi::kGetSensorReading), 100);
+    EXPECT_EQ(sent(ipmi::kGetSensorThresholds), 100);
+    EXPECT_LE(requests.size(), 512u + 100 + 100 + 100 + 24);
+    // For the events alone only the sensor is read whose problem is open.
+    requests.clear();
+    EXPECT_THAT(Collect(LargeServer(), {"IPMI_Event"}), SizeIs(512));
+    EXPECT_EQ(sent(ipmi::kGetSensorReading), 1);
+    EXPECT_LE(requests.size(), 512u + 100 + 2 + 24);
 }
 
 TEST_F(StandardClasses, AHostThatRefusesEndsThePass) {

@@ -144,6 +144,28 @@ TEST_F(NodeTest, ASensorThatGivesNothingHasNoReading) {
     }
 }
 
+TEST_F(NodeTest, ASensorThatTheControllerRefusesOrDoesNotAnswerForIsNoHarm) {
+    const struct {
+        const char* fault;
+        bool unavailable;
+    } cases[] = {{R"("completion_code": "d5")", true},
+                 {R"("completion_code": "cb")", true},
+                 {R"("no_response": true)", false},
+                 {R"("truncate": 1)", false}};
+    for (const auto& c : cases) {
+        const auto node = Open("{" + Repository({kTemperature, kSupply}) + R"(,
+            "sensors": {"30": {"reading": "59", "thresholds": "3f 05 0a 0f 50 5a 64"},
+                        "20/1/40": {"states": "c0 01 80"}},
+            "faults": [{"netfn": "04", "command": "2d", "call": 1, )" +
+                               c.fault + "}]}");
+        const SensorState& state = node->StateOf(node->Sensors().at(0));
+        EXPECT_EQ(state.unavailable, c.unavailable) << c.fault;
+        EXPECT_FALSE(state.reading || state.value) << c.fault;
+        EXPECT_EQ(state.limits[5], 90) << c.fault;  // its limits can be had all the same
+        EXPECT_TRUE(node->StateOf(node->Sensors().at(1)).reading) << c.fault;
+    }
+}
+
 TEST_F(NodeTest, ANonLinearSensorIsConvertedByTheFactorsOfEachReading) {
     std::string record = kTemperature;
     record.replace(record.find("01 00 00 01 00 f6"), 8, "01 00 70");
@@ -198,6 +220,16 @@ TEST_F(NodeTest, ARecordOfWhichThePartsFailKeepsWhatCame) {
     const auto never = Open("{\"whole_sdr\": false, " + Repository({kTemperature}) + R"(,
         "faults": [{"netfn": "0a", "command": "23", "completion_code": "c5"}]})");
     EXPECT_THAT(never->Sensors(), IsEmpty());
+}
+
+TEST_F(NodeTest, ARepositoryThatChangesWhileItIsReadKeepsWhatCame) {
+    const auto gone = Open("{" + Repository({kTemperature, kSupply, kForeign}) + R"(, "faults": [
+        {"netfn": "0a", "command": "23", "call": 2, "completion_code": "cb"}]})");
+    EXPECT_THAT(gone->Sensors(), SizeIs(1));
+    // Records that do not end: each leads to the next, and the last to the first.
+    const auto circle = Open("{" + Repository({kTemperature, kSupply}) + R"(, "faults": [
+        {"netfn": "0a", "command": "23", "call": 2, "data": "0100 0200 51 c0 03 570100"}]})");
+    EXPECT_THAT(circle->Repository(), SizeIs(2));
 }
 
 TEST_F(NodeTest, EventFiltersAreReadInTheirOrder) {
