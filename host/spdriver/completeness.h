@@ -34,6 +34,11 @@ struct NodeCompleteness {
     SourceAccount log;
     SourceAccount sensors;
     std::vector<ReadFault> faults;
+    // What else was asked for, of which the controller did not say that it does not have it; a
+    // fault of these is no fault of log or sensors.
+    SourceAccount controller = {};  ///< facts: identity, clock, chassis, event filters
+    SourceAccount readings = {};    ///< sensors that were read
+    SourceAccount inventory = {};   ///< FRU devices, read to their ends
     /// Event log and sensor repository were read as far as they were announced, without a fault,
     /// and exported as far as they were read.
     bool Whole() const;

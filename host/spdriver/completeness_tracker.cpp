@@ -51,6 +51,9 @@ std::optional<Response> CompletenessTracker::Exchange(const RequestFrame& reques
     // Not even a completion code: nothing came.
     if (response && response->empty()) response.reset();
     if (request.netFn() == ipmi::kNetFnStorage) Note(request, response);
+    auto fault = facts_.Note(request, response,
+                             [&](std::size_t least) { return ProblemOf(response, least); });
+    if (fault) AddFault(*std::move(fault));
     return response;
 }
 
@@ -87,6 +90,9 @@ void CompletenessTracker::Note(const RequestFrame& request,
 const NodeCompleteness& CompletenessTracker::Completeness() {
     FinishWalk(&log_);
     FinishWalk(&sensors_);
+    account_.controller = facts_.controller();
+    account_.readings = facts_.readings();
+    account_.inventory = facts_.inventory();
     return account_;
 }
 

@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "host/spdriver/completeness.h"
+#include "host/spdriver/fact_tracker.h"
 #include "host/spdriver/loop_guard.h"
 #include "host/spdriver/transport.h"
 
@@ -66,6 +67,7 @@ private:
     NodeCompleteness account_;
     Source log_;
     Source sensors_;
+    FactTracker facts_;
     std::uint8_t lastCommand_ = 0;  ///< Storage command
     /// What of Get SEL Info tells that the log has changed.
     struct LogState {

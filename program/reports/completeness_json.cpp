@@ -29,6 +29,9 @@ Json CompletenessJson(const ReportEnd& end) {
         if (!account.source.empty()) json["source"] = account.source;
         json["log"] = std::move(log);
         json["sensors"] = AccountJson(account.sensors);
+        for (const auto& [key, asked] : kAskedAccounts) {
+            if ((account.*asked).announced) json[key] = AccountJson(account.*asked);
+        }
         json["faults"] = std::move(faults);
         nodes.push_back(std::move(json));
     }

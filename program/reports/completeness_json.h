@@ -1,9 +1,19 @@
 #pragma once
 
+#include <array>
+#include <utility>
+
 #include "program/reports/json_text.h"
 #include "program/reports/report.h"
 
 namespace ipmisel {
+
+/// What a node's object has beside log and sensors, where it was asked for.
+inline constexpr std::array<
+    std::pair<const char*, tqrhost::SourceAccount tqrhost::NodeCompleteness::*>, 3>
+    kAskedAccounts{{{"controller", &tqrhost::NodeCompleteness::controller},
+                    {"readings", &tqrhost::NodeCompleteness::readings},
+                    {"inventory", &tqrhost::NodeCompleteness::inventory}}};
 
 /// `completeness` of a report, an object per node.
 Json CompletenessJson(const ReportEnd& end);

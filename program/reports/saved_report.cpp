@@ -8,6 +8,7 @@
 #include <limits>
 
 #include "program/commands/failure.h"
+#include "program/reports/completeness_json.h"
 #include "program/reports/json_text.h"
 #include "program/reports/view.h"
 
@@ -150,6 +151,9 @@ tqrhost::NodeCompleteness CompletenessOf(const Json& json) {
     node.source = TextAt(json, "source");
     node.log = AccountOf(ObjectAt(json, "log"));
     node.sensors = AccountOf(ObjectAt(json, "sensors"));
+    for (const auto& [key, asked] : kAskedAccounts) {
+        if (json.contains(key)) node.*asked = AccountOf(ObjectAt(json, key));
+    }
     for (const Json& fault : ListAt(json, "faults")) {
         const std::string what = TextAt(fault, "what");
         node.faults.push_back({what, TextAt(fault, "record"), TextAt(fault, "problem"), false});

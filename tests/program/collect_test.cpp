@@ -51,7 +51,8 @@ TEST_F(Collecting, TheJsonReportHoldsEveryPropertyInTheOrderWritten) {
         "notices": [],
         "completeness": [{"node": 1, "source": "",
             "log": {"announced": 1, "read": 1, "exported": 1},
-            "sensors": {"announced": 1, "read": 1}, "faults": []}]})");
+            "sensors": {"announced": 1, "read": 1},
+            "controller": {"announced": 1, "read": 1}, "faults": []}]})");
     Json report = Json::parse(ended.out);
     for (Json* text : {&report["source"], &report["completeness"][0]["source"]}) {
         EXPECT_EQ(*text, source);

@@ -1,6 +1,7 @@
 #include <array>
 
 #include "host/spdriver/completeness.h"
+#include "ipmi/command.h"
 #include "tests/support/bmc_fixture.h"
 
 namespace {
@@ -17,6 +18,19 @@ protected:
         std::copy(data.begin(), data.end(), buffer.begin() + 9);
         int length = 256;
         Library()->sendIPMICommand(buffer.data(), &length, 256, true);
+    }
+    /// Any other command.
+    void Ask(const ipmi::Command& command) {
+        std::array<unsigned char, 256> buffer{0x01, 0x20, command.netFn, command.lun,
+                                              command.command};
+        buffer[5] = static_cast<unsigned char>(command.data.size());
+        std::copy(command.data.begin(), command.data.end(), buffer.begin() + 9);
+        int length = 256;
+        Library()->sendIPMICommand(buffer.data(), &length, 256, true);
+    }
+    static std::string Counts(const tqrhost::SourceAccount& account) {
+        return (account.announced ? std::to_string(*account.announced) : "-") + "/" +
+               std::to_string(account.read);
     }
     void ReadLog() {
         Send(0x40);
@@ -78,6 +92,45 @@ TEST_F(Completeness, ASensorRecordInPartsIsAsGoodAsAWholeOne) {
     Send(0x23, {1, 0, 1, 0, 8, 2});
     EXPECT_EQ(Faults(), Texts{});
     EXPECT_TRUE(Account().Whole());
+}
+
+TEST_F(Completeness, FactsCountOnceUnlessTheControllerDoesNotHaveThem) {
+    bmc.deviceId = ipmisim::Bytes(11, 0x20);
+    bmc.selfTest = ipmisim::Bytes{0x55};  // cut
+    for (int i = 0; i < 2; ++i) {
+        Ask(ipmi::GetDeviceId());
+        Ask(ipmi::GetSelfTestResults());
+        Ask(ipmi::GetChassisStatus());  // C1h
+        Ask(ipmi::GetPefConfigurationParameters(ipmi::kPefEventFilterCount));
+    }
+    EXPECT_EQ(Counts(Account().controller), "2/1");
+    EXPECT_EQ(Faults(), Texts{"Get Self Test Results : short answer"});
+    EXPECT_TRUE(Account().Whole());  // nothing is missing of log or sensors
+}
+
+TEST_F(Completeness, SensorReadingsCountByLunAndNumber) {
+    bmc.sensors[{0x20, 0, 0x30}] = {.reading = 1, .states = {}, .thresholds = {}, .factors = {}};
+    bmc.sensors[{0x20, 1, 0x30}] = {
+        .reading = 1, .states = ipmisim::Bytes{}, .thresholds = {}, .factors = {}};
+    Ask(ipmi::GetSensorReading(0x30));
+    Ask(ipmi::GetSensorReading(0x30));
+    Ask(ipmi::GetSensorReading(0x30, 1));  // one byte
+    Ask(ipmi::GetSensorReading(0x31));     // not there, as it says
+    EXPECT_EQ(Counts(Account().readings), "3/1");
+    EXPECT_EQ(Faults(), Texts{"Get Sensor Reading 0130: short answer"});
+}
+
+TEST_F(Completeness, AnInventoryDeviceIsReadWhenItsEndIs) {
+    bmc.fru[3] = ipmisim::Bytes(40, 0xAA);
+    Ask(ipmi::GetFruInventoryAreaInfo(4));  // absent
+    Ask(ipmi::GetFruInventoryAreaInfo(3));
+    Ask(ipmi::ReadFruData(3, 0, 32));
+    EXPECT_EQ(Counts(Account().inventory), "1/0");
+    Ask(ipmi::ReadFruData(3, 33, 7));  // leaves a gap
+    EXPECT_EQ(Counts(Account().inventory), "1/0");
+    Ask(ipmi::ReadFruData(3, 32, 32));
+    EXPECT_EQ(Counts(Account().inventory), "1/1");
+    EXPECT_EQ(Faults(), Texts{});
 }
 
 TEST_F(Completeness, AQuestionAnsweredAtTheSecondTryLeavesNothingOut) {

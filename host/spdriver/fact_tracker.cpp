@@ -1,0 +1,121 @@
+#include "host/spdriver/fact_tracker.h"
+
+#include <algorithm>
+
+#include "base/text.h"
+#include "ipmi/command.h"
+#include "ipmi/fru_device_reader.h"
+
+namespace tqrhost {
+namespace {
+
+/// Facts of the controller, and the least that their answers hold, completion code included.
+struct Fact {
+    ipmi::CommandCode code;
+    std::size_t least;
+};
+constexpr Fact kControllerFacts[] = {
+    {ipmi::kGetDeviceId, 12},
+    {ipmi::kGetSelfTestResults, 3},
+    {ipmi::kGetSystemGuid, 17},
+    {ipmi::kGetDeviceGuid, 17},
+    {ipmi::kGetChassisStatus, 4},
+    {ipmi::kGetSelTime, 5},
+    {ipmi::kGetSelTimeUtcOffset, 3},
+    {ipmi::kGetSelAllocationInfo, 10},
+    {ipmi::kGetPefConfigurationParameters, 3},
+};
+constexpr Fact kSensorFacts[] = {
+    {ipmi::kGetSensorReading, 3},
+    {ipmi::kGetSensorThresholds, 8},
+    {ipmi::kGetSensorReadingFactors, 8},
+};
+
+const Fact* FindFact(std::span<const Fact> facts, ipmi::CommandCode code) {
+    const auto fact = std::find_if(facts.begin(), facts.end(),
+                                   [&](const Fact& known) { return known.code == code; });
+    return fact == facts.end() ? nullptr : &*fact;
+}
+
+/// A controller that does not know a command does not have the fact.
+bool IsUnknown(ipmi::CommandCode command, std::uint8_t completionCode) {
+    constexpr std::uint8_t kParameterNotSupported = 0x80;
+    return completionCode == ipmi::kInvalidCommand || completionCode == ipmi::kInvalidForLun ||
+           (command == ipmi::kGetPefConfigurationParameters &&
+            completionCode == kParameterNotSupported);
+}
+
+std::string Key(ipmi::CommandCode code, unsigned which) {
+    return ipmisel::Format("%02x%02x %04x", code.netFn, code.number, which);
+}
+
+}  // namespace
+
+std::optional<ReadFault> FactTracker::Note(const RequestFrame& request,
+                                           const std::optional<Response>& response,
+                                           const ProblemOf& problemOf) {
+    const ipmi::CommandCode code{request.netFn(), request.command()};
+    const auto data = request.data();
+    const std::uint8_t first = data.empty() ? 0 : data[0];
+    const std::string name(ipmi::CommandName(code));
+    if (response && IsUnknown(code, response->front())) return std::nullopt;
+    if (const Fact* fact = FindFact(kControllerFacts, code)) {
+        const unsigned which = data.size() < 2 ? first : first << 8 | data[1];
+        const std::string problem = problemOf(fact->least);
+        Count(&controller_, Key(code, which), problem.empty());
+        if (!problem.empty()) return ReadFault{name, "", problem, false};
+    } else if (const Fact* sensor = FindFact(kSensorFacts, code)) {
+        const unsigned which = static_cast<unsigned>(request.lun()) << 8 | first;
+        const std::string problem = problemOf(sensor->least);
+        if (code == ipmi::kGetSensorReading) Count(&readings_, Key(code, which), problem.empty());
+        // That the sensor is not there is an answer.
+        if (!problem.empty() && !(response && response->front() == ipmi::kNotPresent)) {
+            return ReadFault{name, ipmisel::Format("%04x", which), problem, false};
+        }
+    } else if (code == ipmi::kGetFruInventoryAreaInfo) {
+        if (response && response->front() == ipmi::kNotPresent) return std::nullopt;
+        constexpr std::size_t kLeast = 4;
+        const std::string problem = problemOf(kLeast);
+        if (problem.empty()) {
+            NoteArea(first, *response);
+        } else {
+            Count(&inventory_, Key(code, first), false);
+            return ReadFault{name, ipmisel::Format("%04x", first), problem, false};
+        }
+    } else if (code == ipmi::kReadFruData && response && response->front() == ipmi::kCompleted) {
+        NoteData(first, request, *response);
+    }
+    return std::nullopt;
+}
+
+void FactTracker::Count(SourceAccount* account, const std::string& key, bool isRead) {
+    const auto [known, isNew] = seen_.try_emplace(key, false);
+    if (isNew) account->announced = account->announced.value_or(0) + 1;
+    if (isRead && !known->second) ++account->read;
+    known->second = known->second || isRead;
+}
+
+void FactTracker::NoteArea(std::uint8_t device, const Response& response) {
+    const auto info = ipmi::ParseFruAreaInfo(std::span(response).subspan(1));
+    if (!info) return;
+    Device& known = devices_[device];
+    known.size = info->size;
+    known.unit = info->byWords ? 2 : 1;
+    Count(&inventory_, Key(ipmi::kGetFruInventoryAreaInfo, device), known.read >= known.size);
+}
+
+void FactTracker::NoteData(std::uint8_t device, const RequestFrame& request,
+                           const Response& response) {
+    const auto known = devices_.find(device);
+    if (known == devices_.end() || request.data().size() < 3 || response.size() < 2) return;
+    const std::size_t from =
+        static_cast<std::size_t>(request.data()[1] | request.data()[2] << 8) * known->second.unit;
+    if (from <= known->second.read) {
+        known->second.read = std::max(known->second.read, from + response.size() - 2);
+    }
+    if (known->second.read >= known->second.size) {
+        Count(&inventory_, Key(ipmi::kGetFruInventoryAreaInfo, device), true);
+    }
+}
+
+}  // namespace tqrhost
