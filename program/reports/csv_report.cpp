@@ -56,7 +56,8 @@ std::string Cell(const std::vector<std::string>& texts) {
 }
 std::string Cell(const tqrhost::ObjectPath& path) {
     std::string text = path.className;
-    for (const auto& [key, value] : path.keys) text += " " + key + "=" + value;
+    for (const auto& [key, value] : path.keys)
+        text.append(" ").append(key).append("=").append(value);
     return Cell(text);
 }
 

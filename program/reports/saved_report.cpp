@@ -106,7 +106,7 @@ Json Parse(const std::string& file, const std::function<void(const Json&)>& take
     std::ifstream in(file, std::ios::binary);
     if (!in) Fail(file, std::string("cannot be read: ") + std::strerror(errno));
     bool inInstances = false;
-    const Json json = Json::parse(
+    Json json = Json::parse(
         in,
         [&](int depth, Json::parse_event_t event, Json& value) {
             if (depth == 1 && event == Json::parse_event_t::key) {

@@ -28,7 +28,7 @@ std::string ShownValue(const std::vector<std::uint8_t>& bytes) {
 }
 std::string ShownValue(const tqrhost::ObjectPath& path) {
     std::string text = path.className;
-    for (const auto& [key, name] : path.keys) text += " " + key + "=" + name;
+    for (const auto& [key, name] : path.keys) text.append(" ").append(key).append("=").append(name);
     return text;
 }
 std::string ShownValue(std::int64_t number) { return std::to_string(number); }
@@ -58,7 +58,7 @@ public:
         PrintHead();
         if (Shows(kFindingClass)) PrintFindings(end);
         for (std::size_t i = 0; i < systems_.All().size(); ++i) PrintSystem(i);
-        if (otherClass_ != "") other_.CopyTo(out_);
+        if (!otherClass_.empty()) other_.CopyTo(out_);
         PrintEnd(end);
     }
 
@@ -287,7 +287,8 @@ private:
         }
         std::string text;
         for (const auto& [status, count] : byStatus) {
-            if (!status.empty()) text = Listed({text, std::to_string(count) + " " + status});
+            if (!status.empty())
+                text = Listed({text, Listed({std::to_string(count), status}, " ")});
         }
         PrintProperty("Sensors", text);
         if (table.Empty()) return;
@@ -332,7 +333,7 @@ private:
         }
         std::string last;
         for (const auto& [name, count] : counts_) {
-            last = Listed({last, std::to_string(count) + " " + name});
+            last = Listed({last, Listed({std::to_string(count), name}, " ")});
         }
         if (last.empty()) last = "nothing";
         const Outcome outcome = OutcomeOf(end);

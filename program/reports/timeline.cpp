@@ -17,10 +17,10 @@ constexpr double kLeft = 96;
 constexpr double kWidth = 1000;
 constexpr double kRight = 12;
 constexpr double kLane = 26;
-constexpr std::size_t kBins = 180;        // marks side by side in a lane
-constexpr std::size_t kTextColumns = 70;  // of a mark's text
-constexpr std::int64_t kGapSeconds = 6 * 3600;
-constexpr std::int64_t kJumpSeconds = -5;  // a clock that goes back by more has been set
+constexpr std::size_t kBins = 180;           // marks side by side in a lane
+constexpr std::size_t kTextColumns = 70;     // of a mark's text
+constexpr std::int64_t kGapSeconds = 21600;  // six hours
+constexpr std::int64_t kJumpSeconds = -5;    // a clock that goes back by more has been set
 
 /// What an event changes of the machine as a whole, by sensor type (IPMI 2.0 table 42-3); null for
 /// the others.
@@ -176,11 +176,11 @@ std::string Timeline::Svg() const {
                                  : first.severity ? std::string(InfoOf(*first.severity).name)
                                                   : "none";
         const double radius = std::min(9.0, 4 + std::log2(static_cast<double>(mark.count)));
-        marks +=
-            Link(first.row,
-                 Circle(mark.x, machine ? machineLane : lanes[index].second, radius, name) +
-                     "<title>" + HtmlText(when + (machine ? first.change : first.text) + more) +
-                     "</title></circle>");
+        marks += Link(first.row,
+                      Circle(mark.x, machine ? machineLane : lanes[index].second, radius, name) +
+                          "<title>" +
+                          HtmlText(Listed({when, machine ? first.change : first.text, more}, "")) +
+                          "</title></circle>");
     }
     return Format(
                "<svg class=\"timeline\" role=\"group\" viewBox=\"0 0 %.0f %.0f\" "

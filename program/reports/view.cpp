@@ -205,7 +205,10 @@ View Read(const Instance& instance, const Field<View> (&fields)[N]) {
         for (std::size_t i = 0; i < N; ++i) {
             const Field<View>& field = fields[(next + i) % N];
             if (field.property != name) continue;
-            std::visit([&](auto member) { Assign(value, &(view.*member)); }, field.member);
+            const PropertyValue& found =
+                value;  // no lambda may take a structured binding by reference
+            std::visit([&view, &found](auto member) { Assign(found, &(view.*member)); },
+                       field.member);
             next += i + 1;
             break;
         }

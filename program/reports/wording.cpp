@@ -44,7 +44,7 @@ std::string DurationText(double seconds) {
 std::string NumberText(double number) { return Format("%.6g", number); }
 
 std::string SubjectText(const Event& event) {
-    const std::string part = PartText(event.part, event.partCandidates);
+    std::string part = PartText(event.part, event.partCandidates);
     if (!part.empty()) return part;
     return event.sensor.empty() ? event.sensorType : event.sensor;
 }
