@@ -61,7 +61,7 @@ void AddAccessOptions(CLI::App* command, AccessOptions* options) {
         ->add_option("--window", options->source.window,
                      "Most requests outstanding; adaptive when left out")
         ->type_name("N")
-        ->check(Number(1, 15));
+        ->check(Number(1, 32));
     command
         ->add_option("--timeout", options->source.timeoutSeconds,
                      "Seconds that one request may go unanswered")

@@ -40,7 +40,7 @@ TEST_F(BadInput, WrongUsage) {
         {{"--log-level", "debug"}, "use one of error, warning, notice, info, trace"},
         {{"--privilege", "root"}, "use one of user, operator, admin"},
         {{"--workaround", "none"}, "is not known"},
-        {{"--window", "0"}, "\"0\" is no number from 1 to 15"},
+        {{"--window", "0"}, "\"0\" is no number from 1 to 32"},
         {{"--timeout", "0"}, "--timeout"},
         {{"--timeout", "nan"}, "--timeout"},
         {{"--deadline", "-1"}, "--deadline"},
