@@ -105,6 +105,8 @@ public:
     const std::vector<ClassInfo>& Classes() const;
     /// Throws PluginError when a file that the plug-in needs is missing, unreadable or too large.
     void CheckNeededFiles() const;
+    /// Why the plug-in refuses a value of an option (fdrCheckOption); empty when it does not.
+    std::string ProblemOfOption(const std::string& name, const std::string& value) const;
     /// One collection of the named classes; blocks until the pass is over.
     NQORTQR20::TTQRStatusCode Collect(const std::vector<std::string>& classNames,
                                       InstanceSink& sink);

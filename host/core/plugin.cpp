@@ -322,6 +322,17 @@ PluginInfo Plugin::Info() const {
     return {text(info.name), text(info.version), text(info.interfaceVersion)};
 }
 
+std::string Plugin::ProblemOfOption(const std::string& name, const std::string& value) const {
+    const auto check = reinterpret_cast<NQORTQR20::fdrCheckOption>(Symbol("fdrPluginCheckOption"));
+    if (check == nullptr) return {};
+    std::array<char, 512> problem{"it is refused"};
+    const auto size = static_cast<std::uint32_t>(problem.size() - 1);
+    const TTQRStatusCode status =
+        Contained([&] { return check(name.c_str(), value.c_str(), problem.data(), size); },
+                  TTQRStatusCode{kStatusFailed});
+    return status.code == kStatusOk ? std::string() : std::string(problem.data());
+}
+
 TTQRStatusCode Plugin::Collect(const std::vector<std::string>& classNames, InstanceSink& sink) {
     OutputHandle output(sink);
     std::vector<const char*> names;

@@ -56,7 +56,13 @@ TTQRStatusCode fdrShowNotice(TCPluginCallbacks* context, const char* plainText,
 /// What the user has set for the plug-ins, by name; *value is null when nothing is set, and lives
 /// as long as the collection. Since 1.1. The options:
 ///   "severities"  the text of the file of the user's own severities
+/// A plug-in that takes an option may export a function of the type fdrCheckOption under the name
+/// fdrPluginCheckOption; a value that it refuses is refused before the collection begins.
 TTQRStatusCode fdrGetOption(TCPluginCallbacks* context, const char* name, const char** value);
+/// kStatusFailed for a value that cannot be used: why stands in problem[0..capacity) then, one line
+/// that ends with a NUL.
+using fdrCheckOption = TTQRStatusCode (*)(const char* name, const char* value, char* problem,
+                                          std::uint32_t capacity);
 /// How the user calls the system of a node (from 0): what --name says, else the host of the source.
 /// *name is null for a node that there is not, and lives as long as the collection. Since 1.1.
 TTQRStatusCode fdrGetSystemName(TCPluginCallbacks* context, int node, const char** name);

@@ -38,10 +38,11 @@ public:
     /// little-endian 32-bit count, data from byte 9. Response frame: completion code in byte 4;
     /// from byte 8 the completion code again and the response data in IPMI order.
     ///
-    /// `length`: in, the size of the buffer; out, the number of response data bytes after the
-    /// completion code. The buffer is cleared before the response is written; a longer response is
-    /// cut to it. False when the request could not be sent or no response came; the buffer then
-    /// keeps the request. `flag` is true in every call and has no meaning here.
+    /// `bufferSize` is the size of the buffer. `*length` is not read; on success it is the number
+    /// of response data bytes after the completion code. The buffer is cleared before the response
+    /// is written; a longer response is cut to it. False when the request could not be sent or no
+    /// response came; the buffer then keeps the request. `flag` is true in every call and has no
+    /// meaning here.
     bool sendIPMICommand(unsigned char* buffer, int* length, int bufferSize, bool flag);
 
 private:

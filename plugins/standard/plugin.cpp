@@ -1,5 +1,6 @@
 #include "plugins/standard/plugin.h"
 
+#include <algorithm>
 #include <memory>
 #include <span>
 #include <string>
@@ -21,15 +22,20 @@ using NQORTQR20::kStatusOk;
 using NQORTQR20::TCPluginCallbacks;
 using NQORTQR20::TTQRStatusCode;
 
+constexpr const char* kSeverities = "severities";
+
+std::string Line(const SeverityRules::Problem& problem) {
+    return "line " + std::to_string(problem.line) + ": " + problem.text;
+}
+
 // The user's own severities, as the host hands them on.
 bool ReadRules(TCPluginCallbacks* context, SeverityRules* rules) {
     const char* text = nullptr;
-    NQORTQR20::fdrGetOption(context, "severities", &text);
+    NQORTQR20::fdrGetOption(context, kSeverities, &text);
     if (text == nullptr) return true;
     const auto problem = SeverityRules::Parse(text, rules);
     if (!problem) return true;
-    const std::string line =
-        "severities, line " + std::to_string(problem->line) + ": " + problem->text;
+    const std::string line = std::string(kSeverities) + ", " + Line(*problem);
     NQORTQR20::fdrWriteLog(NQORTQR20::ILogger::kError, line.c_str());
     return false;
 }
@@ -81,6 +87,20 @@ TTQRStatusCode GetData(TCPluginCallbacks* context, NQORTQR20::fdriIOHandle* outp
     } catch (...) {
         return {kStatusFailed};
     }
+}
+
+TTQRStatusCode CheckOption(const char* name, const char* value, std::span<char> problem) {
+    try {
+        SeverityRules rules;
+        if (std::string_view(name) != kSeverities) return {kStatusOk};
+        const auto found = SeverityRules::Parse(value, &rules);
+        if (!found) return {kStatusOk};
+        const std::string line = Line(*found).substr(0, problem.size() - 1);
+        std::copy(line.begin(), line.end(), problem.begin());
+        problem[line.size()] = '\0';
+    } catch (...) {
+    }
+    return {kStatusFailed};
 }
 
 NQORTQR20::fdrPluginInfo GetInfo(TCPluginCallbacks* /*context*/) {

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <span>
+
 #include "tqr/plugin.h"
 
 namespace standard {
@@ -13,6 +15,8 @@ NQORTQR20::TTQRStatusCode Deinitialise(NQORTQR20::TCPluginCallbacks* context);
 NQORTQR20::TTQRStatusCode GetData(NQORTQR20::TCPluginCallbacks* context,
                                   NQORTQR20::fdriIOHandle* output, const char** classNames,
                                   int classCount);
+/// As NQORTQR20::fdrCheckOption.
+NQORTQR20::TTQRStatusCode CheckOption(const char* name, const char* value, std::span<char> problem);
 NQORTQR20::fdrPluginInfo GetInfo(NQORTQR20::TCPluginCallbacks* context);
 
 }  // namespace standard

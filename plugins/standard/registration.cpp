@@ -1,3 +1,6 @@
+#include <cstdint>
+#include <span>
+
 #include "plugins/standard/plugin.h"
 #include "tqr/log.h"
 
@@ -23,3 +26,8 @@ struct Registration {
 const Registration gRegistration;
 
 }  // namespace
+
+extern "C" __attribute__((visibility("default"))) NQORTQR20::TTQRStatusCode fdrPluginCheckOption(
+    const char* name, const char* value, char* problem, std::uint32_t capacity) {
+    return standard::CheckOption(name, value, std::span(problem, capacity));
+}

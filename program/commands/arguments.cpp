@@ -43,12 +43,11 @@ CLI::Validator Number(int min, int max) {
         "");
 }
 
-CLI::Validator FileName() {
+CLI::Validator NotEmpty(const std::string& message) {
     return CLI::Validator(
-        [](const std::string& text) {
-            return std::string(text.empty() ? "the name is empty; name a file" : "");
-        },
-        "");
+        [message](const std::string& text) { return text.empty() ? message : std::string(); }, "");
 }
+
+CLI::Validator FileName() { return NotEmpty("the name is empty; name a file"); }
 
 }  // namespace ipmisel

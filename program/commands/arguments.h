@@ -13,7 +13,8 @@ CLI::Validator OneOf(std::vector<std::string> names, bool listInHelp = true);
 /// Seconds, more than none and at most so many.
 CLI::Validator Seconds(double max);
 CLI::Validator Number(int min, int max);
-/// A name that is not empty.
+/// A text that is not empty, else this message.
+CLI::Validator NotEmpty(const std::string& message);
 CLI::Validator FileName();
 
 constexpr double kSecondsPerDay = 24 * 60 * 60;

@@ -8,21 +8,32 @@
 
 #include "program/commands/failure.h"
 #include "program/commands/plugins.h"
+#include "program/reports/class_schema.h"
 #include "program/reports/output_file.h"
 #include "program/reports/terminal_text.h"
 
 namespace ipmisel {
 namespace {
 
-int ListClasses(const std::vector<tqrhost::ClassInfo>& classes) {
+struct Options {
+    std::vector<std::string> plugins;
+    bool schema = false;
+};
+
+std::string ClassList(const std::vector<tqrhost::ClassInfo>& classes) {
     std::size_t width = 0;
     for (const tqrhost::ClassInfo& info : classes) width = std::max(width, info.name.size());
-    OutputFile output(std::nullopt);
+    std::string list;
     for (const tqrhost::ClassInfo& info : classes) {
-        output.Write(Fit(info.name, width) + "  " + info.description + "\n");
+        list += Fit(info.name, width) + "  " + info.description + "\n";
     }
+    return list;
+}
+
+void Print(const std::string& text) {
+    OutputFile output(std::nullopt);
+    output.Write(text);
     output.Commit();
-    return kExitCollected;
 }
 
 }  // namespace
@@ -30,9 +41,14 @@ int ListClasses(const std::vector<tqrhost::ClassInfo>& classes) {
 Command AddClassesCommand(CLI::App* program) {
     CLI::App* const command =
         program->add_subcommand("classes", "List the classes that can be collected");
-    const auto plugins = std::make_shared<std::vector<std::string>>();
-    AddPluginOption(command, plugins.get());
-    return {command, [plugins] { return ListClasses(LoadPlugins(*plugins)->Classes()); }};
+    const auto options = std::make_shared<Options>();
+    AddPluginOption(command, &options->plugins);
+    command->add_flag("--schema", options->schema, "The JSON Schema of their instances instead");
+    return {command, [options] {
+                const auto classes = LoadPlugins(options->plugins)->Classes();
+                Print(options->schema ? ClassSchema(classes) : ClassList(classes));
+                return kExitCollected;
+            }};
 }
 
 }  // namespace ipmisel

@@ -1,8 +1,12 @@
 #include "program/commands/collect.h"
 
+#include <unistd.h>
+
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <array>
 #include <chrono>
+#include <climits>
 #include <cstdint>
 #include <filesystem>
 #include <memory>
@@ -26,6 +30,7 @@
 #include "program/commands/log_lines.h"
 #include "program/commands/plugins.h"
 #include "program/commands/stop_signals.h"
+#include "program/commands/text_file.h"
 #include "program/reports/report.h"
 #include "program/reports/report_sink.h"
 #include "program/reports/terminal_text.h"
@@ -35,6 +40,7 @@
 namespace ipmisel {
 namespace {
 
+constexpr std::size_t kMaxSeverities = 1 << 20;
 constexpr std::int64_t kMicrosecondsPerSecond = 1000000;
 
 std::string Joined(const std::vector<std::string>& parts) {
@@ -81,19 +87,61 @@ tqrhost::ReadingNeeds NeedsOf(const std::vector<std::string>& wanted,
     return needs;
 }
 
-/// One for each node, called by its host or file.
-std::vector<SystemInfo> SystemsOf(const std::vector<tqrhost::SourceNode>& nodes) {
+/// The host that a source names, as the user calls it: of a network source without its port, of a
+/// file without its folder and ending; else this machine.
+std::string HostOf(const std::string& source) {
+    const auto colon = source.find(':');
+    if (colon == std::string::npos) {
+        std::array<char, HOST_NAME_MAX + 1> name{};
+        return gethostname(name.data(), name.size() - 1) == 0 ? name.data() : source;
+    }
+    const std::string place = source.substr(colon + 1);
+    if (!source.starts_with("lan:")) return std::filesystem::path(place).stem().string();
+    if (place.starts_with('[')) return place.substr(1, place.find(']') - 1);
+    const auto port = place.find(':');
+    return port == place.rfind(':') ? place.substr(0, port) : place;  // several: an IPv6 address
+}
+
+/// One for each node, named as the user says, else by its source.
+std::vector<SystemInfo> SystemsOf(const tqrhost::Source& source, const CollectOptions& options) {
+    const std::vector<std::string> sources = options.access.Sources();
+    const std::vector<std::string>& names = options.names;
+    // One source may be a machine of several nodes.
+    const bool byNode = sources.size() == 1 && names.size() == source.nodes.size();
+    if (!names.empty() && names.size() != sources.size() && !byNode) {
+        throw Failure(kExitUsage, std::to_string(names.size()) + " names for " +
+                                      std::to_string(sources.size()) +
+                                      " sources; give --name once for each --from");
+    }
     std::vector<SystemInfo> systems;
-    for (const tqrhost::SourceNode& node : nodes) {
+    for (const tqrhost::SourceNode& node : source.nodes) {
         SystemInfo& system = systems.emplace_back();
-        system.source = node.name;
-        system.name = node.name.substr(node.name.find(':') + 1);
-        // Of a file its name alone.
-        if (!node.name.starts_with("lan:")) {
-            system.name = std::filesystem::path(system.name).stem().string();
-        }
+        system.source = node.name.empty() ? sources.front() : node.name;
+        const auto place = std::find(sources.begin(), sources.end(), system.source);
+        const auto index = byNode ? systems.size() - 1
+                                  : static_cast<std::size_t>(place - sources.begin());
+        system.name = index < names.size() ? names[index] : HostOf(system.source);
     }
     return systems;
+}
+
+/// What the plug-ins may ask for, which none of them refuses.
+tqrhost::PluginSettings SettingsOf(const CollectOptions& options,
+                                   const tqrhost::PluginSet& plugins) {
+    tqrhost::PluginSettings settings;
+    if (options.severities) {
+        settings.options["severities"] =
+            ReadTextFile(*options.severities, "--severities", kMaxSeverities);
+    }
+    for (const auto& [name, value] : settings.options) {
+        for (const auto& plugin : plugins.Plugins()) {
+            const std::string problem = plugin->ProblemOfOption(name, value);
+            if (problem.empty()) continue;
+            throw Failure(kExitUsage,
+                          "cannot use --" + name + ": " + problem + "; correct it there");
+        }
+    }
+    return settings;
 }
 
 /// Notices that the plug-in had for whoever runs the collection, said and kept.
@@ -117,6 +165,7 @@ int CollectTo(const CollectOptions& options, ReportOutput& output) {
     const std::unique_ptr<tqrhost::PluginSet> plugins = LoadPlugins(options.plugins);
     const auto ofFormat = FindFormat(options.report.format)->classes;
     std::vector<std::string> wanted = ClassesToCollect(options.report.classes, ofFormat, *plugins);
+    tqrhost::PluginSettings settings = SettingsOf(options, *plugins);
     tqrhost::Source source = OpenSource(options.access);
     // A capture answers what was asked for when it was made, if the format can be made of that.
     const bool suffices = std::all_of(ofFormat.begin(), ofFormat.end(), [&](std::string_view name) {
@@ -127,10 +176,12 @@ int CollectTo(const CollectOptions& options, ReportOutput& output) {
         wanted = ClassesToCollect(source.classes, {}, *plugins);
     }
     for (const tqrhost::UnreachableNode& node : source.unreachable) Say(node.reason);
+    const std::vector<SystemInfo> systems = SystemsOf(source, options);
+    for (const SystemInfo& system : systems) settings.systemNames.push_back(system.name);
+    tqrhost::SetPluginSettings(std::move(settings));
     StopSignals::BeginCollecting();
     tqrhost::ReadLiveNodes(source, NeedsOf(wanted, *plugins));
     const std::shared_ptr<tqrhost::CaptureWriter> capture = Record(options, source, wanted);
-    const std::vector<SystemInfo> systems = SystemsOf(source.nodes);
     const Machine machine(std::move(source));
 
     const auto nodes = static_cast<std::size_t>(NQORTQR20::SPLibrary::GetNumberBMCNode());
@@ -144,9 +195,6 @@ int CollectTo(const CollectOptions& options, ReportOutput& output) {
                           .classes = plugins->Classes(),
                           .wanted = wanted,
                           .named = !options.report.classes.empty()};
-    tqrhost::PluginSettings settings;
-    for (const SystemInfo& system : head.systems) settings.systemNames.push_back(system.name);
-    tqrhost::SetPluginSettings(std::move(settings));
     const std::unique_ptr<ReportWriter> report = output.Make(head);
     ReportSink sink(*report, *plugins, wanted, nodes);
     tqrhost::CollectionPlan plan(*plugins, wanted);
@@ -220,6 +268,15 @@ Command AddCollectCommand(CLI::App* program) {
                      "Seconds that the whole collection may take")
         ->type_name("SECONDS")
         ->check(Seconds(365 * kSecondsPerDay));
+    command
+        ->add_option("--name", options->names,
+                     "Name of the system in reports; the host of the source when left out")
+        ->type_name("NAME")
+        ->allow_extra_args(false)
+        ->check(NotEmpty("the name is empty; name the system"));
+    command->add_option("--severities", options->severities, "File with severities of your own")
+        ->type_name("FILE")
+        ->check(FileName());
     command->footer(FormatHelp() + WorkaroundHelp() + kExitStatusHelp);
     return {command, [options] { return Collect(*options); }};
 }

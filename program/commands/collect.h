@@ -19,6 +19,8 @@ struct CollectOptions {
     LogOptions log;
     std::vector<std::string> plugins;  ///< further plug-in files
     std::optional<double> deadlineSeconds;
+    std::vector<std::string> names;  ///< of the systems, as their sources follow each other
+    std::optional<std::string> severities;
 };
 
 /// Collects and writes a report; the exit status. Throws Failure.

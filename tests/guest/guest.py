@@ -73,8 +73,7 @@ def initramfs(build: pathlib.Path, modules: list[pathlib.Path], script: str) -> 
         raise Missing("no static busybox (package busybox-static)")
     files = {"bin/busybox": pathlib.Path(busybox)}
     files |= {f"modules/{module.name}": module for module in modules}
-    installed = [build / "bin/ipmisel", *sorted((build / "lib").glob("*.so")),
-                 *sorted((build / "lib/ipmisel").glob("*.pi")), build / "lib/ipmisel/ipmisel.INI"]
+    installed = [build / "bin/ipmisel", *sorted((build / "lib/ipmisel").iterdir())]
     libraries = set()
     for path in installed:
         files["opt/" + str(path.relative_to(build))] = path

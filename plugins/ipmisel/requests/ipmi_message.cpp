@@ -9,6 +9,7 @@ constexpr std::uint8_t kFrameStart = 0x01;
 constexpr std::uint8_t kBmcAddress = 0x20;
 constexpr std::size_t kCountAt = 5;
 constexpr std::size_t kDataAt = 9;
+constexpr std::size_t kMaxData = 247;  // the rest of the transfer buffer
 constexpr std::size_t kCompletionCodeAt = 4;
 constexpr std::size_t kResponseAt = 8;
 
@@ -67,17 +68,24 @@ unsigned IPMIMessage::Exchange(const ipmisel::IPMICommand& command,
     netFn_ = command.netFn;
     lun_ = command.lun;
     command_ = command.command;
-    data = data.first(std::min(data.size(), kFrameLength - kDataAt));
-    requestHeader_ = {kFrameStart, kBmcAddress, netFn_, lun_, command_};
-    requestHeader_[kCountAt] = static_cast<std::uint8_t>(data.size());
-    std::copy(data.begin(), data.end(), requestHeader_.begin() + kDataAt);
-
+    if (data.size() > kMaxData) {
+        WriteLog(command.sendFailureSeverity, command.sendFailure);
+        return command.sendFailureResult;
+    }
     // Nothing of an earlier reply stays behind the frame.
     transferBuffer_.fill(0);
-    std::copy(requestHeader_.begin(), requestHeader_.end(), transferBuffer_.begin());
+    constexpr std::array<std::uint8_t, 2> kLead{kFrameStart, kBmcAddress};
+    std::copy(kLead.begin(), kLead.end(), transferBuffer_.begin());
+    transferBuffer_[2] = netFn_;
+    transferBuffer_[3] = lun_;
+    transferBuffer_[4] = command_;
+    transferBuffer_[kCountAt] = static_cast<std::uint8_t>(data.size());
+    std::copy(data.begin(), data.end(), transferBuffer_.begin() + kDataAt);
     if (LogEnabled(kTrace)) {
+        const auto frame = std::span<const std::uint8_t>(transferBuffer_)
+                               .first(std::max(kFrameLength, kDataAt + data.size()));
         WriteLog(kTrace, std::string("Contents of buffer to send (") + command.bufferName +
-                             "):" + DumpFrame(requestHeader_, command.frameDigits));
+                             "):" + DumpFrame(frame, command.frameDigits));
     }
 
     length_ = command.length;

@@ -25,7 +25,7 @@ struct IPMICommand {
 
     const char* bufferName = "rspBuf";      ///< as the trace of the request frame calls it
     Digits frameDigits = Digits::kDecimal;  ///< of the same trace
-    int length = 256;                       ///< told to the transport as the reply's room
+    int length = 256;                       ///< handed to the transport, which does not read it
 
     const char* sendFailure = "";  ///< the line of a request that got no answer
     Severity sendFailureSeverity = kError;
@@ -64,7 +64,7 @@ inline IPMIRecordID ReadRecordID(ByteReader* in) {
 /// back in the same buffer:
 ///
 ///     request: 0x01, responder address, NetFn, LUN, command, count of data bytes, three zeros,
-///              up to six data bytes, zeros up to 15 bytes
+///              data bytes, zeros up to 15 bytes
 ///     reply:   byte 4 completion code; from byte 8 the completion code again and the data
 class IPMIMessage {
 public:
@@ -81,7 +81,7 @@ public:
 protected:
     ~IPMIMessage() = default;
 
-    /// One command exchange: frames the command with its data (six bytes at most), traces the
+    /// One command exchange: frames the command with its data (247 bytes at most), traces the
     /// frame, sends it and tests the completion code. kOk when the reply is in the buffer;
     /// otherwise its failure is logged, and the result is kFailed, or the command's own result of
     /// a failed send.
@@ -102,7 +102,6 @@ private:
     std::uint8_t netFn_ = 0;
     std::uint8_t lun_ = 0;
     std::uint8_t command_ = 0;
-    std::array<std::uint8_t, kFrameLength> requestHeader_{};
     std::array<std::uint8_t, 256> transferBuffer_{};
     int length_ = 256;
     NQORTQR20::SPLibrary* transport_;

@@ -46,6 +46,28 @@ protected:
     unsigned AuxStatus() { return IPMIRequestAuxLog(Library()).IPMIGetAuxLogStatus(&count); }
 };
 
+/// A request of any length.
+class AnyRequest : public IPMIMessage {
+public:
+    using IPMIMessage::IPMIMessage;
+    unsigned Send(const std::vector<std::uint8_t>& data) {
+        return Exchange({.netFn = 0x2E, .command = 0x10, .sendFailure = "not sent"}, data);
+    }
+};
+
+TEST_F(Exchange, LongDataIsSentWholeOrNotAtAll) {
+    AnyRequest request(Library());
+    request.Send({1, 2, 3, 4, 5, 6, 7, 8});
+    EXPECT_THAT(Frames(), ElementsAre("01 20 2E 00 10 08 00 00 00 01 02 03 04 05 06 07 08 "));
+    EXPECT_EQ(requests[0].size(), 17U);
+    request.Send(std::vector<std::uint8_t>(247, 0xEE));
+    EXPECT_EQ(requests[1].size(), 256U);
+    log.Clear();
+    EXPECT_EQ(request.Send(std::vector<std::uint8_t>(248, 0xEE)), kFailed);
+    EXPECT_EQ(requests.size(), 2U);
+    EXPECT_THAT(log.All(), ElementsAre(Pair(0, "not sent")));
+}
+
 TEST_F(Exchange, SelInfoInFull) {
     bmc.faults = {ipmiseltest::Answer(0x40, 1, {0x51, 0x34, 0x12, 0xEE})};
     EXPECT_EQ(SelInfo(), kOk);
