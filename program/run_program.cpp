@@ -4,7 +4,11 @@
 #include <algorithm>
 #include <csignal>
 #include <exception>
+#include <new>
+#include <numeric>
 #include <string>
+#include <string_view>
+#include <utility>
 #include <vector>
 
 #include "program/commands/classes.h"
@@ -22,6 +26,38 @@ namespace {
 constexpr Command (*kCommands[])(CLI::App* program) = {AddCollectCommand, AddReportCommand,
                                                        AddDiffCommand, AddClassesCommand};
 
+/// Letters to put in, take out or change to make one word the other.
+std::size_t Distance(std::string_view a, std::string_view b) {
+    std::vector<std::size_t> row(b.size() + 1);
+    std::iota(row.begin(), row.end(), 0U);
+    for (std::size_t i = 1; i <= a.size(); ++i) {
+        std::size_t diagonal = std::exchange(row[0], i);
+        for (std::size_t j = 1; j <= b.size(); ++j) {
+            const std::size_t changed = diagonal + (a[i - 1] == b[j - 1] ? 0 : 1);
+            diagonal = row[j];
+            row[j] = std::min({row[j] + 1, row[j - 1] + 1, changed});
+        }
+    }
+    return row.back();
+}
+
+/// The first word is a command, unless it is an option of the program's own.
+void RefuseUnknownCommand(const std::vector<Command>& commands, int argc, char** argv) {
+    if (argc < 2 || argv[1][0] == '-') return;
+    const std::string word = std::string(argv[1]).substr(0, 64);
+    std::string known;
+    std::string near;
+    for (const Command& command : commands) {
+        const std::string name = command.arguments->get_name();
+        if (name == argv[1]) return;
+        known += (known.empty() ? "" : ", ") + name;
+        if (near.empty() && Distance(word, name) <= 2) near = name;
+    }
+    throw Failure(kExitUsage, "there is no command \"" + word + "\"; " +
+                                  (near.empty() ? "" : "did you mean " + near + "? ") +
+                                  "There are " + known);
+}
+
 int Run(int argc, char** argv) {
     CLI::App app("Reads what a server's management controller (BMC) knows.", "ipmisel");
     app.set_version_flag("--version", "ipmisel " IPMISEL_VERSION);
@@ -32,6 +68,7 @@ int Run(int argc, char** argv) {
         return std::find_if(commands.begin(), commands.end(),
                             [](const Command& command) { return command.arguments->parsed(); });
     };
+    RefuseUnknownCommand(commands, argc, argv);
     try {
         app.parse(argc, argv);
     } catch (const CLI::Success& wanted) {  // help or version
@@ -55,6 +92,9 @@ int RunProgram(int argc, char** argv) {
     } catch (const Failure& failure) {
         Say(failure.what());
         return failure.exitStatus;
+    } catch (const std::bad_alloc&) {
+        Say("out of memory; give the program more, or collect fewer classes at a time");
+        return kExitPassFailed;
     } catch (const std::exception& error) {
         Say(std::string("ended by an error of its own: ") + error.what());
         return kExitPassFailed;

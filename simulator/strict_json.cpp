@@ -9,6 +9,7 @@
 #include <iterator>
 #include <nlohmann/json.hpp>
 #include <optional>
+#include <set>
 #include <sstream>
 #include <utility>
 
@@ -35,11 +36,17 @@ std::string OneLine(std::string text) {
     return text;
 }
 
+/// What a file calls something may be as long as the file.
+std::string Shortened(const std::string& key) {
+    constexpr std::size_t kLongest = 100;
+    return key.size() <= kLongest ? key : key.substr(0, kLongest) + "...";
+}
+
 [[noreturn]] void Throw(const std::string& file, std::optional<std::size_t> line,
                         const std::string& key, const std::string& reason) {
     std::string message = file;
     if (line) message += ":" + std::to_string(*line);
-    if (!key.empty()) message += ": " + key;
+    if (!key.empty()) message += ": " + Shortened(key);
     throw JsonFileError(OneLine(message + ": " + reason));
 }
 
@@ -264,7 +271,23 @@ std::string JsonValue::Path() const {
 void ReadStrictJson(const std::string& text, const std::string& file,
                     const std::function<void(const JsonValue&)>& read, std::size_t firstLine) {
     try {
-        const auto value = nlohmann::json::parse(text, nullptr, true, true);
+        const char* lastRead = text.data();
+        std::vector<std::set<std::string>> open;  // the keys of the objects that are open
+        const auto refuseTwice = [&](int, nlohmann::json::parse_event_t event,
+                                     nlohmann::json& parsed) {
+            using Event = nlohmann::json::parse_event_t;
+            if (event == Event::object_start) open.emplace_back();
+            if (event == Event::object_end) open.pop_back();
+            if (event == Event::key && !open.back().insert(parsed.get<std::string>()).second) {
+                const auto line = std::count(text.data(), lastRead, '\n');
+                Throw(file, firstLine + static_cast<std::size_t>(line), parsed.get<std::string>(),
+                      "stands twice in one object");
+            }
+            return true;
+        };
+        const auto value = nlohmann::json::parse(
+            TrackingIterator(text.data(), &lastRead),
+            TrackingIterator(text.data() + text.size(), &lastRead), refuseTwice, true, true);
         read(JsonValue(value));
     } catch (const nlohmann::json::parse_error& error) {
         const auto end = text.begin() + static_cast<std::ptrdiff_t>(std::min(

@@ -1,5 +1,7 @@
 #include <dlfcn.h>
+#include <elf.h>
 #include <fcntl.h>
+#include <link.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -133,6 +135,36 @@ std::optional<std::vector<tqrhost::ClassInfo>> CopyClasses(const NQORTQR20::fdrC
     return classes;
 }
 
+/// What keeps a file from being loaded that the loader would not survive: a part that the file is
+/// too short for is mapped all the same, and ends the process when it is read.
+std::string ProblemOfFile(const std::filesystem::path& path) {
+    // Not blocking: nobody may write to a pipe.
+    const int descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+    const std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(
+        descriptor < 0 ? nullptr : fdopen(descriptor, "r"), std::fclose);
+    struct stat status {};
+    if (!file || fstat(descriptor, &status) != 0) {
+        return std::string(std::strerror(errno)) + "; name another with --plugin";
+    }
+    if (!S_ISREG(status.st_mode)) return "it is no file; name another with --plugin";
+    const auto size = static_cast<std::uint64_t>(status.st_size);
+    ElfW(Ehdr) header{};
+    if (std::fread(&header, 1, sizeof header, file.get()) != sizeof header ||
+        std::memcmp(header.e_ident, ELFMAG, SELFMAG) != 0 ||
+        header.e_phentsize != sizeof(ElfW(Phdr))) {
+        return {};  // the loader says what it is
+    }
+    if (std::fseek(file.get(), static_cast<long>(header.e_phoff), SEEK_SET) != 0) return {};
+    for (unsigned i = 0; i < header.e_phnum; ++i) {
+        ElfW(Phdr) part{};
+        const bool whole = std::fread(&part, 1, sizeof part, file.get()) == sizeof part;
+        if (!whole || part.p_offset > size || part.p_filesz > size - part.p_offset) {
+            return "it is cut short; reinstall it or name another with --plugin";
+        }
+    }
+    return {};
+}
+
 std::string LoaderMessage() {
     const char* const message = dlerror();
     return message == nullptr ? "unknown reason" : message;
@@ -239,6 +271,7 @@ Plugin::Plugin(const std::filesystem::path& file) : impl_(std::make_unique<Impl>
     if (error) fail(error.message() + "; install it there or name another with --plugin");
     impl_->context = std::make_unique<TCPluginCallbacks>(PathOfPlugin(impl_->file.parent_path()));
 
+    if (const std::string problem = ProblemOfFile(impl_->file); !problem.empty()) fail(problem);
     Registration registration{.context = impl_->context.get()};
     gLoading = &registration;
     impl_->library.reset(dlopen(impl_->file.c_str(), RTLD_NOW | RTLD_LOCAL));

@@ -6,11 +6,13 @@
 #include <cstdint>
 #include <cstdio>
 #include <cstring>
+#include <filesystem>
 #include <memory>
 #include <nlohmann/json.hpp>
 #include <optional>
 #include <span>
 #include <string>
+#include <system_error>
 #include <utility>
 #include <vector>
 
@@ -45,7 +47,13 @@ class CaptureFile : public CaptureWriter {
 public:
     CaptureFile(const std::string& name, const Source& source,
                 const std::vector<std::string>& classes) {
-        // A file that was there before is no one's to remove.
+        // A symbolic link to a file is replaced, not followed; what is there before is emptied, and
+        // no one's to remove. A new file is for the user alone.
+        std::error_code error;
+        if (!name.starts_with("/dev/") && std::filesystem::is_symlink(name, error) &&
+            std::filesystem::is_regular_file(name, error)) {
+            unlink(name.c_str());
+        }
         int file = open(name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600);
         const bool created = file >= 0;
         if (!created && errno == EEXIST) {

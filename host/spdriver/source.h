@@ -91,4 +91,8 @@ const std::vector<UnreachableNode>& GetUnreachable();
 void EndPass();
 void CloseMachine();
 
+/// Whether the last command of a plug-in was an optional one that the BMC says it does not know:
+/// what the plug-in logs of it is no warning to whoever reads along.
+bool OptionalCommandRefused();
+
 }  // namespace tqrhost

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <cstdint>
 #include <exception>
 #include <memory>
 #include <span>
@@ -14,6 +15,7 @@
 #include "host/spdriver/loop_guard.h"
 #include "host/spdriver/record_trimmer.h"
 #include "host/spdriver/source.h"
+#include "ipmi/command.h"
 
 namespace NQORTQR20 {
 
@@ -56,6 +58,16 @@ std::vector<UnreachableNode>& Unreachable() {
     return unreachable;
 }
 
+/// The last answer was that the BMC does not know an optional command.
+bool gOptionalRefused = false;
+
+/// Commands that a BMC may lack without being at fault: the auxiliary log, and what vendors define.
+bool IsOptional(const RequestFrame& request) {
+    constexpr std::uint8_t kFirstOemNetFn = 0x2E;  // IPMI 2.0, table 5-1: group and OEM commands
+    return ipmi::CommandCode{request.netFn(), request.command()} == ipmi::kGetAuxiliaryLogStatus ||
+           request.netFn() >= kFirstOemNetFn;
+}
+
 }  // namespace
 
 void OpenMachine(Source source) {
@@ -83,6 +95,8 @@ void EndPass() {
                                       true);
     }
 }
+
+bool OptionalCommandRefused() { return gOptionalRefused; }
 
 NodeCompleteness CompletenessOf(const NQORTQR20::SPLibrary& library) {
     const auto& tracker = library.impl_->transport;
@@ -152,6 +166,9 @@ bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSi
         fdrWriteLog(ILogger::kError, line.c_str());
         return false;
     }
+    tqrhost::gOptionalRefused = response && !response->empty() &&
+                                response->front() == ipmi::kInvalidCommand &&
+                                tqrhost::IsOptional(*request);
     if (!response || response->empty()) return false;
     std::fill(frame.begin(), frame.end(), static_cast<unsigned char>(0));
     const auto fits = std::min(response->size(), frame.size() - tqrhost::kResponseAt);

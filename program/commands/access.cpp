@@ -1,6 +1,7 @@
 #include "program/commands/access.h"
 
 #include <algorithm>
+#include <new>
 
 #include "program/commands/arguments.h"
 #include "program/commands/failure.h"
@@ -80,6 +81,9 @@ tqrhost::Source OpenSource(const AccessOptions& options) {
         throw Failure(kExitUsage, error.what());
     } catch (const tqrhost::SourceError& error) {
         throw Failure(kExitNoSource, error.what());
+    } catch (const std::bad_alloc&) {
+        throw Failure(kExitNoSource,
+                      "out of memory while the source was opened; give the program more");
     }
 }
 

@@ -28,6 +28,7 @@
 #include "program/commands/arguments.h"
 #include "program/commands/failure.h"
 #include "program/commands/log_lines.h"
+#include "program/commands/named_files.h"
 #include "program/commands/plugins.h"
 #include "program/commands/stop_signals.h"
 #include "program/commands/text_file.h"
@@ -236,9 +237,31 @@ constexpr const char* kExitStatusHelp =
     "  3  the source could not be opened, or the machine has no BMC\n"
     "  4  collected in part; the report's completeness says what is missing\n";
 
+/// Every file that the options name.
+std::vector<NamedFile> FilesOf(const CollectOptions& options) {
+    std::vector<NamedFile> files;
+    const auto add = [&](const char* option, const std::optional<std::string>& name, bool written) {
+        if (name && *name != "-") files.push_back({option, *name, written});
+    };
+    add("--output", options.report.output, true);
+    add("--record", options.record, true);
+    add("--log-file", options.log.file, true);
+    add("--password-file", options.access.passwordFile, false);
+    add("--kg-file", options.access.kgFile, false);
+    add("--severities", options.severities, false);
+    for (const std::string& plugin : options.plugins) add("--plugin", plugin, false);
+    for (const std::string& source : options.access.Sources()) {
+        for (const std::string_view kind : {"sim:", "replay:"}) {
+            if (source.starts_with(kind)) add("--from", source.substr(kind.size()), false);
+        }
+    }
+    return files;
+}
+
 }  // namespace
 
 int Collect(const CollectOptions& options) {
+    RefuseSameFile(FilesOf(options));
     const StopSignals signals;
     if (options.deadlineSeconds) {
         using Clock = std::chrono::steady_clock;

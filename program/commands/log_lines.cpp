@@ -1,10 +1,13 @@
 #include "program/commands/log_lines.h"
 
+#include <fcntl.h>
+
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <iterator>
 
+#include "host/spdriver/source.h"
 #include "program/commands/arguments.h"
 #include "program/commands/failure.h"
 #include "program/reports/json_text.h"
@@ -22,6 +25,25 @@ void WriteToTerminal(ILogger::ETQRLogSeverity severity, std::string_view text) {
     const int known = std::clamp<int>(severity, ILogger::kError, ILogger::kTrace);
     Say(std::string(kSeverityNames[known]) + ": " + std::string(text));
 }
+
+/// Which severity a line has for whoever reads along. What a plug-in warns of after a BMC did not
+/// know an optional command, a line and the status line after it, is a notice.
+class TerminalRule {
+public:
+    ILogger::ETQRLogSeverity SeverityOf(ILogger::ETQRLogSeverity severity) {
+        if (!tqrhost::OptionalCommandRefused()) {
+            lines_ = 0;
+        } else if (severity == ILogger::kWarning && lines_ < kLines) {
+            ++lines_;
+            return ILogger::kNotice;
+        }
+        return severity;
+    }
+
+private:
+    static constexpr int kLines = 2;
+    int lines_ = 0;
+};
 
 [[noreturn]] void Fail(const std::string& name, int error) {
     throw Failure(kExitUsage, "cannot write the log to " + name + ": " + std::strerror(error) +
@@ -51,14 +73,20 @@ void AddLogOptions(CLI::App* command, LogOptions* options) {
 
 LogLines::LogLines(const LogOptions& options) : name_(options.file.value_or("")) {
     if (options.file) {
-        file_.reset(std::fopen(name_.c_str(), "we"));
+        // For the user alone when it is new.
+        const int file = open(name_.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
+        if (file >= 0) file_.reset(fdopen(file, "w"));
         if (!file_) Fail(name_, errno);
         toFile_ = tqrhost::AddLogConsumer(
             ILogger::kTrace, [this](ILogger::ETQRLogSeverity severity, std::string_view text) {
                 WriteToFile(severity, text);
             });
     }
-    toTerminal_ = tqrhost::AddLogConsumer(options.level, WriteToTerminal);
+    toTerminal_ = tqrhost::AddLogConsumer(
+        options.level, [level = options.level, shown = TerminalRule()](
+                           ILogger::ETQRLogSeverity severity, std::string_view text) mutable {
+            if (shown.SeverityOf(severity) <= level) WriteToTerminal(severity, text);
+        });
 }
 
 LogLines::~LogLines() {

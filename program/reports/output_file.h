@@ -1,5 +1,7 @@
 #pragma once
 
+#include <sys/stat.h>
+
 #include <optional>
 #include <string>
 #include <string_view>
@@ -11,7 +13,8 @@ namespace ipmisel {
 class OutputFile {
 public:
     /// None or "-" is standard output. A regular file is written beside its place under another
-    /// name; what is no regular file (a device, a pipe) is written as it stands.
+    /// name, and keeps mode and owner of the one that it replaces; a new one has mode 0600. What is
+    /// no regular file (a device, a pipe) is written as it stands.
     explicit OutputFile(const std::optional<std::string>& name);
     /// Without Commit nothing stays behind.
     ~OutputFile();
@@ -24,6 +27,8 @@ public:
 
 private:
     void OpenBeside();
+    /// Mode and owner of the file that is to be replaced.
+    void TakeOver(const struct stat& before) const;
     void Flush();
     [[noreturn]] void Fail(int error) const;
 

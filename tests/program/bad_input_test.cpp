@@ -73,6 +73,9 @@ TEST_F(BadInput, WrongUsage) {
     ExpectRefused({"collect", "--from", source, "--output", place.path().string()}, 2,
                   "Is a directory");
     ExpectRefused({}, 2, "subcommand");
+    ExpectRefused({"colect"}, 2,
+                  "no command \"colect\"; did you mean collect? There are collect, ");
+    ExpectRefused({"frobnicate"}, 2, "no command \"frobnicate\"; There are collect, ");
     ExpectRefused({"collect", "--from", "tape:0"}, 2, "this build has no source \"tape:0\"");
     ExpectRefused({"collect", "--from", "sim:"}, 2, "names no place");
 }
@@ -116,6 +119,81 @@ TEST_F(BadInput, WhatDoesNotFitLeavesWhatWasThere) {
         EXPECT_EQ(ReadText(file), before);
         EXPECT_THAT(Left(), ElementsAre("report"));
     }
+}
+
+TEST_F(BadInput, OneFileIsNotNamedTwice) {
+    const std::string report = place.Write("report", "what was there before");
+    std::filesystem::create_symlink(report, folder.path() / "link");
+    const std::string link = (folder.path() / "link").string();
+    const std::string other = place.path().string() + "/./none";
+    const std::string source = Write(Server());
+    const std::string file = source.substr(4);
+    const struct {
+        std::vector<std::string> more;
+        const char* part;
+    } cases[] = {{{"--output", report, "--record", link}, "--output and --record name one file"},
+                 {{"--output", other, "--log-file", InPlace("none")}, "--output and --log-file"},
+                 {{"--output", file}, "--output and --from"},
+                 {{"--record", link, "--password-file", report}, "--record and --password-file"}};
+    for (const auto& c : cases) {
+        const Ended ended = Collect(source, c.more);
+        EXPECT_EQ(ended.exitStatus, 2);
+        EXPECT_THAT(ended.err, AllOf(MatchesRegex("ipmisel: [^\n]+; [^\n]+\n"), HasSubstr(c.part)));
+        EXPECT_THAT(Left(), ElementsAre("report"));
+        EXPECT_EQ(ReadText(report), "what was there before");
+    }
+    EXPECT_EQ(Collect(source, {"--output", "/dev/null", "--record", "/dev/null"}).exitStatus, 0);
+}
+
+TEST_F(BadInput, APluginThatIsCutShortIsRefused) {
+    const auto whole =
+        std::filesystem::path(IPMISEL_PROGRAM).parent_path() / "../lib/ipmisel/libipmisel.pi";
+    const auto cut = folder.path() / "cut.pi";
+    const auto size = std::filesystem::file_size(whole);
+    for (const std::uintmax_t length : {std::uintmax_t{100}, std::uintmax_t{4096}, size / 8}) {
+        std::filesystem::copy_file(whole, cut, std::filesystem::copy_options::overwrite_existing);
+        std::filesystem::resize_file(cut, length);
+        ExpectRefused(Good({"--plugin", cut.string()}), 2, "it is cut short");
+    }
+    const auto pipe = folder.path() / "pipe.pi";
+    ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+    ExpectRefused(Good({"--plugin", pipe.string()}), 2, "it is no file");
+}
+
+TEST_F(BadInput, OutOfMemoryIsOneLine) {
+    Json server = Server();
+    server["smbios"] = Json::array();
+    for (int i = 0; i < 100000; ++i) server["smbios"].push_back(std::string(500, '0'));
+    const std::string source = Write(server);
+    const Ended ended =
+        RunningProgram(folder.path().string(),
+                       {"/bin/sh", "-c", "ulimit -v 100000; exec \"$@\"", "sh", IPMISEL_PROGRAM,
+                        "collect", "--from", source, "--output", InPlace("report")})
+            .Wait();
+    EXPECT_EQ(ended.exitStatus, 3) << ended.signal;
+    EXPECT_THAT(ended.err, MatchesRegex("ipmisel: [^\n]*memory[^\n]*; [^\n]+\n"));
+    EXPECT_THAT(Left(), IsEmpty());
+}
+
+TEST_F(BadInput, NamesOf255BytesAreWritten) {
+    const std::string name(255, 'n');
+    EXPECT_EQ(Collect(Write(Server()), {"--output", InPlace(name)}).exitStatus, 0);
+    EXPECT_THAT(Left(), ElementsAre(name));
+}
+
+TEST_F(BadInput, WhatAKilledRunLeftIsTakenAwayByTheNext) {
+    Json server = Server(200);
+    server["bmcs"][0]["latency_us"] = 100000;
+    RunningProgram program(folder.path().string(), Command({"collect", "--from", Write(server),
+                                                            "--output", InPlace("report")}));
+    ASSERT_TRUE(Eventually([&] { return Left().size() == 1; }));
+    // One that still runs keeps its file.
+    EXPECT_EQ(Run(Good({})).exitStatus, 0);
+    EXPECT_THAT(Left(), SizeIs(2));
+    program.Signal(SIGKILL);
+    program.Wait();
+    EXPECT_EQ(Run(Good({})).exitStatus, 0);
+    EXPECT_THAT(Left(), ElementsAre("report"));
 }
 
 TEST_F(BadInput, ASymbolicLinkIsReplacedAndNotFollowed) {

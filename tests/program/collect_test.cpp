@@ -89,11 +89,21 @@ TEST_F(Collecting, FormatsAndPlacesAgree) {
 
     const std::string file = InPlace("report");
     place.Write("report", "what was there before");
-    const mode_t before = umask(027);
+    // What stands there keeps its mode; a new file is the user's alone.
+    std::filesystem::permissions(file, std::filesystem::perms(0664));
+    const mode_t before = umask(0);
     EXPECT_EQ(Collect(source, {"--output", file}).out, "");
-    umask(before);
     EXPECT_EQ(ReadText(file), table.out);
-    EXPECT_EQ(std::filesystem::status(file).permissions(), std::filesystem::perms(0640));
+    EXPECT_EQ(std::filesystem::status(file).permissions(), std::filesystem::perms(0664));
+    std::filesystem::remove(file);
+    Collect(source,
+            {"--output", file, "--record", InPlace("capture"), "--log-file", InPlace("log")});
+    umask(before);
+    for (const char* name : {"report", "capture", "log"}) {
+        EXPECT_EQ(std::filesystem::status(InPlace(name)).permissions(),
+                  std::filesystem::perms(0600));
+    }
+    for (const char* name : {"capture", "log"}) std::filesystem::remove(InPlace(name));
     EXPECT_THAT(Left(), ElementsAre("report"));
 }
 

@@ -69,10 +69,21 @@ TEST(ServerFile, AClockThatIsNotGivenIsTheMachines) {
     EXPECT_EQ(ParseServer(none, "s.json").bmcs[0].selTime, std::nullopt);
 }
 
+TEST(ServerFile, ALongKeyIsNotPrintedWhole) {
+    const std::string key(100000, 'k');
+    try {
+        ParseServer("{\"" + key + "\": 1}", "s.json");
+        FAIL() << "read";
+    } catch (const std::exception& error) {
+        EXPECT_EQ(error.what(), "s.json:1: " + key.substr(0, 100) + "...: no such key here");
+    }
+}
+
 TEST(ServerFile, RefusalNamesLineKeyAndReason) {
     // Each is the good file with one thing replaced.
     const std::tuple<const char*, const char*, const char*> cases[] = {
         {"_type", "", "2: machine: no such key here"},
+        {"\"integrated_bmc\"", "\"machine_type\"", "2: machine_type: stands twice in one object"},
         {"\"SIM-1\"", "5", "2: machine_type: must be a text, not number"},
         {"true, \"ipmi_d", "1, \"ipmi_d", "2: integrated_bmc: must be true or false, not number"},
         {"+060", "", "3: local_time: must be a time as in 20240305120000.000000+060"},
