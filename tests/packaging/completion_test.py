@@ -49,29 +49,40 @@ def fish(words):
 class Zsh:
     """A zsh at a terminal of its own: words are typed, and the key that lists what may follow."""
 
+    PROMPT = "ready> "
+
     def __init__(self):
         self.child, self.terminal = pty.fork()
         if self.child == 0:
             os.chdir(ROOT)
-            os.execvpe("zsh", ["zsh", "-f"], ENVIRONMENT)
+            os.execvpe("zsh", ["zsh", "-f"], {**ENVIRONMENT, "PS1": self.PROMPT})
         self.count = 0
-        self.type(f"PS1='> '; fpath=({shlex.quote(str(SCRIPTS))} $fpath); autoload -U compinit; compinit -u -D; "
+        self.wait_for(self.PROMPT)
+        self.type(f"fpath=({shlex.quote(str(SCRIPTS))} $fpath); autoload -U compinit; compinit -u -D; "
                   "LISTMAX=0; ")
 
     def close(self):
         os.close(self.terminal)
         os.waitpid(self.child, 0)
 
+    def wait_for(self, *texts):
+        """What zsh says until these texts have come, one after the other."""
+        said, rest, end = "", "", time.monotonic() + 30
+        for text in texts:
+            while text not in rest:
+                if not select.select([self.terminal], [], [], max(0, end - time.monotonic()))[0]:
+                    raise AssertionError(f"zsh said only {said + rest!r}")
+                rest += os.read(self.terminal, 4096).decode(errors="replace")
+            before, text, rest = rest.partition(text)
+            said += before + text
+        return said
+
     def type(self, keys):
-        """Types, has zsh print a number, and gives what it said until then."""
+        """Types, has zsh print a number, and gives what it said until then. Its prompt follows: before
+        that, the terminal itself takes Ctrl-D and Ctrl-U."""
         self.count += 1
         os.write(self.terminal, f"{keys}print END$((1000+{self.count}))\n".encode())
-        said, end = "", time.monotonic() + 30
-        while f"END{1000 + self.count}" not in said:
-            if not select.select([self.terminal], [], [], max(0, end - time.monotonic()))[0]:
-                raise AssertionError(f"zsh said only {said!r}")
-            said += os.read(self.terminal, 4096).decode(errors="replace")
-        return said
+        return self.wait_for(f"END{1000 + self.count}", self.PROMPT)
 
     def __call__(self, words):
         listing, line = "\x04", "\x15"  # Ctrl-D lists, Ctrl-U takes the line back
