@@ -119,8 +119,8 @@ std::vector<SystemInfo> SystemsOf(const tqrhost::Source& source, const CollectOp
         SystemInfo& system = systems.emplace_back();
         system.source = node.name.empty() ? sources.front() : node.name;
         const auto place = std::find(sources.begin(), sources.end(), system.source);
-        const auto index = byNode ? systems.size() - 1
-                                  : static_cast<std::size_t>(place - sources.begin());
+        const auto index =
+            byNode ? systems.size() - 1 : static_cast<std::size_t>(place - sources.begin());
         system.name = index < names.size() ? names[index] : HostOf(system.source);
     }
     return systems;

@@ -54,8 +54,8 @@ const CipherSuite* FindCipherSuite(int id);
 
 /// What a BMC does otherwise than the standard has it, and is put up with.
 struct Deviations {
-    /// The user name padded to 16 bytes; but for the code of RAKP 3, which leaves out the bit for the
-    /// lookup by name too. The code of RAKP 4 by the integrity algorithm.
+    /// The user name padded to 16 bytes; but for the code of RAKP 3, which leaves out the bit for
+    /// the lookup by name too. The code of RAKP 4 by the integrity algorithm.
     bool paddedUserName = false;
     /// The code of RAKP 2 is a byte longer than its algorithm makes it, and the payload's length
     /// with it or alone.

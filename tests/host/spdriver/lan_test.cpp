@@ -91,7 +91,8 @@ TEST_F(Lan, ANameThatDoesNotResolveAndSilenceAreTold) {
     options.timeoutSeconds = 0.5;
     const auto before = std::chrono::steady_clock::now();
     const std::string place = "127.0.0.1:" + std::to_string(ipmiseltest::FreeUdpPort());
-    EXPECT_THAT(Refusal(place), StartsWith("lan:" + place + ": nobody listens there; check the address"));
+    EXPECT_THAT(Refusal(place),
+                StartsWith("lan:" + place + ": nobody listens there; check the address"));
     EXPECT_LT(std::chrono::steady_clock::now() - before, std::chrono::seconds(5));
 }
 

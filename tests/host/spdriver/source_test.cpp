@@ -77,9 +77,8 @@ TEST(Capture, AReplayAnswersWhatWasRecorded) {
     std::ifstream in(file);
     std::getline(std::getline(in, facts), first);
     EXPECT_THAT(facts, StartsWith("{\"ipmisel_capture\":1,\"machine_type\":\"SIM-1\","));
-    EXPECT_THAT(first,
-                StartsWith(R"({"node": 0, "request": "01200a004800000000000000000000", )"
-                           R"("response": null, "at": ")"));
+    EXPECT_THAT(first, StartsWith(R"({"node": 0, "request": "01200a004800000000000000000000", )"
+                                  R"("response": null, "at": ")"));
 
     const Source replay = OpenSources({"replay:" + file}, {});
     EXPECT_EQ(replay.facts.machineType, "SIM-1");
