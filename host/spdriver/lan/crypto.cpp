@@ -176,7 +176,10 @@ bool EqualInConstantTime(ByteView one, ByteView other) {
            Library::Get().CRYPTO_memcmp(one.data(), other.data(), one.size()) == 0;
 }
 
-void Wipe(std::span<std::uint8_t> bytes) { explicit_bzero(bytes.data(), bytes.size()); }
+void Wipe(std::span<std::uint8_t> bytes) {
+    // Nothing has no address.
+    if (!bytes.empty()) explicit_bzero(bytes.data(), bytes.size());
+}
 
 void RandomSource::Fill(std::span<std::uint8_t> bytes) {
     if (bytes.size() > pool_.size() - used_) {
