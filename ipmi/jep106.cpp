@@ -1,6 +1,7 @@
 #include "ipmi/jep106.h"
 
 #include <algorithm>
+#include <cstddef>
 
 namespace ipmi {
 namespace {
@@ -14,7 +15,7 @@ std::string_view ManufacturerAfterContinuations(std::span<const std::uint8_t> co
     const auto first =
         std::find_if(code.begin(), code.end(), [](std::uint8_t c) { return c != kContinuation; });
     const auto bank = first - code.begin();
-    if (first == code.end() || bank >= kJep106Banks) return {};
+    if (first == code.end() || bank >= std::ptrdiff_t{kJep106Banks}) return {};
     return ManufacturerOfBank(static_cast<std::uint8_t>(bank), *first);
 }
 

@@ -3,6 +3,8 @@
 #include <poll.h>
 
 #include <algorithm>
+#include <chrono>
+#include <ctime>
 #include <vector>
 
 #include "host/spdriver/stop.h"
@@ -28,10 +30,12 @@ void Wait(std::span<RequestPipeline* const> pipelines) {
         until = std::min(until, pipeline->NextTimer());
     }
     const auto rest = std::max(until - now, Clock::duration::zero());
-    const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(rest);
-    const timespec time{
-        seconds.count(),
-        std::chrono::duration_cast<std::chrono::nanoseconds>(rest - seconds).count()};
+    // Counted in the types of timespec, which are narrower than those of the clock on 32 bits.
+    using Seconds = std::chrono::duration<std::time_t>;
+    using Nanoseconds = std::chrono::duration<long, std::nano>;
+    const auto seconds = std::chrono::duration_cast<Seconds>(rest);
+    const auto nanoseconds = std::chrono::duration_cast<Nanoseconds>(rest - seconds);
+    const timespec time{seconds.count(), nanoseconds.count()};
     ppoll(waits.data(), waits.size(), &time, nullptr);
 }
 
