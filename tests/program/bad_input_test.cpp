@@ -149,8 +149,8 @@ TEST_F(BadInput, APluginThatIsCutShortIsRefused) {
     const auto whole =
         std::filesystem::path(IPMISEL_PROGRAM).parent_path() / "../lib/ipmisel/libipmisel.pi";
     const auto cut = folder.path() / "cut.pi";
-    const auto size = std::filesystem::file_size(whole);
-    for (const std::uintmax_t length : {std::uintmax_t{100}, std::uintmax_t{4096}, size / 8}) {
+    // All within what is loaded: how much follows it for debuggers depends on the build.
+    for (const std::uintmax_t length : {100, 4096, 65536}) {
         std::filesystem::copy_file(whole, cut, std::filesystem::copy_options::overwrite_existing);
         std::filesystem::resize_file(cut, length);
         ExpectRefused(Good({"--plugin", cut.string()}), 2, "it is cut short");
