@@ -161,6 +161,9 @@ TEST_F(BadInput, APluginThatIsCutShortIsRefused) {
 }
 
 TEST_F(BadInput, OutOfMemoryIsOneLine) {
+#ifdef __SANITIZE_ADDRESS__
+    GTEST_SKIP() << "AddressSanitizer takes more address space than the limit leaves";
+#endif
     Json server = Server();
     server["smbios"] = Json::array();
     for (int i = 0; i < 100000; ++i) server["smbios"].push_back(std::string(500, '0'));
@@ -184,8 +187,10 @@ TEST_F(BadInput, NamesOf255BytesAreWritten) {
 TEST_F(BadInput, WhatAKilledRunLeftIsTakenAwayByTheNext) {
     Json server = Server(200);
     server["bmcs"][0]["latency_us"] = 100000;
-    RunningProgram program(folder.path().string(), Command({"collect", "--from", Write(server),
-                                                            "--output", InPlace("report")}));
+    // Under a name of its own: it may not have been read when the next run's server is written.
+    const std::string slow = "sim:" + folder.Write("slow.json", server.dump());
+    RunningProgram program(folder.path().string(),
+                           Command({"collect", "--from", slow, "--output", InPlace("report")}));
     ASSERT_TRUE(Eventually([&] { return Left().size() == 1; }));
     // One that still runs keeps its file.
     EXPECT_EQ(Run(Good({})).exitStatus, 0);
