@@ -87,7 +87,7 @@ Source OpenLan(const std::vector<std::string>& places, const SourceOptions& opti
             source.nodes.push_back({candidate.name, nullptr, std::move(candidate.session)});
         }
     }
-    if (!source.unreachable.empty()) {
+    if (source.nodes.empty()) {
         std::string reasons;
         for (const UnreachableNode& node : source.unreachable) {
             reasons += (reasons.empty() ? "" : "\n") + node.reason;

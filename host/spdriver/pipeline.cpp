@@ -29,7 +29,8 @@ void Wait(std::span<RequestPipeline* const> pipelines) {
         waits.push_back({pipeline->Descriptor(), POLLIN, 0});
         until = std::min(until, pipeline->NextTimer());
     }
-    const auto rest = std::max(until - now, Clock::duration::zero());
+    // What is due since the beginning of time is too far away to be subtracted.
+    const auto rest = std::max(until, now) - now;
     // Counted in the types of timespec, which are narrower than those of the clock on 32 bits.
     using Seconds = std::chrono::duration<std::time_t>;
     using Nanoseconds = std::chrono::duration<long, std::nano>;

@@ -195,8 +195,9 @@ void OpenTogether(std::span<LanSession* const> sessions) {
             waits.push_back({session->Descriptor(), POLLIN, 0});
             until = std::min(until, session->NextTimer());
         }
-        const auto rest = std::chrono::ceil<std::chrono::milliseconds>(until - now).count();
-        poll(waits.data(), waits.size(), static_cast<int>(std::max<long>(rest, 0)));
+        const auto rest =
+            std::chrono::ceil<std::chrono::milliseconds>(std::max(until, now) - now).count();
+        poll(waits.data(), waits.size(), static_cast<int>(rest));
         for (LanSession* session : sessions) {
             if (session->IsOpening()) session->Advance(Clock::now());
         }
