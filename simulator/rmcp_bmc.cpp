@@ -219,7 +219,7 @@ Packet RmcpBmc::OpenSession(const Packet& payload) {
     session->consoleId = Cut(payload, 4, 4);
     session->managedId = Number(0x1000 + ++sessionsOpened_);
     const std::uint8_t privilege = options_.deviations.noPrivilege ? 0 : 4;
-    const Packet answer = Setup(
+    Packet answer = Setup(
         0x11,
         Join(
             {tag, {0, privilege, 0}, session->consoleId, session->managedId, Cut(payload, 8, 24)}));

@@ -1,6 +1,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
+#include <cmath>
 #include <cstddef>
 #include <cstring>
 #include <fstream>
@@ -56,7 +57,7 @@ class ReplayClock {
 public:
     void Add(const std::string& at, double tookSeconds) {
         const TCIMDateTime answered(at.c_str());
-        const auto took = static_cast<std::int64_t>(std::min(tookSeconds, kMaxSeconds) * 1e6 + 0.5);
+        const std::int64_t took = std::llround(std::min(tookSeconds, kMaxSeconds) * 1e6);
         times_.push_back(
             {TextOf(answered.TotalMicroseconds() - took, answered.GetUTCOffset()), at});
     }

@@ -138,8 +138,9 @@ tqrhost::PluginSettings SettingsOf(const CollectOptions& options,
         for (const auto& plugin : plugins.Plugins()) {
             const std::string problem = plugin->ProblemOfOption(name, value);
             if (problem.empty()) continue;
-            throw Failure(kExitUsage,
-                          "cannot use --" + name + ": " + problem + "; correct it there");
+            std::string line = "cannot use --" + name;
+            line.append(": ").append(problem).append("; correct it there");
+            throw Failure(kExitUsage, line);
         }
     }
     return settings;

@@ -240,8 +240,9 @@ Packet Codec::OpenSessionRequest(std::uint8_t tag) {
     // One algorithm of each kind: type of the payload, its length 8, the algorithm.
     const std::uint8_t algorithms[] = {suite_.authentication, suite_.integrity,
                                        suite_.confidentiality};
-    for (std::uint8_t kind = 0; kind < std::size(algorithms); ++kind) {
-        packet.U8(kind).Fill(2, 0).U8(8).U8(algorithms[kind]).Fill(3, 0);
+    std::uint8_t kind = 0;
+    for (const std::uint8_t algorithm : algorithms) {
+        packet.U8(kind++).Fill(2, 0).U8(8).U8(algorithm).Fill(3, 0);
     }
     return packet;
 }

@@ -143,7 +143,7 @@ void SessionRequests::MarkLost(Request* request) {
     window_.Lost(request->lastSerial, serial_);
 }
 
-void SessionRequests::Fail(std::vector<Request> requests) {
+void SessionRequests::Fail(const std::vector<Request>& requests) {
     for (const Request& request : requests) {
         if (options_.failed) options_.failed(request.command);
         request.handler(std::nullopt);

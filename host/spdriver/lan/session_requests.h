@@ -113,7 +113,7 @@ private:
     const Request* OldestOutstanding() const;
     Request* Find(std::uint64_t id);
     void FailOverdue(Clock::time_point now);
-    void Fail(std::vector<Request> requests);
+    void Fail(const std::vector<Request>& requests);
     CommandTiming::Duration RestOf(const Request& request) const;
     void FindLost(Clock::time_point now);
     void MarkLost(Request* request);
