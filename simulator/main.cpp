@@ -100,6 +100,7 @@ std::vector<std::unique_ptr<BmcPort>> MakePorts(const Options& options) {
 
 void Serve(const std::vector<std::unique_ptr<BmcPort>>& ports) {
     std::vector<pollfd> waits;
+    waits.reserve(ports.size());
     for (const auto& port : ports) waits.push_back({port->Descriptor(), POLLIN, 0});
     while (gEnded == 0) {
         const auto now = BmcPort::Clock::now();

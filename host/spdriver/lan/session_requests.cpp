@@ -162,7 +162,7 @@ void SessionRequests::FailOverdue(Clock::time_point now) {
         heardNothing_ |= lastHeard_ <= *request.firstSent;
         tries_.GiveUp(request.id, std::nullopt, now + RestOf(request));
     }
-    Fail(std::move(failed));
+    Fail(failed);
 }
 
 void SessionRequests::FindLost(Clock::time_point now) {
@@ -267,7 +267,7 @@ void SessionRequests::FailAll() {
     failed.insert(failed.end(), std::make_move_iterator(waiting_.begin()),
                   std::make_move_iterator(waiting_.end()));
     waiting_.clear();
-    Fail(std::move(failed));
+    Fail(failed);
 }
 
 std::optional<SessionRequests::Silence> SessionRequests::SilentSince() const {
