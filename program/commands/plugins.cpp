@@ -50,7 +50,9 @@ std::vector<std::string> ClassesToCollect(const std::vector<std::string>& named,
         for (const tqrhost::ClassInfo& info : plugins.Classes()) {
             known += (known.empty() ? "" : ", ") + info.name;
         }
-        throw Failure(kExitUsage, "there is no class \"" + name + "\"; use one of " + known);
+        std::string line = "there is no class \"" + name;
+        line.append("\"; use one of ").append(known);
+        throw Failure(kExitUsage, line);
     }
     std::vector<std::string> wanted = named;
     for (const std::string_view name : ofFormat) {
