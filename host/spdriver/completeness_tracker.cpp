@@ -96,6 +96,23 @@ const NodeCompleteness& CompletenessTracker::Completeness() {
     return account_;
 }
 
+std::optional<ReadingState> CompletenessTracker::StateAfter(const RequestFrame& request) const {
+    ReadingState state;
+    if (request.code() == ipmi::kGetSelEntry || request.code() == ipmi::kGetSdr) {
+        const Source& source = request.code() == ipmi::kGetSelEntry ? log_ : sensors_;
+        state = source.isLog ? kEventLogReading : kSensorReading;
+        state.read = source.walk.count;
+        state.announced = source.account->announced;
+    } else if (request.code() == ipmi::kReadFruData) {
+        state = {"inventory", "devices", facts_.inventory().read};
+    } else if (request.netFn() == ipmi::kGetSensorReading.netFn) {
+        state = {"sensor readings", "sensors", facts_.readings().read};
+    } else {
+        return std::nullopt;
+    }
+    return state;
+}
+
 void CompletenessTracker::NoteInfo(Source* source, bool askedAgain,
                                    const std::optional<Response>& response) {
     const std::string what = source->infoCommand;

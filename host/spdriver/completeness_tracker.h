@@ -10,6 +10,7 @@
 #include "host/spdriver/completeness.h"
 #include "host/spdriver/fact_tracker.h"
 #include "host/spdriver/loop_guard.h"
+#include "host/spdriver/reading.h"
 #include "host/spdriver/transport.h"
 
 namespace tqrhost {
@@ -21,6 +22,8 @@ public:
     explicit CompletenessTracker(std::unique_ptr<LoopGuard> guard);
     std::optional<Response> Exchange(const RequestFrame& request) override;
     const NodeCompleteness& Completeness();
+    /// How far the reading is that the request belongs to; empty when it belongs to none.
+    std::optional<ReadingState> StateAfter(const RequestFrame& request) const;
 
 private:
     void Note(const RequestFrame& request, const std::optional<Response>& response);

@@ -155,12 +155,19 @@ void ControllerReader::Checked(std::optional<Response> info) {
     memory_.laterLogInfo.emplace(std::move(info));
 }
 
-std::size_t ControllerReader::RecordsRead() const {
-    std::size_t records = 0;
-    for (const auto& reader : {log_, logAgain_, sensors_}) {
-        if (reader) records += reader->store().size();
-    }
-    return records;
+bool ControllerReader::ReadsLog() const {
+    return phase_ == Phase::kLog || phase_ == Phase::kLogAgain;
+}
+
+ReadCount ControllerReader::LogCount() const {
+    if (!needs_.log) return {0, 0};
+    const auto& reader = logAgain_ ? logAgain_ : log_;
+    return {reader ? reader->store().size() : 0, CountIn(logAgain_ ? infoAgain_ : memory_.logInfo)};
+}
+
+ReadCount ControllerReader::SensorCount() const {
+    if (!needs_.sensors) return {0, 0};
+    return {sensors_ ? sensors_->store().size() : 0, CountIn(memory_.sensorInfo)};
 }
 
 ControllerMemory ControllerReader::Take() {

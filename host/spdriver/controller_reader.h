@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <functional>
 #include <memory>
 #include <optional>
@@ -16,6 +17,12 @@ struct ReadingNeeds {
     bool sensors = true;
 };
 
+/// Records that have come, of how many that the controller announced.
+struct ReadCount {
+    std::size_t read = 0;
+    std::optional<std::size_t> announced{};  ///< empty when it has not said, or not yet
+};
+
 /// Reads the event log and then the sensor repository of one controller into its memory. Ends with
 /// a second Get SEL Info: when the log has changed meanwhile it is read once more.
 class ControllerReader : public std::enable_shared_from_this<ControllerReader> {
@@ -25,7 +32,9 @@ public:
     /// Asks for the first things; the rest follows as answers come.
     void Start();
     bool Done() const { return phase_ == Phase::kDone; }
-    std::size_t RecordsRead() const;
+    bool ReadsLog() const;
+    ReadCount LogCount() const;
+    ReadCount SensorCount() const;
     /// What was read, also of a reading that was stopped; once.
     ControllerMemory Take();
 

@@ -9,11 +9,31 @@
 
 namespace tqrhost {
 
+namespace {
+
+struct Live {
+    SourceNode* node;
+    std::shared_ptr<ControllerReader> reader;
+};
+
+/// The event logs for as long as one of them is read, then the sensor repositories.
+ReadingState StateOf(const std::vector<Live>& live) {
+    const bool log = std::any_of(live.begin(), live.end(),
+                                 [](const Live& one) { return one.reader->ReadsLog(); });
+    ReadingState state = log ? kEventLogReading : kSensorReading;
+    state.announced = 0;
+    for (const Live& one : live) {
+        const ReadCount count = log ? one.reader->LogCount() : one.reader->SensorCount();
+        state.read += count.read;
+        if (!count.announced) state.announced.reset();
+        if (state.announced) *state.announced += *count.announced;
+    }
+    return state;
+}
+
+}  // namespace
+
 void ReadLiveNodes(Source& source, ReadingNeeds needs, const ReadingProgress& progress) {
-    struct Live {
-        SourceNode* node;
-        std::shared_ptr<ControllerReader> reader;
-    };
     std::vector<Live> live;
     std::vector<RequestPipeline*> pipelines;
     for (SourceNode& node : source.nodes) {
@@ -22,11 +42,8 @@ void ReadLiveNodes(Source& source, ReadingNeeds needs, const ReadingProgress& pr
         live.push_back({&node, std::make_shared<ControllerReader>(node.pipeline.get(), needs)});
     }
     for (const Live& one : live) one.reader->Start();
-    std::size_t told = 0;
     RunPipelines(pipelines, [&] {
-        std::size_t records = 0;
-        for (const Live& one : live) records += one.reader->RecordsRead();
-        if (progress && std::exchange(told, records) != records) progress(records);
+        if (progress && !live.empty()) progress(StateOf(live));
         return std::all_of(live.begin(), live.end(),
                            [](const Live& one) { return one.reader->Done(); });
     });

@@ -2,18 +2,33 @@
 
 #include <cstddef>
 #include <functional>
+#include <optional>
+#include <string_view>
 
 #include "host/spdriver/controller_reader.h"
 #include "host/spdriver/source.h"
 
 namespace tqrhost {
 
-/// Called with the number of records that have come from all nodes, at every change.
-using ReadingProgress = std::function<void(std::size_t records)>;
+/// How far the reading is.
+struct ReadingState {
+    std::string_view what;  ///< "event log", "sensor repository", "sensor readings", "inventory"
+    std::string_view unit;  ///< of the counts: "records", "sensors", "devices"
+    std::size_t read = 0;
+    std::optional<std::size_t> announced{};  ///< empty when that is not known
+};
+inline constexpr ReadingState kEventLogReading{"event log", "records"};
+inline constexpr ReadingState kSensorReading{"sensor repository", "records"};
+using ReadingProgress = std::function<void(const ReadingState& state)>;
 
 /// Reads the live nodes of a source, all at the same time, as far as is needed, before the
 /// plug-ins' pass, which is answered from there. The other nodes answer each request by themselves.
-/// Ends early when the collection is to stop; what has come is kept.
+/// Ends early when the collection is to stop; what has come is kept. `progress` is called with the
+/// counts of all nodes together whenever records have come.
 void ReadLiveNodes(Source& source, ReadingNeeds needs, const ReadingProgress& progress = {});
+
+/// Calls `progress` after each read of the pass over the open machine, with the counts of the node
+/// that was read; until it is called with nothing.
+void ObserveReading(ReadingProgress progress);
 
 }  // namespace tqrhost

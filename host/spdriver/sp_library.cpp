@@ -13,6 +13,7 @@
 #include "host/core/host.h"
 #include "host/spdriver/completeness_tracker.h"
 #include "host/spdriver/loop_guard.h"
+#include "host/spdriver/reading.h"
 #include "host/spdriver/record_trimmer.h"
 #include "host/spdriver/source.h"
 #include "ipmi/command.h"
@@ -58,6 +59,11 @@ std::vector<UnreachableNode>& Unreachable() {
     return unreachable;
 }
 
+ReadingProgress& Observer() {
+    static ReadingProgress observer;
+    return observer;
+}
+
 /// The last answer was that the BMC does not know an optional command.
 bool gOptionalRefused = false;
 
@@ -95,6 +101,8 @@ void EndPass() {
                                       true);
     }
 }
+
+void ObserveReading(ReadingProgress progress) { Observer() = std::move(progress); }
 
 bool OptionalCommandRefused() { return gOptionalRefused; }
 
@@ -161,6 +169,9 @@ bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSi
     std::optional<tqrhost::Response> response;
     try {
         response = impl_->transport->Exchange(*request);
+        if (const auto& observer = tqrhost::Observer()) {
+            if (const auto state = impl_->transport->StateAfter(*request)) observer(*state);
+        }
     } catch (const std::exception& error) {  // callers know no exceptions
         const std::string line = std::string("The way to the BMC failed: ") + error.what();
         fdrWriteLog(ILogger::kError, line.c_str());

@@ -32,6 +32,7 @@
 #include "program/commands/plugins.h"
 #include "program/commands/stop_signals.h"
 #include "program/commands/text_file.h"
+#include "program/reports/progress.h"
 #include "program/reports/report.h"
 #include "program/reports/report_sink.h"
 #include "program/reports/terminal_text.h"
@@ -161,6 +162,36 @@ std::vector<std::string> TellNotices() {
     return texts;
 }
 
+/// Says on the terminal how far the reading is, until it is ended.
+class ReadingProgressLine {
+public:
+    explicit ReadingProgressLine(bool wanted) {
+        if (wanted) line_.emplace();
+    }
+    ~ReadingProgressLine() { End(); }
+    ReadingProgressLine(const ReadingProgressLine&) = delete;
+    ReadingProgressLine& operator=(const ReadingProgressLine&) = delete;
+
+    /// Empty where nothing would be seen. Must not be called when the object is gone.
+    tqrhost::ReadingProgress Observer() {
+        if (!line_ || !line_->Enabled()) return {};
+        return [this](const tqrhost::ReadingState& state) {
+            if (!line_) return;
+            line_->Show({.what = state.what,
+                         .done = state.read,
+                         .total = state.announced,
+                         .unit = state.unit});
+        };
+    }
+    void End() {
+        tqrhost::ObserveReading({});
+        line_.reset();
+    }
+
+private:
+    std::optional<ProgressLine> line_;
+};
+
 int CollectTo(const CollectOptions& options, ReportOutput& output) {
     const auto begin = std::chrono::steady_clock::now();
     // The plug-ins first: without them nobody is asked for a password.
@@ -182,7 +213,8 @@ int CollectTo(const CollectOptions& options, ReportOutput& output) {
     for (const SystemInfo& system : systems) settings.systemNames.push_back(system.name);
     tqrhost::SetPluginSettings(std::move(settings));
     StopSignals::BeginCollecting();
-    tqrhost::ReadLiveNodes(source, NeedsOf(wanted, *plugins));
+    ReadingProgressLine progress(options.progress);
+    tqrhost::ReadLiveNodes(source, NeedsOf(wanted, *plugins), progress.Observer());
     const std::shared_ptr<tqrhost::CaptureWriter> capture = Record(options, source, wanted);
     const Machine machine(std::move(source));
 
@@ -201,9 +233,12 @@ int CollectTo(const CollectOptions& options, ReportOutput& output) {
     ReportSink sink(*report, *plugins, wanted, nodes);
     tqrhost::CollectionPlan plan(*plugins, wanted);
     ReportEnd end;
+    if (output.StreamsToTerminal()) progress.End();
+    tqrhost::ObserveReading(progress.Observer());
     plan.RunPasses(sink, [] { return !OutputIsOver(); });
     if (HasBmc()) plan.RunExporters(sink);
     tqrhost::EndPass();
+    progress.End();
     StopSignals::EndCollecting();
     sink.Check();
     end.stopped = tqrhost::Stopped();

@@ -21,6 +21,7 @@ struct CollectOptions {
     std::optional<double> deadlineSeconds;
     std::vector<std::string> names;  ///< of the systems, as their sources follow each other
     std::optional<std::string> severities;
+    bool progress = true;  ///< on standard error, where that is a terminal
 };
 
 /// Collects and writes a report; the exit status. Throws Failure.

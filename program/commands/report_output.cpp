@@ -1,5 +1,7 @@
 #include "program/commands/report_output.h"
 
+#include <unistd.h>
+
 #include <chrono>
 #include <utility>
 
@@ -100,6 +102,11 @@ std::unique_ptr<ReportWriter> ReportOutput::Make(const ReportHead& head) {
         FilterEvents(format.make(file_, head, LookOfOutput(options_.colour, toFile)), wish);
     const bool paged = format.name == "table" && options_.pager && !toFile;
     return paged ? std::make_unique<PagedReport>(std::move(report), pager_) : std::move(report);
+}
+
+bool ReportOutput::StreamsToTerminal() const {
+    const bool toFile = options_.output.has_value() && *options_.output != "-";
+    return !toFile && !FindFormat(options_.format)->forPeople && isatty(STDOUT_FILENO) == 1;
 }
 
 void ReportOutput::Commit() {

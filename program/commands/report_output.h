@@ -33,6 +33,8 @@ public:
     explicit ReportOutput(const ReportOptions& options);
     /// The writer of the report; lives no longer than the object.
     std::unique_ptr<ReportWriter> Make(const ReportHead& head);
+    /// The report comes to the terminal in pieces, while it is collected.
+    bool StreamsToTerminal() const;
     /// The report is whole: the file stands in its place, the pager has been read.
     void Commit();
 

@@ -7,6 +7,7 @@
 #include <cstring>
 
 #include "host/spdriver/stop.h"
+#include "program/reports/progress.h"
 
 namespace ipmisel {
 namespace {
@@ -22,6 +23,7 @@ void Handle(int number) {
         tqrhost::StopNow();
         return;
     }
+    HideProgress();
     if (gUnfinishedFile[0] != '\0') unlink(gUnfinishedFile);
     signal(number, SIG_DFL);
     raise(number);  // delivered when the handler returns

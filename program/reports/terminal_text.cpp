@@ -5,6 +5,8 @@
 #include <cstdio>
 #include <iterator>
 
+#include "program/reports/progress.h"
+
 namespace ipmisel {
 namespace {
 
@@ -105,6 +107,7 @@ std::string Fit(std::string_view text, std::size_t width) {
 
 void Say(std::string_view text) {
     const std::string line = "ipmisel: " + TerminalText(text) + "\n";
+    HideProgress();
     // In one piece; there is nobody to tell when it fails.
     std::fwrite(line.data(), 1, line.size(), stderr);
 }
