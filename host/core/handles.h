@@ -17,8 +17,8 @@ struct TCPluginCallbacks : tqrhost::Live<TCPluginCallbacks> {
 };
 
 struct fdriIOHandle : tqrhost::Live<fdriIOHandle> {
-    explicit fdriIOHandle(tqrhost::InstanceSink& instanceSink) : sink(instanceSink) {}
-    tqrhost::InstanceSink& sink;
+    explicit fdriIOHandle(InstanceSink& instanceSink) : sink(instanceSink) {}
+    InstanceSink& sink;
     bool open = false;  ///< an instance is
 };
 

@@ -20,7 +20,7 @@
 // What the collector sees of the host: the facts of the machine, the log, the plug-in. The state
 // behind it is the process's own; nothing here is for more than one thread.
 
-namespace tqrhost {
+namespace NQORTQR20 {
 
 /// What is known of the machine that is collected from, beside its BMCs. A capture keeps it, so
 /// that a replay finds the same machine.
@@ -38,11 +38,11 @@ struct Notice {
     std::string markupText;  ///< empty when there is none
 };
 
-using LogConsumer = std::function<void(NQORTQR20::ILogger::ETQRLogSeverity, std::string_view)>;
+using LogConsumer = std::function<void(ILogger::ETQRLogSeverity, std::string_view)>;
 
 void SetMachineFacts(MachineFacts facts);
 /// Now by this machine's clock, whatever the facts of the collection say.
-NQORTQR20::TCIMDateTime SystemTime();
+TCIMDateTime SystemTime();
 /// The local time of those facts, from now on.
 void SetLocalTime(std::string localTime);
 const MachineFacts& GetMachineFacts();
@@ -56,7 +56,7 @@ void SetPluginSettings(PluginSettings settings);
 
 /// Everybody who reads the log, each with the highest severity number that it wants.
 /// Returns an identity for RemoveLogConsumer.
-int AddLogConsumer(NQORTQR20::ILogger::ETQRLogSeverity upTo, LogConsumer consumer);
+int AddLogConsumer(ILogger::ETQRLogSeverity upTo, LogConsumer consumer);
 void RemoveLogConsumer(int identity);
 
 /// The notices handed over since the last call.
@@ -76,7 +76,7 @@ struct PluginInfo {
 /// A class as its plug-in declares it (tqr/classes.h).
 struct PropertyInfo {
     std::string name;
-    NQORTQR20::fdrPropertyType type;
+    fdrPropertyType type;
     std::string description;
 };
 struct ClassInfo {
@@ -87,7 +87,7 @@ struct ClassInfo {
     std::string exporter;      ///< empty: getData collects the class
     std::vector<PropertyInfo> properties;
 
-    bool Is(NQORTQR20::fdrClassMark mark) const { return (marks & mark) != 0; }
+    bool Is(fdrClassMark mark) const { return (marks & mark) != 0; }
 };
 
 /// A loaded and initialised plug-in; de-initialised and unloaded with the object.
@@ -108,8 +108,7 @@ public:
     /// Why the plug-in refuses a value of an option (fdrCheckOption); empty when it does not.
     std::string ProblemOfOption(const std::string& name, const std::string& value) const;
     /// One collection of the named classes; blocks until the pass is over.
-    NQORTQR20::TTQRStatusCode Collect(const std::vector<std::string>& classNames,
-                                      InstanceSink& sink);
+    TTQRStatusCode Collect(const std::vector<std::string>& classNames, InstanceSink& sink);
     /// An exported function of the plug-in by name, null when it has none.
     void* Symbol(const char* name) const;
     /// Runs an exported function `int name(TCPluginCallbacks*, fdriIOHandle*)` with an output of
@@ -129,10 +128,10 @@ public:
     ~OutputHandle();
     OutputHandle(const OutputHandle&) = delete;
     OutputHandle& operator=(const OutputHandle&) = delete;
-    NQORTQR20::fdriIOHandle* get() const { return handle_.get(); }
+    fdriIOHandle* get() const { return handle_.get(); }
 
 private:
-    std::unique_ptr<NQORTQR20::fdriIOHandle> handle_;
+    std::unique_ptr<fdriIOHandle> handle_;
 };
 
 class PluginContext {
@@ -141,10 +140,10 @@ public:
     ~PluginContext();
     PluginContext(const PluginContext&) = delete;
     PluginContext& operator=(const PluginContext&) = delete;
-    NQORTQR20::TCPluginCallbacks* get() const { return context_.get(); }
+    TCPluginCallbacks* get() const { return context_.get(); }
 
 private:
-    std::unique_ptr<NQORTQR20::TCPluginCallbacks> context_;
+    std::unique_ptr<TCPluginCallbacks> context_;
 };
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

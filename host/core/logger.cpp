@@ -6,9 +6,8 @@
 #include "host/core/host.h"
 #include "tqr/log.h"
 
+namespace NQORTQR20 {
 namespace {
-
-using NQORTQR20::ILogger;
 
 class CoreLogger : public ILogger {
 public:
@@ -29,7 +28,7 @@ public:
 
     bool Enabled(ETQRLogSeverity severity) const override { return severity <= highest_; }
 
-    int Add(ETQRLogSeverity upTo, tqrhost::LogConsumer consume) {
+    int Add(ETQRLogSeverity upTo, LogConsumer consume) {
         consumers_.push_back(
             std::make_shared<const Consumer>(Consumer{++identity_, upTo, std::move(consume)}));
         FindHighest();
@@ -45,7 +44,7 @@ private:
     struct Consumer {
         int identity;
         ETQRLogSeverity upTo;
-        tqrhost::LogConsumer consume;
+        LogConsumer consume;
     };
 
     void FindHighest() {
@@ -68,8 +67,6 @@ CoreLogger& Logger() {
 
 }  // namespace
 
-namespace NQORTQR20 {
-
 void fdrWriteLog(ILogger::ETQRLogSeverity severity, const char* text) {
     Logger().Write(severity, text);
 }
@@ -78,14 +75,10 @@ bool fdrLogEnabled(ILogger::ETQRLogSeverity severity) { return Logger().Enabled(
 
 ILogger* TRootObject::GetCoreLogger() { return &Logger(); }
 
-}  // namespace NQORTQR20
-
-namespace tqrhost {
-
 int AddLogConsumer(ILogger::ETQRLogSeverity upTo, LogConsumer consumer) {
     return Logger().Add(upTo, std::move(consumer));
 }
 
 void RemoveLogConsumer(int identity) { Logger().Remove(identity); }
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

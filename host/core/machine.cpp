@@ -7,31 +7,26 @@
 #include "tqr/datetime.h"
 #include "tqr/log.h"
 
+namespace NQORTQR20 {
 namespace {
 
-tqrhost::MachineFacts& Facts() {
-    static tqrhost::MachineFacts facts;
+MachineFacts& Facts() {
+    static MachineFacts facts;
     return facts;
 }
 
-class Lan : public NQORTQR20::IIPMILan {
+class Lan : public IIPMILan {
 public:
     bool getipmiLanStatus() const override { return Facts().ipmiLan; }
 };
 
 }  // namespace
 
-namespace tqrhost {
-
 void SetMachineFacts(MachineFacts facts) { Facts() = std::move(facts); }
 
 void SetLocalTime(std::string localTime) { Facts().localTime = std::move(localTime); }
 
 const MachineFacts& GetMachineFacts() { return Facts(); }
-
-}  // namespace tqrhost
-
-namespace NQORTQR20 {
 
 IIPMILan* TRootObject::GetipmiLanIns() {
     static Lan lan;
@@ -42,17 +37,13 @@ std::string TOSSpecific::GetMachineTypeFromID() { return Facts().machineType; }
 
 TCIMDateTime TOSSpecific::GetLocalTime() {
     if (Facts().localTime) return TCIMDateTime(Facts().localTime->c_str());
-    return tqrhost::SystemTime();
+    return SystemTime();
 }
 
-}  // namespace NQORTQR20
-
-namespace tqrhost {
-
-NQORTQR20::TCIMDateTime SystemTime() {
+TCIMDateTime SystemTime() {
     timeval now{};
     std::tm local{};
-    NQORTQR20::TCIMDateTime time;
+    TCIMDateTime time;
     if (gettimeofday(&now, nullptr) == 0 && localtime_r(&now.tv_sec, &local) != nullptr) {
         time.Set(
             static_cast<unsigned short>(local.tm_year + 1900),
@@ -64,4 +55,4 @@ NQORTQR20::TCIMDateTime SystemTime() {
     return time;
 }
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

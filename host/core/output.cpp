@@ -14,7 +14,7 @@ namespace NQORTQR20 {
 // Values under construction belong to the plug-in until it deletes them; one that it forgets is
 // leaked and not collected at the end, so that a leak checker shows it.
 struct TCIMReference : tqrhost::Live<TCIMReference> {
-    tqrhost::ObjectPath path;
+    ObjectPath path;
 };
 
 struct TCIMValueArray : tqrhost::Live<TCIMValueArray> {
@@ -81,8 +81,8 @@ TTQRStatusCode fdrAddBooleanProperty(fdriIOHandle* output, const char* name, boo
 }
 
 TTQRStatusCode fdrAddTimeProperty(fdriIOHandle* output, const char* name, std::int64_t seconds) {
-    if (seconds < tqrhost::kFirstTime || seconds > tqrhost::kLastTime) return {kStatusFailed};
-    return AddValue(output, name, tqrhost::Time{seconds});
+    if (seconds < kFirstTime || seconds > kLastTime) return {kStatusFailed};
+    return AddValue(output, name, Time{seconds});
 }
 
 TTQRStatusCode fdrAddTextListProperty(fdriIOHandle* output, const char* name,
@@ -176,12 +176,7 @@ TTQRStatusCode fdrDeleteCIMReference(TCIMReference* reference) {
     return {kStatusOk};
 }
 
-}  // namespace NQORTQR20
-
-namespace tqrhost {
-
-OutputHandle::OutputHandle(InstanceSink& sink)
-    : handle_(std::make_unique<NQORTQR20::fdriIOHandle>(sink)) {}
+OutputHandle::OutputHandle(InstanceSink& sink) : handle_(std::make_unique<fdriIOHandle>(sink)) {}
 OutputHandle::~OutputHandle() = default;
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

@@ -25,13 +25,8 @@
 #include "tqr/log.h"
 #include "tqr/plugin.h"
 
+namespace NQORTQR20 {
 namespace {
-
-using NQORTQR20::fdrPluginCallbacks;
-using NQORTQR20::kStatusFailed;
-using NQORTQR20::kStatusOk;
-using NQORTQR20::TCPluginCallbacks;
-using NQORTQR20::TTQRStatusCode;
 
 /// The plug-in that is being loaded, as far as it has come.
 struct Registration {
@@ -42,8 +37,8 @@ struct Registration {
 
 Registration* gLoading = nullptr;  // null but while Plugin's constructor loads a library
 
-std::vector<tqrhost::Notice>& Notices() {
-    static std::vector<tqrhost::Notice> notices;
+std::vector<Notice>& Notices() {
+    static std::vector<Notice> notices;
     return notices;
 }
 
@@ -59,8 +54,8 @@ std::map<void*, fdrPluginCallbacks>& Residents() {
     return residents;
 }
 
-tqrhost::PluginSettings& Settings() {
-    static tqrhost::PluginSettings settings;
+PluginSettings& Settings() {
+    static PluginSettings settings;
     return settings;
 }
 
@@ -78,8 +73,7 @@ Result Contained(Call call, Result failed) {
         what = exception.what();
     } catch (...) {
     }
-    NQORTQR20::fdrWriteLog(NQORTQR20::ILogger::kError,
-                           ("Plug-in ended by an exception: " + what).c_str());
+    fdrWriteLog(ILogger::kError, ("Plug-in ended by an exception: " + what).c_str());
     return failed;
 }
 
@@ -97,23 +91,22 @@ std::optional<std::pair<unsigned, unsigned>> ParseVersion(std::string_view text)
 
 /// Whether this host has what a plug-in of that interface version uses.
 bool IsSupported(std::string_view version) {
-    const auto own = ParseVersion(NQORTQR20::fdrPluginInterfaceVersion);
+    const auto own = ParseVersion(fdrPluginInterfaceVersion);
     const auto wanted = ParseVersion(version);
     return wanted && wanted->first == own->first && wanted->second <= own->second;
 }
 
 /// What a plug-in's table says, copied. Empty when the table is not as tqr/classes.h has it.
-std::optional<std::vector<tqrhost::ClassInfo>> CopyClasses(const NQORTQR20::fdrClassTable& table) {
-    using NQORTQR20::fdrPropertyType;
+std::optional<std::vector<ClassInfo>> CopyClasses(const fdrClassTable& table) {
     const auto text = [](const char* value) { return std::string(value == nullptr ? "" : value); };
-    if (table.size != sizeof table || table.classInfoSize != sizeof(NQORTQR20::fdrClassInfo) ||
+    if (table.size != sizeof table || table.classInfoSize != sizeof(fdrClassInfo) ||
         (table.classes == nullptr && table.classCount > 0) ||
         (table.neededFiles == nullptr && table.neededFileCount > 0)) {
         return std::nullopt;
     }
-    std::vector<tqrhost::ClassInfo> classes;
-    for (const NQORTQR20::fdrClassInfo& row : std::span(table.classes, table.classCount)) {
-        tqrhost::ClassInfo& copy = classes.emplace_back();
+    std::vector<ClassInfo> classes;
+    for (const fdrClassInfo& row : std::span(table.classes, table.classCount)) {
+        ClassInfo& copy = classes.emplace_back();
         copy.name = text(row.name);
         copy.description = text(row.description);
         copy.marks = row.marks;
@@ -121,7 +114,7 @@ std::optional<std::vector<tqrhost::ClassInfo>> CopyClasses(const NQORTQR20::fdrC
         copy.exporter = text(row.exporter);
         if (copy.name.empty() || copy.description.empty() ||
             (row.properties == nullptr && row.propertyCount > 0) ||
-            (copy.Is(NQORTQR20::kPerLogRecord) && copy.nodeProperty.empty())) {
+            (copy.Is(kPerLogRecord) && copy.nodeProperty.empty())) {
             return std::nullopt;
         }
         for (const auto& property : std::span(row.properties, row.propertyCount)) {
@@ -172,8 +165,6 @@ std::string LoaderMessage() {
 
 }  // namespace
 
-namespace NQORTQR20 {
-
 TTQRStatusCode fdrRegisterPlugin(fdrPluginCallbacks* record, TCPluginCallbacks** context) {
     if (record == nullptr || context == nullptr || gLoading == nullptr || gLoading->done ||
         record->size != sizeof *record || record->initialise == nullptr ||
@@ -188,7 +179,7 @@ TTQRStatusCode fdrRegisterPlugin(fdrPluginCallbacks* record, TCPluginCallbacks**
 }
 
 TTQRStatusCode fdrGetHandle(TCPluginCallbacks* context, const TPluginManagerProvider** provider) {
-    static const TPluginManagerProvider theProvider{&tqrhost::GetMachineFacts()};
+    static const TPluginManagerProvider theProvider{&GetMachineFacts()};
     if (provider == nullptr) return {kStatusFailed};
     *provider = nullptr;
     if (!tqrhost::Live<TCPluginCallbacks>::Is(context)) return {kStatusFailed};
@@ -231,10 +222,6 @@ TTQRStatusCode fdrGetSystemName(TCPluginCallbacks* context, int node, const char
     if (node >= 0 && index < names.size()) *name = names[index].c_str();
     return {kStatusOk};
 }
-
-}  // namespace NQORTQR20
-
-namespace tqrhost {
 
 void SetPluginSettings(PluginSettings settings) { Settings() = std::move(settings); }
 
@@ -291,11 +278,10 @@ Plugin::Plugin(const std::filesystem::path& file) : impl_(std::make_unique<Impl>
     const std::string version = Info().interfaceVersion;
     if (!IsSupported(version)) {
         fail("it is made for version \"" + version +
-             "\" of the plug-in interface and this host has " +
-             NQORTQR20::fdrPluginInterfaceVersion + "; name one that fits with --plugin");
+             "\" of the plug-in interface and this host has " + fdrPluginInterfaceVersion +
+             "; name one that fits with --plugin");
     }
-    if (const auto* const table =
-            static_cast<const NQORTQR20::fdrClassTable*>(Symbol("fdrPluginClasses"))) {
+    if (const auto* const table = static_cast<const fdrClassTable*>(Symbol("fdrPluginClasses"))) {
         auto classes = CopyClasses(*table);
         if (!classes) fail("its table of classes is damaged; reinstall it");
         impl_->classes = std::move(*classes);
@@ -349,14 +335,14 @@ Plugin::~Plugin() {
 }
 
 PluginInfo Plugin::Info() const {
-    const auto info = Contained([&] { return impl_->callbacks->getInfo(impl_->context.get()); },
-                                NQORTQR20::fdrPluginInfo{});
+    const auto info =
+        Contained([&] { return impl_->callbacks->getInfo(impl_->context.get()); }, fdrPluginInfo{});
     const auto text = [](const char* value) { return std::string(value == nullptr ? "" : value); };
     return {text(info.name), text(info.version), text(info.interfaceVersion)};
 }
 
 std::string Plugin::ProblemOfOption(const std::string& name, const std::string& value) const {
-    const auto check = reinterpret_cast<NQORTQR20::fdrCheckOption>(Symbol("fdrPluginCheckOption"));
+    const auto check = reinterpret_cast<fdrCheckOption>(Symbol("fdrPluginCheckOption"));
     if (check == nullptr) return {};
     std::array<char, 512> problem{"it is refused"};
     const auto size = static_cast<std::uint32_t>(problem.size() - 1);
@@ -382,7 +368,7 @@ TTQRStatusCode Plugin::Collect(const std::vector<std::string>& classNames, Insta
 void* Plugin::Symbol(const char* name) const { return dlsym(impl_->library.get(), name); }
 
 std::optional<int> Plugin::RunExporter(const char* name, InstanceSink& sink) {
-    using Exporter = int (*)(TCPluginCallbacks*, NQORTQR20::fdriIOHandle*);
+    using Exporter = int (*)(TCPluginCallbacks*, fdriIOHandle*);
     const auto exporter = reinterpret_cast<Exporter>(Symbol(name));
     if (exporter == nullptr) return std::nullopt;
     OutputHandle output(sink);
@@ -394,4 +380,4 @@ PluginContext::PluginContext(const std::filesystem::path& pluginFolder)
     : context_(std::make_unique<TCPluginCallbacks>(PathOfPlugin(pluginFolder))) {}
 PluginContext::~PluginContext() = default;
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

@@ -4,7 +4,7 @@
 #include <map>
 #include <system_error>
 
-namespace tqrhost {
+namespace NQORTQR20 {
 namespace {
 
 namespace fs = std::filesystem;
@@ -89,7 +89,7 @@ const ClassInfo* PluginSet::FindClass(std::string_view name) const {
 std::vector<std::string> PluginSet::DefaultClasses() const {
     std::vector<std::string> names;
     for (const ClassInfo& info : Classes()) {
-        if (info.Is(NQORTQR20::kByDefault)) names.push_back(info.name);
+        if (info.Is(kByDefault)) names.push_back(info.name);
     }
     return names;
 }
@@ -106,7 +106,7 @@ void PluginSet::CheckNeededFiles(const std::vector<std::string>& classNames) con
 CollectionPlan::CollectionPlan(PluginSet& plugins, const std::vector<std::string>& classNames)
     : plugins_(plugins) {
     for (const auto& plugin : plugins.Plugins()) {
-        statuses_.push_back({plugin->Info(), {NQORTQR20::kStatusOk}});
+        statuses_.push_back({plugin->Info(), {kStatusOk}});
     }
     bool passEnds = true;
     for (const std::string& name : classNames) {
@@ -119,7 +119,7 @@ CollectionPlan::CollectionPlan(PluginSet& plugins, const std::vector<std::string
         }
         if (passEnds || passes_.back().plugin != owner) passes_.push_back({owner, {}});
         passes_.back().classNames.push_back(name);
-        passEnds = info->Is(NQORTQR20::kWrittenAtEnd);
+        passEnds = info->Is(kWrittenAtEnd);
     }
 }
 
@@ -133,22 +133,21 @@ void CollectionPlan::RunPasses(InstanceSink& sink, bool (*goesOn)()) {
 void CollectionPlan::RunExporters(InstanceSink& sink) {
     for (const Exporter& exporter : exporters_) {
         Plugin& plugin = *plugins_.Plugins()[exporter.plugin];
-        Note(exporter.plugin, {plugin.RunExporter(exporter.function.c_str(), sink)
-                                   .value_or(NQORTQR20::kStatusFailed)});
+        Note(exporter.plugin,
+             {plugin.RunExporter(exporter.function.c_str(), sink).value_or(kStatusFailed)});
     }
 }
 
-NQORTQR20::TTQRStatusCode CollectionPlan::Status() const {
+TTQRStatusCode CollectionPlan::Status() const {
     const auto failed = std::find_if(statuses_.begin(), statuses_.end(), [](const auto& each) {
-        return each.status.code != NQORTQR20::kStatusOk;
+        return each.status.code != kStatusOk;
     });
-    return failed == statuses_.end() ? NQORTQR20::TTQRStatusCode{NQORTQR20::kStatusOk}
-                                     : failed->status;
+    return failed == statuses_.end() ? TTQRStatusCode{kStatusOk} : failed->status;
 }
 
-void CollectionPlan::Note(std::size_t plugin, NQORTQR20::TTQRStatusCode status) {
-    NQORTQR20::TTQRStatusCode& kept = statuses_[plugin].status;
-    if (kept.code == NQORTQR20::kStatusOk) kept = status;
+void CollectionPlan::Note(std::size_t plugin, TTQRStatusCode status) {
+    TTQRStatusCode& kept = statuses_[plugin].status;
+    if (kept.code == kStatusOk) kept = status;
 }
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

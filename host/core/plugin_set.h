@@ -8,12 +8,12 @@
 
 #include "host/core/host.h"
 
-namespace tqrhost {
+namespace NQORTQR20 {
 
 /// How a plug-in's part of a collection ended.
 struct PluginStatus {
     PluginInfo plugin;
-    NQORTQR20::TTQRStatusCode status{};
+    TTQRStatusCode status{};
 };
 
 /// The plug-ins of a process, loaded and initialised, and the classes that they have. Operations
@@ -58,7 +58,7 @@ public:
     /// One for each plug-in of the set; the status is that of its first call that did not end well.
     const std::vector<PluginStatus>& Statuses() const { return statuses_; }
     /// The first of them that is not 0.
-    NQORTQR20::TTQRStatusCode Status() const;
+    TTQRStatusCode Status() const;
 
 private:
     struct Pass {
@@ -69,7 +69,7 @@ private:
         std::size_t plugin;
         std::string function;
     };
-    void Note(std::size_t plugin, NQORTQR20::TTQRStatusCode status);
+    void Note(std::size_t plugin, TTQRStatusCode status);
 
     PluginSet& plugins_;
     std::vector<Pass> passes_;
@@ -77,4 +77,4 @@ private:
     std::vector<PluginStatus> statuses_;
 };
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

@@ -5,7 +5,7 @@
 #include <chrono>
 #include <cstdio>
 
-namespace tqrhost {
+namespace NQORTQR20 {
 
 std::string TimeText(Time time) {
     // Not gmtime: a time_t may have 32 bits.
@@ -37,4 +37,4 @@ bool WholeInstanceSink::AddProperty(std::string_view name, const PropertyValue& 
 
 bool WholeInstanceSink::CloseInstance() { return Take(open_); }
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

@@ -7,7 +7,9 @@
 #include <variant>
 #include <vector>
 
-namespace tqrhost {
+#include "host/core/internal.h"
+
+namespace NQORTQR20 {
 
 /// An object path: class name and string keys.
 struct ObjectPath {
@@ -60,4 +62,4 @@ private:
     Instance open_;
 };
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

@@ -6,7 +6,7 @@
 
 #include "host/spdriver/source.h"
 
-namespace tqrhost {
+namespace NQORTQR20 {
 
 /// A capture file in the making; docs/capture.md has its format. It is complete when the transports
 /// that write to it are gone.
@@ -23,4 +23,4 @@ public:
 std::shared_ptr<CaptureWriter> RecordTo(const std::string& file, Source& source,
                                         const std::vector<std::string>& classes = {});
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

@@ -4,7 +4,9 @@
 #include <string>
 #include <vector>
 
-namespace tqrhost {
+#include "host/core/internal.h"
+
+namespace NQORTQR20 {
 
 /// One read that brought nothing, or too little.
 struct ReadFault {
@@ -46,4 +48,4 @@ struct NodeCompleteness {
 /// One for each node of the open machine.
 std::vector<NodeCompleteness> GetCompleteness();
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

@@ -32,12 +32,6 @@ const char* StopText(StopReason reason) {
 
 }  // namespace
 
-bool NodeCompleteness::Whole() const {
-    const bool faulty = std::any_of(faults.begin(), faults.end(),
-                                    [](const ReadFault& fault) { return fault.ofLogOrSensors; });
-    return !faulty && log.Missing() == 0 && log.NotExported() == 0 && sensors.Missing() == 0;
-}
-
 CompletenessTracker::CompletenessTracker(std::unique_ptr<LoopGuard> guard)
     : guard_(std::move(guard)),
       log_{"Get SEL Info", "Get SEL Entry", true, &account_.log, {}, {}, 0, 0, 0},

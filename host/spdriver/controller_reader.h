@@ -7,15 +7,10 @@
 
 #include "host/spdriver/controller_memory.h"
 #include "host/spdriver/pipeline.h"
+#include "host/spdriver/reading.h"
 #include "host/spdriver/record_reader.h"
 
 namespace tqrhost {
-
-/// What of a controller is to be read.
-struct ReadingNeeds {
-    bool log = true;
-    bool sensors = true;
-};
 
 /// Records that have come, of how many that the controller announced.
 struct ReadCount {

@@ -58,8 +58,6 @@ std::optional<OpeningError> ErrorOf(const Candidate& candidate) {
 
 }  // namespace
 
-std::span<const WorkaroundInfo> KnownWorkarounds() { return LanWorkarounds(); }
-
 Source OpenLan(const std::vector<std::string>& places, const SourceOptions& options) {
     std::vector<Candidate> candidates;
     for (const std::string& place : places) {
@@ -98,3 +96,9 @@ Source OpenLan(const std::vector<std::string>& places, const SourceOptions& opti
 }
 
 }  // namespace tqrhost
+
+namespace NQORTQR20 {
+
+std::span<const WorkaroundInfo> KnownWorkarounds() { return tqrhost::LanWorkarounds(); }
+
+}  // namespace NQORTQR20

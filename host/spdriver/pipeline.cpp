@@ -59,21 +59,6 @@ RunResult RunPipelines(std::span<RequestPipeline* const> pipelines,
     }
 }
 
-void SerialPipeline::Submit(ipmi::Command command, Handler handler) {
-    queue_.emplace_back(std::move(command), std::move(handler));
-}
-
-Clock::time_point SerialPipeline::NextTimer() const {
-    return queue_.empty() ? Clock::time_point::max() : Clock::time_point::min();
-}
-
-void SerialPipeline::Advance(Clock::time_point) {
-    if (queue_.empty()) return;
-    const auto [command, handler] = std::move(queue_.front());
-    queue_.pop_front();
-    handler(transport_->Exchange(RequestFrame(command)));
-}
-
 std::optional<Response> ExchangeOver(RequestPipeline& pipeline, ipmi::Command command) {
     struct Answer {
         bool came = false;

@@ -12,7 +12,7 @@
 #include "host/spdriver/transport.h"
 #include "ipmi/command.h"
 
-namespace tqrhost {
+namespace NQORTQR20 {
 
 /// Requests to one BMC, several of them outstanding at a time.
 ///
@@ -50,6 +50,10 @@ public:
     virtual void Advance(Clock::time_point now) = 0;
 };
 
+}  // namespace NQORTQR20
+
+namespace tqrhost {
+
 enum class RunResult { kDone, kIdle, kStopped };
 
 /// Advances several pipelines together until `done` says so (kDone), nothing is pending in any of
@@ -57,24 +61,6 @@ enum class RunResult { kDone, kIdle, kStopped };
 /// The wait ends within a tenth of a second of an interruption.
 RunResult RunPipelines(std::span<RequestPipeline* const> pipelines,
                        const std::function<bool()>& done);
-
-/// A pipeline over a way that takes one request at a time.
-class SerialPipeline : public RequestPipeline {
-public:
-    explicit SerialPipeline(std::unique_ptr<Transport> transport)
-        : transport_(std::move(transport)) {}
-    void Submit(ipmi::Command command, Handler handler) override;
-    std::size_t Pending() const override { return queue_.size(); }
-    std::size_t Room() const override { return queue_.empty() ? 1 : 0; }
-    bool Dead() const override { return false; }
-    int Descriptor() const override { return -1; }
-    Clock::time_point NextTimer() const override;
-    void Advance(Clock::time_point now) override;
-
-private:
-    std::unique_ptr<Transport> transport_;
-    std::deque<std::pair<ipmi::Command, Handler>> queue_;
-};
 
 /// One request at a time over a pipeline; no read-ahead.
 class PipelineTransport : public Transport {

@@ -5,15 +5,15 @@
 #include <utility>
 #include <vector>
 
+#include "host/spdriver/controller_reader.h"
 #include "host/spdriver/memory_transport.h"
 
-namespace tqrhost {
-
+namespace NQORTQR20 {
 namespace {
 
 struct Live {
     SourceNode* node;
-    std::shared_ptr<ControllerReader> reader;
+    std::shared_ptr<tqrhost::ControllerReader> reader;
 };
 
 /// The event logs for as long as one of them is read, then the sensor repositories.
@@ -23,7 +23,7 @@ ReadingState StateOf(const std::vector<Live>& live) {
     ReadingState state = log ? kEventLogReading : kSensorReading;
     state.announced = 0;
     for (const Live& one : live) {
-        const ReadCount count = log ? one.reader->LogCount() : one.reader->SensorCount();
+        const tqrhost::ReadCount count = log ? one.reader->LogCount() : one.reader->SensorCount();
         state.read += count.read;
         if (!count.announced) state.announced.reset();
         if (state.announced) *state.announced += *count.announced;
@@ -39,20 +39,21 @@ void ReadLiveNodes(Source& source, ReadingNeeds needs, const ReadingProgress& pr
     for (SourceNode& node : source.nodes) {
         if (!node.pipeline) continue;
         pipelines.push_back(node.pipeline.get());
-        live.push_back({&node, std::make_shared<ControllerReader>(node.pipeline.get(), needs)});
+        live.push_back(
+            {&node, std::make_shared<tqrhost::ControllerReader>(node.pipeline.get(), needs)});
     }
     for (const Live& one : live) one.reader->Start();
-    RunPipelines(pipelines, [&] {
+    tqrhost::RunPipelines(pipelines, [&] {
         if (progress && !live.empty()) progress(StateOf(live));
         return std::all_of(live.begin(), live.end(),
                            [](const Live& one) { return one.reader->Done(); });
     });
     for (const Live& one : live) {
-        auto transport =
-            std::make_unique<MemoryTransport>(std::move(one.node->pipeline), one.reader->Take());
+        auto transport = std::make_unique<tqrhost::MemoryTransport>(std::move(one.node->pipeline),
+                                                                    one.reader->Take());
         one.node->endPass = [memory = transport.get()] { return memory->EndPass(); };
         one.node->transport = std::move(transport);
     }
 }
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

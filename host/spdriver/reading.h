@@ -5,10 +5,15 @@
 #include <optional>
 #include <string_view>
 
-#include "host/spdriver/controller_reader.h"
 #include "host/spdriver/source.h"
 
-namespace tqrhost {
+namespace NQORTQR20 {
+
+/// What of a controller is to be read.
+struct ReadingNeeds {
+    bool log = true;
+    bool sensors = true;
+};
 
 /// How far the reading is.
 struct ReadingState {
@@ -31,4 +36,4 @@ void ReadLiveNodes(Source& source, ReadingNeeds needs, const ReadingProgress& pr
 /// that was read; until it is called with nothing.
 void ObserveReading(ReadingProgress progress);
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

@@ -127,21 +127,25 @@ private:
 };
 
 }  // namespace
+}  // namespace tqrhost
+
+namespace NQORTQR20 {
 
 std::shared_ptr<CaptureWriter> RecordTo(const std::string& file, Source& source,
                                         const std::vector<std::string>& classes) {
     const bool clockRuns = !source.facts.localTime;
     if (clockRuns) source.facts.localTime = SystemTime().ToString();
-    auto capture = std::make_shared<CaptureFile>(file, source, classes);
+    auto capture = std::make_shared<tqrhost::CaptureFile>(file, source, classes);
     for (std::size_t node = 0; node < source.nodes.size(); ++node) {
         SourceNode& recorded = source.nodes[node];
         if (recorded.pipeline) {
-            recorded.transport = std::make_unique<PipelineTransport>(std::move(recorded.pipeline));
+            recorded.transport =
+                std::make_unique<tqrhost::PipelineTransport>(std::move(recorded.pipeline));
         }
-        recorded.transport = std::make_unique<RecordingTransport>(std::move(recorded.transport),
-                                                                  node, clockRuns, capture);
+        recorded.transport = std::make_unique<tqrhost::RecordingTransport>(
+            std::move(recorded.transport), node, clockRuns, capture);
     }
     return capture;
 }
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

@@ -10,7 +10,7 @@
 #include "host/spdriver/kinds.h"
 #include "host/spdriver/source.h"
 
-namespace tqrhost {
+namespace NQORTQR20 {
 namespace {
 
 struct Kind {
@@ -23,14 +23,14 @@ struct Kind {
 };
 
 constexpr Kind kKinds[] = {
-    {"inband", "inband", false, OpenInband},
+    {"inband", "inband", false, tqrhost::OpenInband},
 #ifdef IPMISEL_LAN
-    {"lan:", "lan:HOST[:PORT]", true, OpenLan},
+    {"lan:", "lan:HOST[:PORT]", true, tqrhost::OpenLan},
 #else
     {"lan:", "lan:HOST[:PORT]", true, nullptr},
 #endif
-    {"sim:", "sim:FILE", false, OpenSimulated},
-    {"replay:", "replay:FILE", false, OpenReplay},
+    {"sim:", "sim:FILE", false, tqrhost::OpenSimulated},
+    {"replay:", "replay:FILE", false, tqrhost::OpenReplay},
 };
 
 bool IsOfKind(std::string_view source, const Kind& kind) {
@@ -92,4 +92,4 @@ Source OpenSources(const std::vector<std::string>& sources, const SourceOptions&
 std::span<const WorkaroundInfo> KnownWorkarounds() { return {}; }
 #endif
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

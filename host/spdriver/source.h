@@ -19,7 +19,7 @@
 
 // Where a machine is reached: what the user says of it, and what comes of it.
 
-namespace tqrhost {
+namespace NQORTQR20 {
 
 /// Why a source could not be opened; what() is one line for the user that says what to do.
 struct SourceError : std::runtime_error {
@@ -95,4 +95,4 @@ void CloseMachine();
 /// what the plug-in logs of it is no warning to whoever reads along.
 bool OptionalCommandRefused();
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

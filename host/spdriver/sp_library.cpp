@@ -26,9 +26,6 @@ struct SPLibrary::Impl {
     bool integratedBmc;
 };
 
-}  // namespace NQORTQR20
-
-namespace tqrhost {
 namespace {
 
 // The reply frame: completion code in byte 4, response from byte 8.
@@ -38,7 +35,7 @@ constexpr std::size_t kResponseAt = 8;
 /// The nodes of the machine that is collected from.
 struct OpenNode {
     std::string source;
-    std::unique_ptr<NQORTQR20::SPLibrary> library;
+    std::unique_ptr<SPLibrary> library;
     std::function<bool()> endPass;
     std::function<std::vector<ReadFault>()> missing;
 };
@@ -82,10 +79,10 @@ void OpenMachine(Source source) {
     Unreachable() = std::move(source.unreachable);
     for (SourceNode& node : source.nodes) {
         if (node.pipeline) {
-            node.transport = std::make_unique<PipelineTransport>(std::move(node.pipeline));
+            node.transport = std::make_unique<tqrhost::PipelineTransport>(std::move(node.pipeline));
         }
-        auto library = std::make_unique<NQORTQR20::SPLibrary>(std::move(node.transport),
-                                                              GetMachineFacts().integratedBmc);
+        auto library =
+            std::make_unique<SPLibrary>(std::move(node.transport), GetMachineFacts().integratedBmc);
         Nodes().push_back({std::move(node.name), std::move(library), std::move(node.endPass),
                            std::move(node.missing)});
     }
@@ -106,7 +103,7 @@ void ObserveReading(ReadingProgress progress) { Observer() = std::move(progress)
 
 bool OptionalCommandRefused() { return gOptionalRefused; }
 
-NodeCompleteness CompletenessOf(const NQORTQR20::SPLibrary& library) {
+NodeCompleteness CompletenessOf(const SPLibrary& library) {
     const auto& tracker = library.impl_->transport;
     return tracker ? tracker->Completeness() : NodeCompleteness();
 }
@@ -131,11 +128,7 @@ void CloseMachine() {
     SetMachineFacts({});
 }
 
-}  // namespace tqrhost
-
-namespace NQORTQR20 {
-
-SPLibrary::SPLibrary(std::unique_ptr<tqrhost::Transport> transport, bool integratedBmc)
+SPLibrary::SPLibrary(std::unique_ptr<Transport> transport, bool integratedBmc)
     : impl_(std::make_unique<Impl>()) {
     if (transport) {
         impl_->transport =
@@ -147,16 +140,16 @@ SPLibrary::SPLibrary(std::unique_ptr<tqrhost::Transport> transport, bool integra
 
 SPLibrary::~SPLibrary() = default;
 
-int SPLibrary::GetNumberBMCNode() { return static_cast<int>(tqrhost::Nodes().size()); }
+int SPLibrary::GetNumberBMCNode() { return static_cast<int>(Nodes().size()); }
 
 SPLibrary* SPLibrary::GetSplibraryInstance(int node) {
-    const auto& nodes = tqrhost::Nodes();
+    const auto& nodes = Nodes();
     return node >= 0 && node < GetNumberBMCNode()
                ? nodes[static_cast<std::size_t>(node)].library.get()
                : nullptr;
 }
 
-bool SPLibrary::IsIPMIDriversPresent() { return tqrhost::GetMachineFacts().ipmiDriver; }
+bool SPLibrary::IsIPMIDriversPresent() { return GetMachineFacts().ipmiDriver; }
 
 bool SPLibrary::IsiBMCMachine() const { return impl_->integratedBmc; }
 
@@ -164,12 +157,12 @@ bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSi
     if (buffer == nullptr || length == nullptr || bufferSize <= 0) return false;
     if (!impl_->transport) return false;
     const std::span<unsigned char> frame(buffer, static_cast<std::size_t>(bufferSize));
-    const auto request = tqrhost::RequestFrame::FromBuffer(frame);
+    const auto request = RequestFrame::FromBuffer(frame);
     if (!request) return false;
-    std::optional<tqrhost::Response> response;
+    std::optional<Response> response;
     try {
         response = impl_->transport->Exchange(*request);
-        if (const auto& observer = tqrhost::Observer()) {
+        if (const auto& observer = Observer()) {
             if (const auto state = impl_->transport->StateAfter(*request)) observer(*state);
         }
     } catch (const std::exception& error) {  // callers know no exceptions
@@ -177,14 +170,13 @@ bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSi
         fdrWriteLog(ILogger::kError, line.c_str());
         return false;
     }
-    tqrhost::gOptionalRefused = response && !response->empty() &&
-                                response->front() == ipmi::kInvalidCommand &&
-                                tqrhost::IsOptional(*request);
+    gOptionalRefused = response && !response->empty() &&
+                       response->front() == ipmi::kInvalidCommand && IsOptional(*request);
     if (!response || response->empty()) return false;
     std::fill(frame.begin(), frame.end(), static_cast<unsigned char>(0));
-    const auto fits = std::min(response->size(), frame.size() - tqrhost::kResponseAt);
-    frame[tqrhost::kCompletionCodeAt] = response->front();
-    std::copy_n(response->begin(), fits, frame.begin() + tqrhost::kResponseAt);
+    const auto fits = std::min(response->size(), frame.size() - kResponseAt);
+    frame[kCompletionCodeAt] = response->front();
+    std::copy_n(response->begin(), fits, frame.begin() + kResponseAt);
     *length = static_cast<int>(fits) - 1;
     return true;
 }

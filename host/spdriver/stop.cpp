@@ -2,7 +2,7 @@
 
 #include <atomic>
 
-namespace tqrhost {
+namespace NQORTQR20 {
 namespace {
 
 using Clock = std::chrono::steady_clock;
@@ -40,4 +40,4 @@ bool StoppedFor(Clock::duration time) {
 
 Clock::time_point StopTime() { return gDeadline.value_or(Clock::time_point::max()); }
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

@@ -3,7 +3,9 @@
 #include <chrono>
 #include <optional>
 
-namespace tqrhost {
+#include "host/core/internal.h"
+
+namespace NQORTQR20 {
 
 /// Why a collection is to end early, with what was read so far.
 enum class StopReason { kNone, kDeadline, kInterrupted };
@@ -21,4 +23,4 @@ bool StoppedFor(std::chrono::steady_clock::duration time);
 /// The deadline, or a far time: for waits that must not outlast it.
 std::chrono::steady_clock::time_point StopTime();
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

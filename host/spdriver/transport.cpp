@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-namespace tqrhost {
+namespace NQORTQR20 {
 namespace {
 
 constexpr std::uint8_t kFrameStart = 0x01;
@@ -38,4 +38,4 @@ ipmi::Command RequestFrame::ToCommand() const {
     return {netFn(), lun(), command(), std::vector<std::uint8_t>(data().begin(), data().end())};
 }
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

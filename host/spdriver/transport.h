@@ -5,9 +5,10 @@
 #include <span>
 #include <vector>
 
+#include "host/core/internal.h"
 #include "ipmi/command.h"
 
-namespace tqrhost {
+namespace NQORTQR20 {
 
 /// One request frame as a plug-in laid it out: 0x01, responder address, NetFn, LUN, command, number
 /// of data bytes (little-endian, 32 bits), data from byte 9.
@@ -44,4 +45,4 @@ public:
     virtual std::optional<Response> Exchange(const RequestFrame& request) = 0;
 };
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

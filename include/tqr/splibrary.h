@@ -4,21 +4,16 @@
 
 namespace NQORTQR20 {
 class SPLibrary;
-}
-namespace tqrhost {
 class Transport;
 struct NodeCompleteness;
 /// How whole the reading through a library object is, as the host saw it.
-NodeCompleteness CompletenessOf(const NQORTQR20::SPLibrary& library);
-}  // namespace tqrhost
-
-namespace NQORTQR20 {
+NodeCompleteness CompletenessOf(const SPLibrary& library);
 
 /// Access to one BMC node. The host owns the objects of the nodes of a collection.
 class SPLibrary {
 public:
     /// An object of its own over a transport, outside the host's list of nodes.
-    explicit SPLibrary(std::unique_ptr<tqrhost::Transport> transport, bool integratedBmc = false);
+    explicit SPLibrary(std::unique_ptr<Transport> transport, bool integratedBmc = false);
     ~SPLibrary();
     SPLibrary(const SPLibrary&) = delete;
     SPLibrary& operator=(const SPLibrary&) = delete;
@@ -46,7 +41,7 @@ public:
     bool sendIPMICommand(unsigned char* buffer, int* length, int bufferSize, bool flag);
 
 private:
-    friend tqrhost::NodeCompleteness tqrhost::CompletenessOf(const SPLibrary& library);
+    friend NodeCompleteness CompletenessOf(const SPLibrary& library);
     struct Impl;
     std::unique_ptr<Impl> impl_;
 };

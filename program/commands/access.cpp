@@ -15,7 +15,7 @@ std::vector<std::string> AccessOptions::Sources() const {
 
 std::string WorkaroundHelp() {
     std::string text = "Known deviations of a BMC to put up with (--workaround):\n";
-    for (const tqrhost::WorkaroundInfo& info : tqrhost::KnownWorkarounds()) {
+    for (const NQORTQR20::WorkaroundInfo& info : NQORTQR20::KnownWorkarounds()) {
         text += "  " + std::string(info.name) +
                 std::string(22 - std::min<std::size_t>(20, info.name.size()), ' ') +
                 std::string(info.description) + "\n";
@@ -57,7 +57,7 @@ void AddAccessOptions(CLI::App* command, AccessOptions* options) {
                      "Deviation of the BMC to put up with; see below")
         ->type_name("NAME")
         ->allow_extra_args(false)
-        ->check(OneOf(Names(tqrhost::KnownWorkarounds()), false));
+        ->check(OneOf(Names(NQORTQR20::KnownWorkarounds()), false));
     command
         ->add_option("--window", options->source.window,
                      "Most requests outstanding; adaptive when left out")
@@ -71,15 +71,15 @@ void AddAccessOptions(CLI::App* command, AccessOptions* options) {
         ->check(Seconds(kSecondsPerDay));
 }
 
-tqrhost::Source OpenSource(const AccessOptions& options) {
-    tqrhost::SourceOptions access = options.source;
+NQORTQR20::Source OpenSource(const AccessOptions& options) {
+    NQORTQR20::SourceOptions access = options.source;
     access.password = [&options] { return ReadPassword(options.passwordFile); };
     access.kg = [&options] { return ReadKg(options.kgFile); };
     try {
-        return tqrhost::OpenSources(options.Sources(), access);
-    } catch (const tqrhost::SourceUsageError& error) {
+        return NQORTQR20::OpenSources(options.Sources(), access);
+    } catch (const NQORTQR20::SourceUsageError& error) {
         throw Failure(kExitUsage, error.what());
-    } catch (const tqrhost::SourceError& error) {
+    } catch (const NQORTQR20::SourceError& error) {
         throw Failure(kExitNoSource, error.what());
     } catch (const std::bad_alloc&) {
         throw Failure(kExitNoSource,

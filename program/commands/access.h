@@ -14,7 +14,7 @@ struct AccessOptions {
     std::vector<std::string> sources;  ///< empty: this machine's BMC
     std::optional<std::string> passwordFile;
     std::optional<std::string> kgFile;
-    tqrhost::SourceOptions source;
+    NQORTQR20::SourceOptions source;
 
     /// As the user named them, or the default one.
     std::vector<std::string> Sources() const;
@@ -25,6 +25,6 @@ void AddAccessOptions(CLI::App* command, AccessOptions* options);
 std::string WorkaroundHelp();
 
 /// Opens the sources; asks for a password where one is needed and not given. Throws Failure.
-tqrhost::Source OpenSource(const AccessOptions& options);
+NQORTQR20::Source OpenSource(const AccessOptions& options);
 
 }  // namespace ipmisel

@@ -20,11 +20,11 @@ struct Options {
     bool schema = false;
 };
 
-std::string ClassList(const std::vector<tqrhost::ClassInfo>& classes) {
+std::string ClassList(const std::vector<NQORTQR20::ClassInfo>& classes) {
     std::size_t width = 0;
-    for (const tqrhost::ClassInfo& info : classes) width = std::max(width, info.name.size());
+    for (const NQORTQR20::ClassInfo& info : classes) width = std::max(width, info.name.size());
     std::string list;
-    for (const tqrhost::ClassInfo& info : classes) {
+    for (const NQORTQR20::ClassInfo& info : classes) {
         list += Fit(info.name, width) + "  " + info.description + "\n";
     }
     return list;

@@ -53,35 +53,35 @@ std::string Joined(const std::vector<std::string>& parts) {
 
 /// The plug-in decides by the same signs and says nothing: a machine without them is told here.
 bool HasBmc() {
-    const tqrhost::MachineFacts& facts = tqrhost::GetMachineFacts();
+    const NQORTQR20::MachineFacts& facts = NQORTQR20::GetMachineFacts();
     const bool known = facts.ipmiLan || ipmi::HasIpmiDevice(facts.smbios);
     return known && NQORTQR20::SPLibrary::GetNumberBMCNode() > 0;
 }
 
 struct Machine {
-    explicit Machine(tqrhost::Source source) { tqrhost::OpenMachine(std::move(source)); }
-    ~Machine() { tqrhost::CloseMachine(); }
+    explicit Machine(NQORTQR20::Source source) { NQORTQR20::OpenMachine(std::move(source)); }
+    ~Machine() { NQORTQR20::CloseMachine(); }
     Machine(const Machine&) = delete;
     Machine& operator=(const Machine&) = delete;
 };
 
-std::shared_ptr<tqrhost::CaptureWriter> Record(const CollectOptions& options,
-                                               tqrhost::Source& source,
-                                               const std::vector<std::string>& classes) {
+std::shared_ptr<NQORTQR20::CaptureWriter> Record(const CollectOptions& options,
+                                                 NQORTQR20::Source& source,
+                                                 const std::vector<std::string>& classes) {
     if (!options.record) return nullptr;
     try {
-        return tqrhost::RecordTo(*options.record, source, classes);
-    } catch (const tqrhost::SourceError& error) {
+        return NQORTQR20::RecordTo(*options.record, source, classes);
+    } catch (const NQORTQR20::SourceError& error) {
         throw Failure(kExitUsage, error.what());
     }
 }
 
 /// What the host has to read of every node for the classes.
-tqrhost::ReadingNeeds NeedsOf(const std::vector<std::string>& wanted,
-                              const tqrhost::PluginSet& plugins) {
-    tqrhost::ReadingNeeds needs{false, false};
+NQORTQR20::ReadingNeeds NeedsOf(const std::vector<std::string>& wanted,
+                                const NQORTQR20::PluginSet& plugins) {
+    NQORTQR20::ReadingNeeds needs{false, false};
     for (const std::string& name : wanted) {
-        const tqrhost::ClassInfo* const info = plugins.FindClass(name);
+        const NQORTQR20::ClassInfo* const info = plugins.FindClass(name);
         if (info == nullptr) continue;
         needs.log |= info->Is(NQORTQR20::kReadsLog);
         needs.sensors |= info->Is(NQORTQR20::kReadsSensors);
@@ -105,7 +105,7 @@ std::string HostOf(const std::string& source) {
 }
 
 /// One for each node, named as the user says, else by its source.
-std::vector<SystemInfo> SystemsOf(const tqrhost::Source& source, const CollectOptions& options) {
+std::vector<SystemInfo> SystemsOf(const NQORTQR20::Source& source, const CollectOptions& options) {
     const std::vector<std::string> sources = options.access.Sources();
     const std::vector<std::string>& names = options.names;
     // One source may be a machine of several nodes.
@@ -116,7 +116,7 @@ std::vector<SystemInfo> SystemsOf(const tqrhost::Source& source, const CollectOp
                                       " sources; give --name once for each --from");
     }
     std::vector<SystemInfo> systems;
-    for (const tqrhost::SourceNode& node : source.nodes) {
+    for (const NQORTQR20::SourceNode& node : source.nodes) {
         SystemInfo& system = systems.emplace_back();
         system.source = node.name.empty() ? sources.front() : node.name;
         const auto place = std::find(sources.begin(), sources.end(), system.source);
@@ -128,9 +128,9 @@ std::vector<SystemInfo> SystemsOf(const tqrhost::Source& source, const CollectOp
 }
 
 /// What the plug-ins may ask for, which none of them refuses.
-tqrhost::PluginSettings SettingsOf(const CollectOptions& options,
-                                   const tqrhost::PluginSet& plugins) {
-    tqrhost::PluginSettings settings;
+NQORTQR20::PluginSettings SettingsOf(const CollectOptions& options,
+                                     const NQORTQR20::PluginSet& plugins) {
+    NQORTQR20::PluginSettings settings;
     if (options.severities) {
         settings.options["severities"] =
             ReadTextFile(*options.severities, "--severities", kMaxSeverities);
@@ -150,7 +150,7 @@ tqrhost::PluginSettings SettingsOf(const CollectOptions& options,
 /// Notices that the plug-in had for whoever runs the collection, said and kept.
 std::vector<std::string> TellNotices() {
     std::vector<std::string> texts;
-    for (tqrhost::Notice& notice : tqrhost::TakeNotices()) {
+    for (NQORTQR20::Notice& notice : NQORTQR20::TakeNotices()) {
         std::string_view rest = notice.plainText;
         while (!rest.empty()) {
             const auto end = std::min(rest.find('\n'), rest.size());
@@ -173,9 +173,9 @@ public:
     ReadingProgressLine& operator=(const ReadingProgressLine&) = delete;
 
     /// Empty where nothing would be seen. Must not be called when the object is gone.
-    tqrhost::ReadingProgress Observer() {
+    NQORTQR20::ReadingProgress Observer() {
         if (!line_ || !line_->Enabled()) return {};
-        return [this](const tqrhost::ReadingState& state) {
+        return [this](const NQORTQR20::ReadingState& state) {
             if (!line_) return;
             line_->Show({.what = state.what,
                          .done = state.read,
@@ -184,7 +184,7 @@ public:
         };
     }
     void End() {
-        tqrhost::ObserveReading({});
+        NQORTQR20::ObserveReading({});
         line_.reset();
     }
 
@@ -195,11 +195,11 @@ private:
 int CollectTo(const CollectOptions& options, ReportOutput& output) {
     const auto begin = std::chrono::steady_clock::now();
     // The plug-ins first: without them nobody is asked for a password.
-    const std::unique_ptr<tqrhost::PluginSet> plugins = LoadPlugins(options.plugins);
+    const std::unique_ptr<NQORTQR20::PluginSet> plugins = LoadPlugins(options.plugins);
     const auto ofFormat = FindFormat(options.report.format)->classes;
     std::vector<std::string> wanted = ClassesToCollect(options.report.classes, ofFormat, *plugins);
-    tqrhost::PluginSettings settings = SettingsOf(options, *plugins);
-    tqrhost::Source source = OpenSource(options.access);
+    NQORTQR20::PluginSettings settings = SettingsOf(options, *plugins);
+    NQORTQR20::Source source = OpenSource(options.access);
     // A capture answers what was asked for when it was made, if the format can be made of that.
     const bool suffices = std::all_of(ofFormat.begin(), ofFormat.end(), [&](std::string_view name) {
         return std::find(source.classes.begin(), source.classes.end(), name) !=
@@ -208,20 +208,20 @@ int CollectTo(const CollectOptions& options, ReportOutput& output) {
     if (options.report.classes.empty() && !source.classes.empty() && suffices) {
         wanted = ClassesToCollect(source.classes, {}, *plugins);
     }
-    for (const tqrhost::UnreachableNode& node : source.unreachable) Say(node.reason);
+    for (const NQORTQR20::UnreachableNode& node : source.unreachable) Say(node.reason);
     const std::vector<SystemInfo> systems = SystemsOf(source, options);
     for (const SystemInfo& system : systems) settings.systemNames.push_back(system.name);
-    tqrhost::SetPluginSettings(std::move(settings));
+    NQORTQR20::SetPluginSettings(std::move(settings));
     StopSignals::BeginCollecting();
     ReadingProgressLine progress(options.progress);
-    tqrhost::ReadLiveNodes(source, NeedsOf(wanted, *plugins), progress.Observer());
-    const std::shared_ptr<tqrhost::CaptureWriter> capture = Record(options, source, wanted);
+    NQORTQR20::ReadLiveNodes(source, NeedsOf(wanted, *plugins), progress.Observer());
+    const std::shared_ptr<NQORTQR20::CaptureWriter> capture = Record(options, source, wanted);
     const Machine machine(std::move(source));
 
     const auto nodes = static_cast<std::size_t>(NQORTQR20::SPLibrary::GetNumberBMCNode());
     const ReportHead head{.source = Joined(options.access.Sources()),
                           .plugin = plugins->Plugins().front()->Info(),
-                          .machineType = tqrhost::GetMachineFacts().machineType,
+                          .machineType = NQORTQR20::GetMachineFacts().machineType,
                           .nodes = nodes,
                           .systems = systems,
                           .collected = {NQORTQR20::TOSSpecific::GetLocalTime().TotalMicroseconds() /
@@ -231,25 +231,25 @@ int CollectTo(const CollectOptions& options, ReportOutput& output) {
                           .named = !options.report.classes.empty()};
     const std::unique_ptr<ReportWriter> report = output.Make(head);
     ReportSink sink(*report, *plugins, wanted, nodes);
-    tqrhost::CollectionPlan plan(*plugins, wanted);
+    NQORTQR20::CollectionPlan plan(*plugins, wanted);
     ReportEnd end;
     if (output.StreamsToTerminal()) progress.End();
-    tqrhost::ObserveReading(progress.Observer());
+    NQORTQR20::ObserveReading(progress.Observer());
     plan.RunPasses(sink, [] { return !OutputIsOver(); });
     if (HasBmc()) plan.RunExporters(sink);
-    tqrhost::EndPass();
+    NQORTQR20::EndPass();
     progress.End();
     StopSignals::EndCollecting();
     sink.Check();
-    end.stopped = tqrhost::Stopped();
+    end.stopped = NQORTQR20::Stopped();
     end.hasBmc = HasBmc();
     end.notices = TellNotices();
-    end.completeness = tqrhost::GetCompleteness();
+    end.completeness = NQORTQR20::GetCompleteness();
     end.exported = sink.Exported();
     for (std::size_t node = 0; node < end.exported.size(); ++node) {
         end.completeness[node].log.exported = end.exported[node];
     }
-    end.unreachable = tqrhost::GetUnreachable();
+    end.unreachable = NQORTQR20::GetUnreachable();
     end.plugins = plan.Statuses();
     end.status = plan.Status();
     end.systems = head.systems;
@@ -301,9 +301,9 @@ int Collect(const CollectOptions& options) {
     const StopSignals signals;
     if (options.deadlineSeconds) {
         using Clock = std::chrono::steady_clock;
-        tqrhost::StopAt(Clock::now() +
-                        std::chrono::duration_cast<Clock::duration>(
-                            std::chrono::duration<double>(*options.deadlineSeconds)));
+        NQORTQR20::StopAt(Clock::now() +
+                          std::chrono::duration_cast<Clock::duration>(
+                              std::chrono::duration<double>(*options.deadlineSeconds)));
     }
     LogLines log(options.log);
     ReportOutput output(options.report);

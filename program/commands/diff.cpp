@@ -32,7 +32,7 @@ struct State {
 State StateOf(const SavedReport& saved) {
     MachineState machine;
     Systems systems(saved.Head());
-    saved.ForEach([&](const tqrhost::Instance& instance) {
+    saved.ForEach([&](const NQORTQR20::Instance& instance) {
         if (machine.Add(instance) && instance.className == kControllerClass) {
             systems.Add(machine.controllers.back());
         }

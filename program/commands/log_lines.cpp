@@ -31,7 +31,7 @@ void WriteToTerminal(ILogger::ETQRLogSeverity severity, std::string_view text) {
 class TerminalRule {
 public:
     ILogger::ETQRLogSeverity SeverityOf(ILogger::ETQRLogSeverity severity) {
-        if (!tqrhost::OptionalCommandRefused()) {
+        if (!NQORTQR20::OptionalCommandRefused()) {
             lines_ = 0;
         } else if (severity == ILogger::kWarning && lines_ < kLines) {
             ++lines_;
@@ -77,12 +77,12 @@ LogLines::LogLines(const LogOptions& options) : name_(options.file.value_or(""))
         const int file = open(name_.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
         if (file >= 0) file_.reset(fdopen(file, "w"));
         if (!file_) Fail(name_, errno);
-        toFile_ = tqrhost::AddLogConsumer(
+        toFile_ = NQORTQR20::AddLogConsumer(
             ILogger::kTrace, [this](ILogger::ETQRLogSeverity severity, std::string_view text) {
                 WriteToFile(severity, text);
             });
     }
-    toTerminal_ = tqrhost::AddLogConsumer(
+    toTerminal_ = NQORTQR20::AddLogConsumer(
         options.level, [level = options.level, shown = TerminalRule()](
                            ILogger::ETQRLogSeverity severity, std::string_view text) mutable {
             if (shown.SeverityOf(severity) <= level) WriteToTerminal(severity, text);
@@ -90,8 +90,8 @@ LogLines::LogLines(const LogOptions& options) : name_(options.file.value_or(""))
 }
 
 LogLines::~LogLines() {
-    tqrhost::RemoveLogConsumer(toTerminal_);
-    if (toFile_) tqrhost::RemoveLogConsumer(*toFile_);
+    NQORTQR20::RemoveLogConsumer(toTerminal_);
+    if (toFile_) NQORTQR20::RemoveLogConsumer(*toFile_);
 }
 
 void LogLines::WriteToFile(ILogger::ETQRLogSeverity severity, std::string_view text) {

@@ -20,7 +20,7 @@ template <typename Work>
 auto WithPlugins(Work work) {
     try {
         return work();
-    } catch (const tqrhost::PluginError& error) {
+    } catch (const NQORTQR20::PluginError& error) {
         throw Failure(kExitUsage, error.what());
     }
 }
@@ -34,20 +34,20 @@ void AddPluginOption(CLI::App* command, std::vector<std::string>* files) {
         ->check(FileName());
 }
 
-std::unique_ptr<tqrhost::PluginSet> LoadPlugins(const std::vector<std::string>& files) {
+std::unique_ptr<NQORTQR20::PluginSet> LoadPlugins(const std::vector<std::string>& files) {
     return WithPlugins([&] {
-        return std::make_unique<tqrhost::PluginSet>(
+        return std::make_unique<NQORTQR20::PluginSet>(
             PluginFolder(), std::vector<std::filesystem::path>(files.begin(), files.end()));
     });
 }
 
 std::vector<std::string> ClassesToCollect(const std::vector<std::string>& named,
                                           std::span<const std::string_view> ofFormat,
-                                          const tqrhost::PluginSet& plugins) {
+                                          const NQORTQR20::PluginSet& plugins) {
     for (const std::string& name : named) {
         if (plugins.FindClass(name) != nullptr) continue;
         std::string known;
-        for (const tqrhost::ClassInfo& info : plugins.Classes()) {
+        for (const NQORTQR20::ClassInfo& info : plugins.Classes()) {
             known += (known.empty() ? "" : ", ") + info.name;
         }
         std::string line = "there is no class \"" + name;

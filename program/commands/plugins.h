@@ -15,12 +15,12 @@ namespace ipmisel {
 void AddPluginOption(CLI::App* command, std::vector<std::string>* files);
 
 /// The plug-ins of the program's own folder, and these files. Throws Failure.
-std::unique_ptr<tqrhost::PluginSet> LoadPlugins(const std::vector<std::string>& files);
+std::unique_ptr<NQORTQR20::PluginSet> LoadPlugins(const std::vector<std::string>& files);
 
 /// The classes to collect: those that are named, else those of the format that there are, else the
 /// default ones; the files that their plug-ins need are there. Throws Failure.
 std::vector<std::string> ClassesToCollect(const std::vector<std::string>& named,
                                           std::span<const std::string_view> ofFormat,
-                                          const tqrhost::PluginSet& plugins);
+                                          const NQORTQR20::PluginSet& plugins);
 
 }  // namespace ipmisel

@@ -32,7 +32,7 @@ int WriteSaved(const Options& options) {
                       ? options.report.classes
                       : std::vector<std::string>(format.classes.begin(), format.classes.end());
     const std::unique_ptr<ReportWriter> report = output.Make(head);
-    saved.ForEach([&](const tqrhost::Instance& instance) {
+    saved.ForEach([&](const NQORTQR20::Instance& instance) {
         const auto& wanted = head.wanted;
         const bool takes = wanted.empty() || std::find(wanted.begin(), wanted.end(),
                                                        instance.className) != wanted.end();

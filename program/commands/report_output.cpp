@@ -19,7 +19,7 @@ class PagedReport : public ReportWriter {
 public:
     PagedReport(std::unique_ptr<ReportWriter> report, Pager& pager)
         : report_(std::move(report)), pager_(pager) {}
-    void Add(const tqrhost::Instance& instance) override { report_->Add(instance); }
+    void Add(const NQORTQR20::Instance& instance) override { report_->Add(instance); }
     void Finish(const ReportEnd& end) override {
         pager_.Start();
         report_->Finish(end);

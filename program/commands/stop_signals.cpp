@@ -20,7 +20,7 @@ char gUnfinishedFile[PATH_MAX];  // read by the handler, which runs only while i
 
 void Handle(int number) {
     if (gCollecting.exchange(false)) {
-        tqrhost::StopNow();
+        NQORTQR20::StopNow();
         return;
     }
     HideProgress();

@@ -36,9 +36,9 @@ Json TypeSchema(fdrPropertyType type) {
     return Json::object();
 }
 
-Json InstanceSchema(const tqrhost::ClassInfo& info) {
+Json InstanceSchema(const NQORTQR20::ClassInfo& info) {
     Json properties = Json::object();
-    for (const tqrhost::PropertyInfo& property : info.properties) {
+    for (const NQORTQR20::PropertyInfo& property : info.properties) {
         Json schema = TypeSchema(property.type);
         schema["description"] = property.description;
         properties[property.name] = std::move(schema);
@@ -53,10 +53,10 @@ Json InstanceSchema(const tqrhost::ClassInfo& info) {
 
 }  // namespace
 
-std::string ClassSchema(const std::vector<tqrhost::ClassInfo>& classes) {
+std::string ClassSchema(const std::vector<NQORTQR20::ClassInfo>& classes) {
     Json any = Json::array();
     Json definitions = Json::object();
-    for (const tqrhost::ClassInfo& info : classes) {
+    for (const NQORTQR20::ClassInfo& info : classes) {
         any.push_back({{"$ref", "#/$defs/" + info.name}});
         definitions[info.name] = InstanceSchema(info);
     }

@@ -3,7 +3,7 @@
 namespace ipmisel {
 namespace {
 
-Json AccountJson(const tqrhost::SourceAccount& account) {
+Json AccountJson(const NQORTQR20::SourceAccount& account) {
     Json json = Json::object();
     json["announced"] = account.announced ? Json(*account.announced) : Json(nullptr);
     json["read"] = account.read;
@@ -15,11 +15,11 @@ Json AccountJson(const tqrhost::SourceAccount& account) {
 Json CompletenessJson(const ReportEnd& end) {
     Json nodes = Json::array();
     for (std::size_t node = 0; node < end.completeness.size(); ++node) {
-        const tqrhost::NodeCompleteness& account = end.completeness[node];
+        const NQORTQR20::NodeCompleteness& account = end.completeness[node];
         Json log = AccountJson(account.log);
         if (node < end.exported.size()) log["exported"] = end.exported[node];
         Json faults = Json::array();
-        for (const tqrhost::ReadFault& fault : account.faults) {
+        for (const NQORTQR20::ReadFault& fault : account.faults) {
             Json json = {{"what", fault.what}};
             if (!fault.record.empty()) json["record"] = fault.record;
             json["problem"] = fault.problem;
@@ -36,7 +36,7 @@ Json CompletenessJson(const ReportEnd& end) {
         nodes.push_back(std::move(json));
     }
     // What could not be opened is no node.
-    for (const tqrhost::UnreachableNode& node : end.unreachable) {
+    for (const NQORTQR20::UnreachableNode& node : end.unreachable) {
         nodes.push_back(
             {{"source", node.name},
              {"faults", Json::array({{{"what", "opening"}, {"problem", node.reason}}})}});
@@ -48,7 +48,7 @@ Json StatusJson(NQORTQR20::TTQRStatusCode status) {
     return {{"code", status.code}, {"text", status.TranslateStatusCode()}};
 }
 
-Json PluginJson(const tqrhost::PluginInfo& plugin) {
+Json PluginJson(const NQORTQR20::PluginInfo& plugin) {
     return {
         {"name", plugin.name}, {"version", plugin.version}, {"interface", plugin.interfaceVersion}};
 }

@@ -43,7 +43,7 @@ std::string Cell(const std::string& text) { return Defused(CleanText(text)); }
 std::string Cell(std::int64_t number) { return std::to_string(number); }
 std::string Cell(double number) { return Json(number).dump(); }
 std::string Cell(bool truth) { return truth ? "true" : "false"; }
-std::string Cell(tqrhost::Time time) { return TimeText(time); }
+std::string Cell(NQORTQR20::Time time) { return TimeText(time); }
 std::string Cell(const std::vector<std::uint8_t>& bytes) {
     std::string text;
     for (const std::uint8_t byte : bytes) text += (text.empty() ? "" : " ") + std::to_string(byte);
@@ -54,7 +54,7 @@ std::string Cell(const std::vector<std::string>& texts) {
     for (const std::string& each : texts) text += (text.empty() ? "" : "; ") + each;
     return Cell(text);
 }
-std::string Cell(const tqrhost::ObjectPath& path) {
+std::string Cell(const NQORTQR20::ObjectPath& path) {
     std::string text = path.className;
     for (const auto& [key, value] : path.keys)
         text.append(" ").append(key).append("=").append(value);
@@ -78,12 +78,12 @@ public:
                           "a csv report has the rows of one class; name one with --class");
         }
         class_ = head.named ? head.wanted.front() : kEventClass;
-        for (const tqrhost::ClassInfo& info : head.classes) {
+        for (const NQORTQR20::ClassInfo& info : head.classes) {
             if (info.name != class_) continue;
-            for (const tqrhost::PropertyInfo& p : info.properties) ColumnOf(p.name, 0);
+            for (const NQORTQR20::PropertyInfo& p : info.properties) ColumnOf(p.name, 0);
         }
     }
-    void Add(const tqrhost::Instance& instance) override {
+    void Add(const NQORTQR20::Instance& instance) override {
         if (instance.className != class_) return;
         std::vector<std::string> cells;
         std::map<std::string_view, unsigned> seen;

@@ -15,7 +15,7 @@ public:
     EventFilter(std::unique_ptr<ReportWriter> report, const EventWish& wish)
         : report_(std::move(report)), wish_(wish) {}
 
-    void Add(const tqrhost::Instance& instance) override {
+    void Add(const NQORTQR20::Instance& instance) override {
         if (instance.className != kEventClass) {
             report_->Add(instance);
             return;
@@ -29,7 +29,7 @@ public:
         if (newest_.size() > *wish_.last) newest_.pop_front();
     }
     void Finish(const ReportEnd& end) override {
-        for (const tqrhost::Instance& instance : newest_) report_->Add(instance);
+        for (const NQORTQR20::Instance& instance : newest_) report_->Add(instance);
         report_->Finish(end);
     }
 
@@ -43,12 +43,12 @@ private:
     std::unique_ptr<ReportWriter> report_;
     EventWish wish_;
     MaybeTime last_;
-    std::deque<tqrhost::Instance> newest_;
+    std::deque<NQORTQR20::Instance> newest_;
 };
 
 }  // namespace
 
-std::optional<tqrhost::Time> ParseMoment(std::string_view text, tqrhost::Time now) {
+std::optional<NQORTQR20::Time> ParseMoment(std::string_view text, NQORTQR20::Time now) {
     for (const char* rest : {"", "Z", ":00Z", " 00:00:00Z"}) {
         if (const MaybeTime time = ParseTime(std::string(text) + rest)) return time;
     }
@@ -61,7 +61,7 @@ std::optional<tqrhost::Time> ParseMoment(std::string_view text, tqrhost::Time no
     if (error != std::errc() || end + 1 != text.data() + text.size()) return std::nullopt;
     if (count < 0 || count > 100000) return std::nullopt;
     for (const auto& [unit, seconds] : kUnits) {
-        if (*end == unit) return tqrhost::Time{now.seconds - count * seconds};
+        if (*end == unit) return NQORTQR20::Time{now.seconds - count * seconds};
     }
     return std::nullopt;
 }

@@ -32,7 +32,7 @@ std::string Element(const std::string& name, const std::string& content,
 }
 
 /// A moment that the reader's script may show in another time zone.
-std::string TimeElement(tqrhost::Time time) {
+std::string TimeElement(NQORTQR20::Time time) {
     return Element("time", DateAndTime(time), "datetime=\"" + TimeText(time) + "\"");
 }
 
@@ -153,7 +153,7 @@ public:
     HtmlReport(OutputFile& out, const ReportHead& head)
         : out_(out), head_(head), systems_(head), logs_(systems_.All().size()) {}
 
-    void Add(const tqrhost::Instance& instance) override {
+    void Add(const NQORTQR20::Instance& instance) override {
         if (instance.className == kEventClass) {
             AddEvent(EventOf(instance));
         } else if (machine_.Add(instance) && instance.className == kControllerClass) {
@@ -580,7 +580,7 @@ private:
     void WriteNotRead(const ReportEnd& end) {
         std::string rows;
         for (std::size_t i = 0; i < end.completeness.size(); ++i) {
-            for (const tqrhost::ReadFault& fault : end.completeness[i].faults) {
+            for (const NQORTQR20::ReadFault& fault : end.completeness[i].faults) {
                 rows += Row({{Several() ? HtmlText(NameOf(i)) : ""},
                              {HtmlText(fault.what)},
                              {HtmlText(fault.record)},
@@ -606,8 +606,8 @@ private:
         d.Add("Source", head_.source).AddHtml("Collected", TimeElement(head_.collected));
         if (end.seconds) d.Add("Took", DurationText(*end.seconds));
         for (std::size_t i = 0; i < end.completeness.size(); ++i) {
-            const tqrhost::NodeCompleteness& node = end.completeness[i];
-            const auto account = [](const tqrhost::SourceAccount& a) {
+            const NQORTQR20::NodeCompleteness& node = end.completeness[i];
+            const auto account = [](const NQORTQR20::SourceAccount& a) {
                 return std::to_string(a.read) +
                        (a.announced ? " of " + std::to_string(*a.announced) : "") + " read";
             };

@@ -11,7 +11,7 @@ namespace {
 class JsonReport : public ReportWriter {
 public:
     JsonReport(OutputFile& out, const ReportHead& head) : out_(out), head_(head), systems_(head) {}
-    void Add(const tqrhost::Instance& instance) override {
+    void Add(const NQORTQR20::Instance& instance) override {
         if (instance.className == kControllerClass) systems_.Add(ControllerOf(instance));
         spool_.Write((any_ ? ",\n    " : "\n    ") + JsonInstance(instance));
         any_ = true;
@@ -30,7 +30,7 @@ public:
         out_.Write(",\n  \"systems\": " + JsonLine(systems_.AsJson()));
         out_.Write(",\n  \"plugin\": " + JsonLine(PluginJson(head_.plugin)));
         Json plugins = Json::array();
-        for (const tqrhost::PluginStatus& each : end.plugins) {
+        for (const NQORTQR20::PluginStatus& each : end.plugins) {
             plugins.push_back(PluginJson(each.plugin));
             plugins.back()["status"] = StatusJson(each.status);
         }

@@ -64,7 +64,7 @@ void AppendValue(std::string& out, std::uint8_t byte) { out += std::to_string(by
 /// The shortest text that reads back as the same number; 20 stands as 20.0.
 void AppendValue(std::string& out, double number) { out += Json(number).dump(); }
 void AppendValue(std::string& out, bool truth) { out += truth ? "true" : "false"; }
-void AppendValue(std::string& out, tqrhost::Time time) { out += Quoted(TimeText(time)); }
+void AppendValue(std::string& out, NQORTQR20::Time time) { out += Quoted(TimeText(time)); }
 
 template <typename Element>
 void AppendValue(std::string& out, const std::vector<Element>& list) {
@@ -76,7 +76,7 @@ void AppendValue(std::string& out, const std::vector<Element>& list) {
     out += ']';
 }
 
-void AppendValue(std::string& out, const tqrhost::ObjectPath& path) {
+void AppendValue(std::string& out, const NQORTQR20::ObjectPath& path) {
     out += "{\"class\": " + Quoted(path.className) + ", \"keys\": {";
     for (std::size_t i = 0; i < path.keys.size(); ++i) {
         if (i > 0) out += ", ";
@@ -92,7 +92,7 @@ std::string JsonText(std::string_view text) { return Quoted(text); }
 std::string JsonLine(const Json& value) { return value.dump(-1, ' ', true, kReplace); }
 
 // Written property by property: an object of the library would keep one of two of the same name.
-std::string JsonProperties(const tqrhost::Instance& instance) {
+std::string JsonProperties(const NQORTQR20::Instance& instance) {
     std::string out;
     for (const auto& [name, value] : instance.properties) {
         if (!out.empty()) out += ", ";
@@ -102,7 +102,7 @@ std::string JsonProperties(const tqrhost::Instance& instance) {
     return out;
 }
 
-std::string JsonInstance(const tqrhost::Instance& instance) {
+std::string JsonInstance(const NQORTQR20::Instance& instance) {
     return "{\"class\": " + Quoted(instance.className) + ", \"properties\": {" +
            JsonProperties(instance) + "}}";
 }

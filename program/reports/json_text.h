@@ -19,9 +19,9 @@ std::string JsonLine(const Json& value);
 
 /// The members of an object that an instance's properties are, without the braces, in the order in
 /// which they were written: `"Name": "a", "RawData": [1, 2]`.
-std::string JsonProperties(const tqrhost::Instance& instance);
+std::string JsonProperties(const NQORTQR20::Instance& instance);
 
 /// An instance as one JSON object on one line.
-std::string JsonInstance(const tqrhost::Instance& instance);
+std::string JsonInstance(const NQORTQR20::Instance& instance);
 
 }  // namespace ipmisel

@@ -31,11 +31,11 @@ public:
     }
 
 protected:
-    void Learn(const tqrhost::Instance& instance) {
+    void Learn(const NQORTQR20::Instance& instance) {
         if (instance.className == kControllerClass) systems_.Add(ControllerOf(instance));
     }
     /// `"format": ..., "system": ...`, and counts the instance as one of the system.
-    std::string Lead(const tqrhost::Instance& instance, Integer node) {
+    std::string Lead(const NQORTQR20::Instance& instance, Integer node) {
         const std::string& name = systems_.Of(node).name;
         const auto index = static_cast<std::size_t>(node.value_or(1) - 1);
         if (index < counts_.size()) ++counts_[index][instance.className];
@@ -54,7 +54,7 @@ private:
 class NdjsonReport : public LinesReport {
 public:
     using LinesReport::LinesReport;
-    void Add(const tqrhost::Instance& instance) override {
+    void Add(const NQORTQR20::Instance& instance) override {
         Learn(instance);
         out_.Write(Lead(instance, NodeOf(instance, head_)) +
                    ", \"class\": " + JsonText(instance.className) + ", \"properties\": {" +
@@ -66,7 +66,7 @@ public:
 class EventsReport : public LinesReport {
 public:
     using LinesReport::LinesReport;
-    void Add(const tqrhost::Instance& instance) override {
+    void Add(const NQORTQR20::Instance& instance) override {
         Learn(instance);
         if (instance.className != kEventClass) return;
         const Integer node = NodeOf(instance, head_);

@@ -93,7 +93,7 @@ class OtlpReport : public ReportWriter {
 public:
     OtlpReport(OutputFile& out, const ReportHead& head) : out_(out), head_(head), systems_(head) {}
 
-    void Add(const tqrhost::Instance& instance) override {
+    void Add(const NQORTQR20::Instance& instance) override {
         if (instance.className == kControllerClass) systems_.Add(ControllerOf(instance));
         if (instance.className != kEventClass) return;
         const Event event = EventOf(instance);

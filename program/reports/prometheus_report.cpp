@@ -61,7 +61,7 @@ public:
     PrometheusReport(OutputFile& out, const ReportHead& head)
         : out_(out), head_(head), systems_(head) {}
 
-    void Add(const tqrhost::Instance& instance) override {
+    void Add(const NQORTQR20::Instance& instance) override {
         if (instance.className == kEventClass) {
             AddEvent(EventOf(instance));
         } else if (machine_.Add(instance) && instance.className == kControllerClass) {

@@ -211,7 +211,7 @@ public:
     RedfishReport(OutputFile& out, const ReportHead& head)
         : out_(out), head_(head), systems_(head), logs_(systems_.All().size()) {}
 
-    void Add(const tqrhost::Instance& instance) override {
+    void Add(const NQORTQR20::Instance& instance) override {
         if (instance.className != kEventClass) return;
         const Event event = EventOf(instance);
         const auto index = static_cast<std::size_t>(event.node.value_or(1) - 1);

@@ -38,15 +38,15 @@ void AppendPart(const char* separator, const std::string& part, std::string* tex
     *text += part;
 }
 
-std::string NotRead(const char* what, const tqrhost::SourceAccount& account) {
+std::string NotRead(const char* what, const NQORTQR20::SourceAccount& account) {
     if (account.Missing() == 0) return {};
     return std::to_string(account.Missing()) + " of " + std::to_string(*account.announced) + " " +
            what + " not read";
 }
 
 /// The first fault tells why; the report has them all.
-std::string FirstFault(const tqrhost::NodeCompleteness& account) {
-    for (const tqrhost::ReadFault& fault : account.faults) {
+std::string FirstFault(const NQORTQR20::NodeCompleteness& account) {
+    for (const NQORTQR20::ReadFault& fault : account.faults) {
         if (!fault.ofLogOrSensors) continue;
         return fault.what + (fault.record.empty() ? "" : " " + fault.record) + ": " + fault.problem;
     }
@@ -57,7 +57,7 @@ std::string FirstFault(const tqrhost::NodeCompleteness& account) {
 std::string MissingText(const ReportEnd& end) {
     std::string text;
     for (std::size_t node = 0; node < end.completeness.size(); ++node) {
-        const tqrhost::NodeCompleteness& account = end.completeness[node];
+        const NQORTQR20::NodeCompleteness& account = end.completeness[node];
         if (account.Whole()) continue;
         std::string part;
         AppendPart(", ", NotRead("log records", account.log), &part);
@@ -77,13 +77,13 @@ std::string MissingText(const ReportEnd& end) {
     return text;
 }
 
-std::string StopText(tqrhost::StopReason reason) {
+std::string StopText(NQORTQR20::StopReason reason) {
     switch (reason) {
-        case tqrhost::StopReason::kDeadline:
+        case NQORTQR20::StopReason::kDeadline:
             return "the deadline has passed";
-        case tqrhost::StopReason::kInterrupted:
+        case NQORTQR20::StopReason::kInterrupted:
             return "interrupted";
-        case tqrhost::StopReason::kNone:
+        case NQORTQR20::StopReason::kNone:
             break;
     }
     return {};
@@ -99,7 +99,7 @@ const FormatInfo* FindFormat(std::string_view name) {
     return found == std::end(kFormats) ? nullptr : found;
 }
 
-std::optional<std::int64_t> NodeOf(const tqrhost::Instance& instance, std::string_view property) {
+std::optional<std::int64_t> NodeOf(const NQORTQR20::Instance& instance, std::string_view property) {
     for (const auto& [name, value] : instance.properties) {
         if (name != property) continue;
         std::int64_t node = 0;
@@ -112,10 +112,10 @@ std::optional<std::int64_t> NodeOf(const tqrhost::Instance& instance, std::strin
     return std::nullopt;
 }
 
-std::optional<std::int64_t> NodeOf(const tqrhost::Instance& instance, const ReportHead& head) {
+std::optional<std::int64_t> NodeOf(const NQORTQR20::Instance& instance, const ReportHead& head) {
     const auto info = std::find_if(
         head.classes.begin(), head.classes.end(),
-        [&](const tqrhost::ClassInfo& each) { return each.name == instance.className; });
+        [&](const NQORTQR20::ClassInfo& each) { return each.name == instance.className; });
     return NodeOf(instance, info == head.classes.end() ? "Node" : info->nodeProperty);
 }
 
@@ -126,12 +126,12 @@ Outcome OutcomeOf(const ReportEnd& end) {
                 "name a machine that has one with --from"};
     }
     std::string missing = StopText(end.stopped);
-    for (const tqrhost::UnreachableNode& node : end.unreachable) {
+    for (const NQORTQR20::UnreachableNode& node : end.unreachable) {
         AppendPart("; ", node.name + " could not be opened", &missing);
     }
     AppendPart("; ", MissingText(end), &missing);
     // What was stopped is no failure of the plug-in, whatever it made of the silence.
-    if (end.status.code != NQORTQR20::kStatusOk && end.stopped == tqrhost::StopReason::kNone) {
+    if (end.status.code != NQORTQR20::kStatusOk && end.stopped == NQORTQR20::StopReason::kNone) {
         std::string problem = "the pass ended with status " + std::to_string(end.status.code) +
                               " (" + end.status.TranslateStatusCode() + ")";
         AppendPart("; ", missing, &problem);

@@ -32,13 +32,13 @@ struct SystemInfo {
 
 struct ReportHead {
     std::string source;
-    tqrhost::PluginInfo plugin;  ///< the first one, of the described classes
+    NQORTQR20::PluginInfo plugin;  ///< the first one, of the described classes
     std::string machineType;
     std::size_t nodes = 0;
     std::vector<SystemInfo> systems{};  ///< by node; as far as known before the collection
-    tqrhost::Time collected{};          ///< when the collection began
+    NQORTQR20::Time collected{};        ///< when the collection began
     /// Of every plug-in: where the node of an instance stands, and what is wanted by default.
-    std::vector<tqrhost::ClassInfo> classes{};
+    std::vector<NQORTQR20::ClassInfo> classes{};
     std::vector<std::string> wanted{};  ///< the classes that are collected, in their order
     bool named = false;                 ///< the user named them
 };
@@ -53,14 +53,14 @@ struct Outcome {
 struct ReportEnd {
     NQORTQR20::TTQRStatusCode status{};  ///< the first of the plug-ins' that is not 0
     bool hasBmc = true;
-    tqrhost::StopReason stopped = tqrhost::StopReason::kNone;
+    NQORTQR20::StopReason stopped = NQORTQR20::StopReason::kNone;
     std::vector<std::string> notices;
-    std::vector<tqrhost::NodeCompleteness> completeness;
+    std::vector<NQORTQR20::NodeCompleteness> completeness;
     /// Log records written, by node: the fewest of the classes with one instance for each record.
     /// Empty when no such class was asked for.
     std::vector<unsigned> exported;
-    std::vector<tqrhost::UnreachableNode> unreachable{};
-    std::vector<tqrhost::PluginStatus> plugins{};
+    std::vector<NQORTQR20::UnreachableNode> unreachable{};
+    std::vector<NQORTQR20::PluginStatus> plugins{};
     std::vector<SystemInfo> systems{};  ///< by node, with what the controllers said of themselves
     std::optional<double> seconds{};    ///< that the collection took
     std::optional<Outcome> recorded{};  ///< of a report that is read again
@@ -68,8 +68,8 @@ struct ReportEnd {
 
 /// The number of the node that an instance belongs to, from 1, as the property of that name says,
 /// or that of its class; empty when it belongs to none.
-std::optional<std::int64_t> NodeOf(const tqrhost::Instance& instance, std::string_view property);
-std::optional<std::int64_t> NodeOf(const tqrhost::Instance& instance, const ReportHead& head);
+std::optional<std::int64_t> NodeOf(const NQORTQR20::Instance& instance, std::string_view property);
+std::optional<std::int64_t> NodeOf(const NQORTQR20::Instance& instance, const ReportHead& head);
 
 /// How a report for people looks.
 struct ReportLook {
@@ -82,7 +82,7 @@ struct ReportLook {
 class ReportWriter {
 public:
     virtual ~ReportWriter() = default;
-    virtual void Add(const tqrhost::Instance& instance) = 0;
+    virtual void Add(const NQORTQR20::Instance& instance) = 0;
     virtual void Finish(const ReportEnd& end) = 0;
 };
 

@@ -10,11 +10,11 @@
 
 namespace ipmisel {
 
-ReportSink::ReportSink(ReportWriter& report, const tqrhost::PluginSet& plugins,
+ReportSink::ReportSink(ReportWriter& report, const NQORTQR20::PluginSet& plugins,
                        const std::vector<std::string>& wanted, std::size_t nodes)
     : report_(report), nodes_(nodes) {
     for (const std::string& name : wanted) {
-        const tqrhost::ClassInfo* const info = plugins.FindClass(name);
+        const NQORTQR20::ClassInfo* const info = plugins.FindClass(name);
         if (info == nullptr || !info->Is(NQORTQR20::kPerLogRecord)) continue;
         Counted& counted = counted_[name];
         counted.nodeProperty = info->nodeProperty;
@@ -40,10 +40,10 @@ void ReportSink::Check() const {
 
 bool OutputIsOver() {
     constexpr auto kTimeToExport = std::chrono::milliseconds(800);
-    return tqrhost::StoppedFor(kTimeToExport);
+    return NQORTQR20::StoppedFor(kTimeToExport);
 }
 
-bool ReportSink::Take(const tqrhost::Instance& instance) {
+bool ReportSink::Take(const NQORTQR20::Instance& instance) {
     if (failure_ || OutputIsOver()) return false;
     try {
         report_.Add(instance);

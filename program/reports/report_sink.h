@@ -20,9 +20,9 @@ bool OutputIsOver();
 
 /// Takes the instances of a collection to the report and counts log records by node on their way.
 /// Once the report cannot be written, it takes nothing any more.
-class ReportSink : public tqrhost::WholeInstanceSink {
+class ReportSink : public NQORTQR20::WholeInstanceSink {
 public:
-    ReportSink(ReportWriter& report, const tqrhost::PluginSet& plugins,
+    ReportSink(ReportWriter& report, const NQORTQR20::PluginSet& plugins,
                const std::vector<std::string>& wanted, std::size_t nodes);
 
     /// As ReportEnd::exported.
@@ -31,7 +31,7 @@ public:
     void Check() const;
 
 protected:
-    bool Take(const tqrhost::Instance& instance) override;
+    bool Take(const NQORTQR20::Instance& instance) override;
 
 private:
     /// A class with one instance for each log record.

@@ -19,8 +19,8 @@
 namespace ipmisel {
 namespace {
 
-using tqrhost::Instance;
-using tqrhost::PropertyValue;
+using NQORTQR20::Instance;
+using NQORTQR20::PropertyValue;
 
 [[noreturn]] void Fail(const std::string& file, const std::string& problem) {
     throw Failure(kExitUsage, file + ": " + problem +
@@ -80,7 +80,7 @@ std::optional<PropertyValue> ValueOf(const Json& json) {
         case Json::value_t::array:
             return ListOf(json);
         case Json::value_t::object: {
-            tqrhost::ObjectPath path{TextAt(json, "class"), {}};
+            NQORTQR20::ObjectPath path{TextAt(json, "class"), {}};
             for (const auto& [key, value] : ObjectAt(json, "keys").items()) {
                 if (value.is_string()) path.keys.emplace_back(key, value.get<std::string>());
             }
@@ -129,7 +129,7 @@ Json Parse(const std::string& file, const std::function<void(const Json&)>& take
     return json;
 }
 
-tqrhost::PluginInfo PluginOf(const Json& json) {
+NQORTQR20::PluginInfo PluginOf(const Json& json) {
     return {TextAt(json, "name"), TextAt(json, "version"), TextAt(json, "interface")};
 }
 
@@ -137,8 +137,8 @@ NQORTQR20::TTQRStatusCode StatusOf(const Json& json) {
     return {static_cast<std::int32_t>(NumberAt(ObjectAt(json, "status"), "code"))};
 }
 
-tqrhost::SourceAccount AccountOf(const Json& json) {
-    tqrhost::SourceAccount account;
+NQORTQR20::SourceAccount AccountOf(const Json& json) {
+    NQORTQR20::SourceAccount account;
     if (json.contains("announced") && json["announced"].is_number_unsigned()) {
         account.announced = NumberAt(json, "announced");
     }
@@ -146,8 +146,8 @@ tqrhost::SourceAccount AccountOf(const Json& json) {
     return account;
 }
 
-tqrhost::NodeCompleteness CompletenessOf(const Json& json) {
-    tqrhost::NodeCompleteness node;
+NQORTQR20::NodeCompleteness CompletenessOf(const Json& json) {
+    NQORTQR20::NodeCompleteness node;
     node.source = TextAt(json, "source");
     node.log = AccountOf(ObjectAt(json, "log"));
     node.sensors = AccountOf(ObjectAt(json, "sensors"));
@@ -171,7 +171,7 @@ SavedReport::SavedReport(const std::string& file) : file_(file) {
     for (const Json& plugin : ListAt(json, "plugins")) {
         end_.plugins.push_back({PluginOf(plugin), StatusOf(plugin)});
     }
-    head_.collected = ParseTime(TextAt(json, "collected")).value_or(tqrhost::Time{});
+    head_.collected = ParseTime(TextAt(json, "collected")).value_or(NQORTQR20::Time{});
     for (const Json& system : ListAt(json, "systems")) {
         head_.systems.push_back({TextAt(system, "name"), "", TextAt(system, "guid"),
                                  TextAt(system, "manufacturer"), TextAt(system, "product"),

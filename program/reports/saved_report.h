@@ -15,7 +15,7 @@ public:
     const ReportHead& Head() const { return head_; }
     const ReportEnd& End() const { return end_; }
     /// The instances in their order. Throws Failure, and whatever `take` throws.
-    void ForEach(const std::function<void(const tqrhost::Instance&)>& take) const;
+    void ForEach(const std::function<void(const NQORTQR20::Instance&)>& take) const;
 
 private:
     std::string file_;

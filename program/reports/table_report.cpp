@@ -26,7 +26,7 @@ std::string ShownValue(const std::vector<std::uint8_t>& bytes) {
     for (const std::uint8_t byte : bytes) text += Format(text.empty() ? "%02x" : " %02x", byte);
     return text;
 }
-std::string ShownValue(const tqrhost::ObjectPath& path) {
+std::string ShownValue(const NQORTQR20::ObjectPath& path) {
     std::string text = path.className;
     for (const auto& [key, name] : path.keys) text.append(" ").append(key).append("=").append(name);
     return text;
@@ -34,7 +34,7 @@ std::string ShownValue(const tqrhost::ObjectPath& path) {
 std::string ShownValue(std::int64_t number) { return std::to_string(number); }
 std::string ShownValue(double number) { return NumberText(number); }
 std::string ShownValue(bool truth) { return truth ? "yes" : "no"; }
-std::string ShownValue(tqrhost::Time time) { return DateAndTime(time); }
+std::string ShownValue(NQORTQR20::Time time) { return DateAndTime(time); }
 std::string ShownValue(const Texts& texts) { return Listed(texts, "; "); }
 
 /// Findings stand before the events and are known after them: the rows of events wait.
@@ -43,7 +43,7 @@ public:
     TableReport(OutputFile& out, const ReportHead& head, const ReportLook& look)
         : out_(out), head_(head), look_(look), systems_(head), events_(systems_.All().size()) {}
 
-    void Add(const tqrhost::Instance& instance) override {
+    void Add(const NQORTQR20::Instance& instance) override {
         ++counts_[instance.className];
         if (instance.className == kEventClass) {
             AddEvent(EventOf(instance));
@@ -120,7 +120,7 @@ private:
     }
 
     /// A class without a place of its own: its properties, a line each.
-    void AddOther(const tqrhost::Instance& instance) {
+    void AddOther(const NQORTQR20::Instance& instance) {
         if (instance.className != otherClass_) {
             other_.Write("\n" + Bold(TerminalText(instance.className), look_) + "\n");
         } else {
@@ -322,7 +322,7 @@ private:
             PrintWrapped(text, "  ");
         };
         for (std::size_t i = 0; i < end.completeness.size(); ++i) {
-            for (const tqrhost::ReadFault& fault : end.completeness[i].faults) {
+            for (const NQORTQR20::ReadFault& fault : end.completeness[i].faults) {
                 const std::string node = systems_.All().size() > 1 ? Format("node %zu", i + 1) : "";
                 line(Listed({node, Listed({fault.what, fault.record}, " "), fault.problem}, ": "));
             }

@@ -8,8 +8,8 @@
 namespace ipmisel {
 namespace {
 
-using tqrhost::Instance;
-using tqrhost::PropertyValue;
+using NQORTQR20::Instance;
+using NQORTQR20::PropertyValue;
 
 template <typename View>
 struct Field {
@@ -186,7 +186,7 @@ void Assign(const PropertyValue& value, Truth* member) {
     if (const auto* truth = std::get_if<bool>(&value)) *member = *truth;
 }
 void Assign(const PropertyValue& value, MaybeTime* member) {
-    if (const auto* time = std::get_if<tqrhost::Time>(&value)) *member = *time;
+    if (const auto* time = std::get_if<NQORTQR20::Time>(&value)) *member = *time;
     if (const auto* text = std::get_if<std::string>(&value)) *member = ParseTime(*text);
 }
 void Assign(const PropertyValue& value, Texts* member) {
@@ -266,7 +266,7 @@ MaybeTime ParseTime(std::string_view text) {
                               std::chrono::day(static_cast<unsigned>(*day))};
     if (!offset || !date.ok() || *hour > 23 || *minute > 59 || *second > 60) return std::nullopt;
     const std::int64_t days = sys_days(date).time_since_epoch().count();
-    return tqrhost::Time{((days * 24 + *hour) * 60 + *minute) * 60 + *second - *offset};
+    return NQORTQR20::Time{((days * 24 + *hour) * 60 + *minute) * 60 + *second - *offset};
 }
 
 std::optional<std::array<std::uint8_t, 16>> Event::Record() const {

@@ -26,7 +26,7 @@ inline constexpr std::string_view kFindingClass = "IPMI_Finding";
 using Integer = std::optional<std::int64_t>;
 using Real = std::optional<double>;
 using Truth = std::optional<bool>;
-using MaybeTime = std::optional<tqrhost::Time>;
+using MaybeTime = std::optional<NQORTQR20::Time>;
 using Texts = std::vector<std::string>;
 
 struct Controller {
@@ -117,12 +117,12 @@ struct Finding {
     Truth stillPresent;
 };
 
-Controller ControllerOf(const tqrhost::Instance& instance);
-EventLog EventLogOf(const tqrhost::Instance& instance);
-Sensor SensorOf(const tqrhost::Instance& instance);
-Fru FruOf(const tqrhost::Instance& instance);
-Event EventOf(const tqrhost::Instance& instance);
-Finding FindingOf(const tqrhost::Instance& instance);
+Controller ControllerOf(const NQORTQR20::Instance& instance);
+EventLog EventLogOf(const NQORTQR20::Instance& instance);
+Sensor SensorOf(const NQORTQR20::Instance& instance);
+Fru FruOf(const NQORTQR20::Instance& instance);
+Event EventOf(const NQORTQR20::Instance& instance);
+Finding FindingOf(const NQORTQR20::Instance& instance);
 
 /// The point in time of an RFC 3339 text, "2026-03-09T02:31:44Z" or with an offset, whole seconds;
 /// empty when it is none.
@@ -137,7 +137,7 @@ struct MachineState {
     std::vector<Finding> findings;  ///< the worst first
 
     /// False when it is an instance of another class.
-    bool Add(const tqrhost::Instance& instance);
+    bool Add(const NQORTQR20::Instance& instance);
 };
 
 }  // namespace ipmisel

@@ -14,7 +14,7 @@ std::string Counted(std::int64_t count, const std::string& what) {
 
 }  // namespace
 
-std::string DateAndTime(tqrhost::Time time) {
+std::string DateAndTime(NQORTQR20::Time time) {
     std::string text = TimeText(time);  // 2026-03-09T02:31:44Z
     text[10] = ' ';
     text.pop_back();

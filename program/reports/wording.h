@@ -10,7 +10,7 @@
 namespace ipmisel {
 
 /// "2026-03-09 02:31:44", UTC.
-std::string DateAndTime(tqrhost::Time time);
+std::string DateAndTime(NQORTQR20::Time time);
 /// When it happened: date and time; "start +0:12:34" for a time since the controller's start; "-"
 /// for none.
 std::string WhenText(const Event& event);

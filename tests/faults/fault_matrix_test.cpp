@@ -12,8 +12,8 @@
 namespace ipmiseltest {
 namespace {
 
-using tqrhost::RequestFrame;
-using tqrhost::Response;
+using NQORTQR20::RequestFrame;
+using NQORTQR20::Response;
 using Answer = std::optional<Response>;
 using Answers = std::vector<Answer>;
 
@@ -38,7 +38,7 @@ struct Step {
 /// What comes instead of the answer at a position.
 using Spoil = std::function<Answer(std::size_t position, const Step&)>;
 
-class SpoiledBmc : public tqrhost::Transport {
+class SpoiledBmc : public NQORTQR20::Transport {
 public:
     SpoiledBmc(const ipmisim::BmcDescription& bmc, Spoil spoil, std::vector<Step>* steps)
         : bmc_(bmc), spoil_(std::move(spoil)), steps_(steps) {}
@@ -56,7 +56,7 @@ private:
     std::vector<Step>* steps_;
 };
 
-std::string Shown(const tqrhost::PropertyValue& value) {
+std::string Shown(const NQORTQR20::PropertyValue& value) {
     const auto* const bytes = std::get_if<std::vector<std::uint8_t>>(&value);
     if (bytes == nullptr) return std::get<std::string>(value);
     return ipmisel::DumpBytes(*bytes, ipmisel::Digits::kUpperHex);
@@ -65,14 +65,14 @@ std::string Shown(const tqrhost::PropertyValue& value) {
 /// What a pass gives.
 struct Pass {
     int status = 0;
-    std::vector<tqrhost::Instance> instances;
+    std::vector<NQORTQR20::Instance> instances;
     std::vector<Step> steps;
-    tqrhost::NodeCompleteness account;
+    NQORTQR20::NodeCompleteness account;
 
     /// Log records, or inventory, each as one text.
     std::vector<std::string> Texts(bool inventory) const {
         std::vector<std::string> texts;
-        for (const tqrhost::Instance& instance : instances) {
+        for (const NQORTQR20::Instance& instance : instances) {
             if ((instance.className == ipmisel::kFruClass) != inventory) continue;
             if (instance.className.find("Firmware") != std::string::npos) continue;
             texts.emplace_back();
@@ -118,7 +118,7 @@ protected:
                 return step.request.command() == missing ? Response{0xC1} : step.answer;
             });
             if (missing == 0) clean = healthy;
-            for (const tqrhost::Instance& instance : healthy.instances) {
+            for (const NQORTQR20::Instance& instance : healthy.instances) {
                 for (const auto& [name, value] : instance.properties) {
                     healthyValues_.insert({name, Shown(value)});
                 }
@@ -130,19 +130,19 @@ protected:
         IPMISELPluginInit(context.get());
         log.Clear();
         written.instances.clear();
-        tqrhost::Source source;
+        NQORTQR20::Source source;
         source.facts = facts;
         Pass pass;
         source.nodes.push_back(
             {"", std::make_unique<SpoiledBmc>(nodes[0], std::move(spoil), &pass.steps), nullptr});
-        tqrhost::OpenMachine(std::move(source));
-        const tqrhost::OutputHandle output(written);
+        NQORTQR20::OpenMachine(std::move(source));
+        const NQORTQR20::OutputHandle output(written);
         std::vector<const char*> classes = DefaultClasses();
         pass.status = IPMISELGetData(context.get(), output.get(), classes.data(),
                                      static_cast<int>(classes.size()))
                           .code;
-        pass.account = tqrhost::GetCompleteness().front();
-        tqrhost::CloseMachine();
+        pass.account = NQORTQR20::GetCompleteness().front();
+        NQORTQR20::CloseMachine();
         pass.instances = written.instances;
         return pass;
     }
@@ -180,7 +180,7 @@ private:
                 inventory += static_cast<char>(answer[i]);
             }
         }
-        for (const tqrhost::Instance& instance : pass.instances) {
+        for (const NQORTQR20::Instance& instance : pass.instances) {
             for (const auto& [name, value] : instance.properties) {
                 const std::string shown = Shown(value);
                 const bool known = name == "RawData" ? records.contains(shown)

@@ -125,7 +125,7 @@ TEST_F(HostileBmc, CountsThatNeverAddUp) {
         nodes[0].faults = {c.fault};
         CollectAll();
         EXPECT_THAT(Sensors(), SizeIs(c.exported)) << c.what;
-        EXPECT_EQ(tqrhost::GetCompleteness()[0].Whole(), c.whole) << c.what;
+        EXPECT_EQ(NQORTQR20::GetCompleteness()[0].Whole(), c.whole) << c.what;
     }
 }
 

@@ -11,6 +11,7 @@
 #include "host/spdriver/reading.h"
 #include "tests/support/fru_inventory.h"
 #include "tests/support/machine_fixture.h"
+#include "tests/support/serial_pipeline.h"
 
 namespace ipmiseltest {
 namespace {
@@ -57,7 +58,7 @@ protected:
         }
         return bmc;
     }
-    void Note(const ipmi::Command& command, const std::optional<tqrhost::Response>& answer) {
+    void Note(const ipmi::Command& command, const std::optional<NQORTQR20::Response>& answer) {
         constexpr std::size_t kWhole = 3 + 16;
         if (command.code() != ipmi::kGetSelEntry || !answer || answer->size() < kWhole ||
             answer->front() != 0) {
@@ -67,10 +68,11 @@ protected:
     }
 
     /// The simulated BMC, watched.
-    class Watched : public tqrhost::Transport {
+    class Watched : public NQORTQR20::Transport {
     public:
         Watched(const ipmisim::BmcDescription& bmc, RandomMachine* test) : bmc_(bmc), test_(test) {}
-        std::optional<tqrhost::Response> Exchange(const tqrhost::RequestFrame& request) override {
+        std::optional<NQORTQR20::Response> Exchange(
+            const NQORTQR20::RequestFrame& request) override {
             auto answer =
                 bmc_.Execute(request.netFn(), request.lun(), request.command(), request.data());
             test_->Note(request.ToCommand(), answer);
@@ -90,23 +92,23 @@ protected:
         written.instances.clear();
         ipmisel::ResetModuleState();
         IPMISELPluginInit(context.get());
-        tqrhost::Source source;
+        NQORTQR20::Source source;
         source.facts = facts;
         auto watched = std::make_unique<Watched>(bmc, this);
         if (readAhead) {
             source.nodes.push_back(
-                {"", nullptr, std::make_unique<tqrhost::SerialPipeline>(std::move(watched))});
-            tqrhost::ReadLiveNodes(source, {});
+                {"", nullptr, std::make_unique<SerialPipeline>(std::move(watched))});
+            NQORTQR20::ReadLiveNodes(source, {});
         } else {
             source.nodes.push_back({"", std::move(watched), nullptr});
         }
-        tqrhost::OpenMachine(std::move(source));
-        const tqrhost::OutputHandle output(written);
+        NQORTQR20::OpenMachine(std::move(source));
+        const NQORTQR20::OutputHandle output(written);
         const char* classes[] = {"QORSG_IPMIFRU", "QORSG_IPMILogRecord"};
         const int status =
             IPMISELGetData(context.get(), output.get(), classes, std::size(classes)).code;
-        tqrhost::EndPass();
-        tqrhost::NodeCompleteness account = tqrhost::GetCompleteness().front();
+        NQORTQR20::EndPass();
+        NQORTQR20::NodeCompleteness account = NQORTQR20::GetCompleteness().front();
         const auto exported =
             std::count_if(written.instances.begin(), written.instances.end(),
                           [](const auto& i) { return i.className == "QORSG_IPMILogRecord"; });

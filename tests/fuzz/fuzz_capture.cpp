@@ -16,11 +16,11 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     if (write(file, data, size) == static_cast<ssize_t>(size)) {
         try {
             auto source =
-                tqrhost::OpenSources({"replay:/proc/self/fd/" + std::to_string(file)}, {});
+                NQORTQR20::OpenSources({"replay:/proc/self/fd/" + std::to_string(file)}, {});
             const std::array<std::uint8_t, 15> frame{0x01, 0x20, 0x0A, 0x00, 0x40};
-            const auto request = tqrhost::RequestFrame::FromBuffer(frame);
+            const auto request = NQORTQR20::RequestFrame::FromBuffer(frame);
             for (const auto& node : source.nodes) node.transport->Exchange(*request);
-        } catch (const tqrhost::SourceError&) {
+        } catch (const NQORTQR20::SourceError&) {
         }
     }
     close(file);

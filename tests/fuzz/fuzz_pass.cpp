@@ -37,41 +37,41 @@ Input Take(Input* input, std::size_t count) {
     return taken;
 }
 
-class FuzzedBmc : public tqrhost::Transport {
+class FuzzedBmc : public NQORTQR20::Transport {
 public:
     explicit FuzzedBmc(Input* answers) : answers_(answers) {}
-    std::optional<tqrhost::Response> Exchange(const tqrhost::RequestFrame&) override {
+    std::optional<NQORTQR20::Response> Exchange(const NQORTQR20::RequestFrame&) override {
         if (answers_->empty()) return std::nullopt;
         const std::uint8_t length = Take(answers_);
         if (length == 0xFF) return std::nullopt;
         const Input bytes = Take(answers_, length);
-        if (bytes.empty()) return tqrhost::Response();
-        return tqrhost::Response(bytes.begin(), bytes.end());
+        if (bytes.empty()) return NQORTQR20::Response();
+        return NQORTQR20::Response(bytes.begin(), bytes.end());
     }
 
 private:
     Input* answers_;
 };
 
-class NoSink : public tqrhost::InstanceSink {
+class NoSink : public NQORTQR20::InstanceSink {
 public:
     bool OpenInstance(std::string_view) override { return true; }
-    bool AddProperty(std::string_view, const tqrhost::PropertyValue&) override { return true; }
+    bool AddProperty(std::string_view, const NQORTQR20::PropertyValue&) override { return true; }
     bool CloseInstance() override { return true; }
 };
 
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-    static const tqrhost::PluginContext context(IPMISEL_TEXTS);
+    static const NQORTQR20::PluginContext context(IPMISEL_TEXTS);
     // Somebody reads every line, so that every line is built.
-    static const int consumer = tqrhost::AddLogConsumer(
+    static const int consumer = NQORTQR20::AddLogConsumer(
         NQORTQR20::ILogger::kTrace, [](NQORTQR20::ILogger::ETQRLogSeverity, std::string_view) {});
     static_cast<void>(consumer);
 
     Input input(data, size);
     const std::uint8_t switches = Take(&input);
-    tqrhost::Source source;
+    NQORTQR20::Source source;
     source.facts.machineType = (switches & 1) != 0 ? "SIM-1" : "Zorvanek";
     source.facts.integratedBmc = (switches & 2) != 0;
     source.facts.ipmiLan = (switches & 4) != 0;
@@ -84,12 +84,12 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
         source.nodes.push_back({"", std::make_unique<FuzzedBmc>(&input), nullptr});
 
     ipmisel::ResetModuleState();
-    tqrhost::OpenMachine(std::move(source));
+    NQORTQR20::OpenMachine(std::move(source));
     NoSink sink;
-    const tqrhost::OutputHandle output(sink);
+    const NQORTQR20::OutputHandle output(sink);
     static std::vector<const char*> classes = ipmiseltest::DefaultClasses();
     IPMISELGetData(context.get(), output.get(), classes.data(), static_cast<int>(classes.size()));
-    tqrhost::CloseMachine();
-    tqrhost::TakeNotices();
+    NQORTQR20::CloseMachine();
+    NQORTQR20::TakeNotices();
     return 0;
 }

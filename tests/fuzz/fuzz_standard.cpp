@@ -25,17 +25,17 @@ namespace {
 
 using Input = std::span<const std::uint8_t>;
 
-class FuzzedController : public tqrhost::Transport {
+class FuzzedController : public NQORTQR20::Transport {
 public:
     explicit FuzzedController(Input answers) : answers_(answers) {}
-    std::optional<tqrhost::Response> Exchange(const tqrhost::RequestFrame&) override {
+    std::optional<NQORTQR20::Response> Exchange(const NQORTQR20::RequestFrame&) override {
         if (answers_.empty()) return std::nullopt;
         const std::size_t length = answers_.front();
         answers_ = answers_.subspan(1);
         if (length == 0xFF) return std::nullopt;
         const Input bytes = answers_.first(std::min(length, answers_.size()));
         answers_ = answers_.subspan(bytes.size());
-        return tqrhost::Response(bytes.begin(), bytes.end());
+        return NQORTQR20::Response(bytes.begin(), bytes.end());
     }
 
 private:
@@ -43,10 +43,10 @@ private:
 };
 
 /// Takes everything; a real must be a number.
-class NoSink : public tqrhost::InstanceSink {
+class NoSink : public NQORTQR20::InstanceSink {
 public:
     bool OpenInstance(std::string_view) override { return true; }
-    bool AddProperty(std::string_view, const tqrhost::PropertyValue& value) override {
+    bool AddProperty(std::string_view, const NQORTQR20::PropertyValue& value) override {
         const auto* real = std::get_if<double>(&value);
         if (real != nullptr && !std::isfinite(*real)) __builtin_trap();
         return true;
@@ -77,16 +77,16 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const Input input(data, size);
     Decode(input);
 
-    tqrhost::Source source;
+    NQORTQR20::Source source;
     source.nodes.push_back({"", std::make_unique<FuzzedController>(input), nullptr});
-    tqrhost::OpenMachine(std::move(source));
+    NQORTQR20::OpenMachine(std::move(source));
     NoSink sink;
-    const tqrhost::OutputHandle output(sink);
+    const NQORTQR20::OutputHandle output(sink);
     std::vector<const char*> classes;
     for (std::uint32_t i = 0; i < fdrPluginClasses.classCount; ++i) {
         classes.push_back(fdrPluginClasses.classes[i].name);
     }
     standard::GetData(nullptr, output.get(), classes.data(), static_cast<int>(classes.size()));
-    tqrhost::CloseMachine();
+    NQORTQR20::CloseMachine();
     return 0;
 }

@@ -92,13 +92,13 @@ TEST(DateTime, ComparesInstantsAndCountsBetweenThem) {
 }
 
 TEST(LocalTime, IsHeldStillOrTheClockWithItsOffset) {
-    tqrhost::MachineFacts facts;
+    NQORTQR20::MachineFacts facts;
     facts.machineType = "SIM-1";
     facts.localTime = "20240305120000.000000+060";
-    tqrhost::SetMachineFacts(facts);
+    NQORTQR20::SetMachineFacts(facts);
     EXPECT_EQ(TOSSpecific::GetLocalTime().ToString(), "20240305120000.000000+060");
     EXPECT_EQ(TOSSpecific::GetMachineTypeFromID(), "SIM-1");
-    tqrhost::SetMachineFacts({});
+    NQORTQR20::SetMachineFacts({});
 
     setenv("TZ", "XYZ-05:30", 1);  // east of Greenwich
     tzset();

@@ -25,7 +25,7 @@ public:
     }
 
 protected:
-    bool Take(const tqrhost::Instance& instance) override {
+    bool Take(const NQORTQR20::Instance& instance) override {
         return !full && InstanceRecorder::Take(instance);
     }
 };
@@ -33,7 +33,7 @@ protected:
 class Output : public ::testing::Test {
 protected:
     Recorder sink;
-    tqrhost::OutputHandle handle{sink};
+    NQORTQR20::OutputHandle handle{sink};
     fdriIOHandle* const output = handle.get();
 };
 
@@ -133,7 +133,7 @@ TEST_F(Output, MisuseIsAnsweredWithThree) {
     fdrNewCIMValueArray(&array);
     fdrNewCIMReference(&reference, output);
     TCIMReference* none = reference;
-    tqrhost::PluginContext context("/plugins");
+    NQORTQR20::PluginContext context("/plugins");
     const TPluginManagerProvider* provider = nullptr;
     const char* path = nullptr;
     const auto expectRefused = [](const char* why, std::initializer_list<TTQRStatusCode> answers) {

@@ -13,8 +13,8 @@
 namespace {
 
 using namespace NQORTQR20;
-using tqrhost::ClassInfo;
-using tqrhost::Instance;
+using NQORTQR20::ClassInfo;
+using NQORTQR20::Instance;
 using namespace ::testing;
 
 class Plugins : public ::testing::Test {
@@ -30,8 +30,8 @@ protected:
     /// The line for the user when the plug-ins cannot be loaded.
     std::string Failure(const std::vector<std::filesystem::path>& further = {}) const {
         try {
-            const tqrhost::PluginSet plugins(folder.path(), further);
-        } catch (const tqrhost::PluginError& error) {
+            const NQORTQR20::PluginSet plugins(folder.path(), further);
+        } catch (const NQORTQR20::PluginError& error) {
             return error.what();
         }
         return "loaded";
@@ -45,7 +45,7 @@ protected:
 
 TEST_F(Plugins, ATableOfClassesIsReadAsItIsDeclared) {
     Install(TEST_PLUGIN, "a.pi");
-    const tqrhost::PluginSet plugins(folder.path());
+    const NQORTQR20::PluginSet plugins(folder.path());
     EXPECT_THAT(Names(plugins.Classes()), ElementsAre("TEST_Last", "TEST_Record", "TEST_Exported"));
     EXPECT_THAT(plugins.DefaultClasses(), ElementsAre("TEST_Last", "TEST_Record"));
     EXPECT_EQ(plugins.FindClass("TEST_Rec"), nullptr);
@@ -86,8 +86,8 @@ TEST_F(Plugins, AFolderWithoutAPluginIsRefused) {
 
 TEST_F(Plugins, WhatFollowsAClassWrittenAtTheEndTakesAPassOfItsOwn) {
     Install(TEST_PLUGIN, "a.pi");
-    tqrhost::PluginSet plugins(folder.path());
-    tqrhost::CollectionPlan plan(
+    NQORTQR20::PluginSet plugins(folder.path());
+    NQORTQR20::CollectionPlan plan(
         plugins, {"TEST_Exported", "TEST_Record", "NO_Class", "TEST_Last", "TEST_Record"});
     static int passes;
     passes = 0;
@@ -107,11 +107,11 @@ TEST_F(Plugins, WhatFollowsAClassWrittenAtTheEndTakesAPassOfItsOwn) {
 
 TEST_F(Plugins, AFileThatAPluginNeedsIsLookedForWhenItsClassesAreWanted) {
     Install(TEST_PLUGIN, "a.pi");
-    const tqrhost::PluginSet plugins(folder.path());
+    const NQORTQR20::PluginSet plugins(folder.path());
     const auto failure = [&](const std::vector<std::string>& classes) -> std::string {
         try {
             plugins.CheckNeededFiles(classes);
-        } catch (const tqrhost::PluginError& error) {
+        } catch (const NQORTQR20::PluginError& error) {
             return error.what();
         }
         return "fine";
@@ -131,8 +131,8 @@ TEST_F(Plugins, AFileThatAPluginNeedsIsLookedForWhenItsClassesAreWanted) {
 }
 
 TEST_F(Plugins, SettingsOfTheUserAreAnswered) {
-    tqrhost::SetPluginSettings({{{"severities", "a text"}}, {"rack7", "rack8"}});
-    const tqrhost::PluginContext context(folder.path());
+    NQORTQR20::SetPluginSettings({{{"severities", "a text"}}, {"rack7", "rack8"}});
+    const NQORTQR20::PluginContext context(folder.path());
     const char* text = nullptr;
     EXPECT_EQ(fdrGetOption(context.get(), "severities", &text).code, kStatusOk);
     EXPECT_STREQ(text, "a text");
@@ -144,7 +144,7 @@ TEST_F(Plugins, SettingsOfTheUserAreAnswered) {
         EXPECT_EQ(fdrGetSystemName(context.get(), node, &text).code, kStatusOk);
         EXPECT_EQ(text, nullptr) << node;
     }
-    tqrhost::SetPluginSettings({});
+    NQORTQR20::SetPluginSettings({});
 }
 
 }  // namespace

@@ -11,7 +11,7 @@
 namespace {
 
 using namespace NQORTQR20;
-using tqrhost::Instance;
+using NQORTQR20::Instance;
 using namespace ::testing;
 
 class PluginLoading : public ::testing::Test {
@@ -20,8 +20,8 @@ protected:
     /// The line for the user when the file cannot be loaded.
     static std::string Failure(const std::filesystem::path& file) {
         try {
-            const tqrhost::Plugin plugin(file);
-        } catch (const tqrhost::PluginError& error) {
+            const NQORTQR20::Plugin plugin(file);
+        } catch (const NQORTQR20::PluginError& error) {
             return error.what();
         }
         return "loaded";
@@ -33,7 +33,7 @@ protected:
 TEST_F(PluginLoading, DrivesAPlugin) {
     for (int round = 0; round < 2; ++round) {
         {
-            tqrhost::Plugin plugin(TEST_PLUGIN);
+            NQORTQR20::Plugin plugin(TEST_PLUGIN);
             EXPECT_EQ(plugin.Info().name, "TEST");
             EXPECT_EQ(plugin.Info().version, "1.2");
             EXPECT_EQ(plugin.Info().interfaceVersion, "1.0");
@@ -54,7 +54,7 @@ TEST_F(PluginLoading, DrivesAPlugin) {
 
 TEST_F(PluginLoading, PluginThatCannotBeUnloadedIsLoadedAgain) {
     for (int round = 0; round < 2; ++round) {
-        tqrhost::Plugin plugin(TEST_PLUGIN_RESIDENT);
+        NQORTQR20::Plugin plugin(TEST_PLUGIN_RESIDENT);
         EXPECT_EQ(plugin.Info().name, "TEST");
         // While it is in use, its one registration belongs to the first.
         EXPECT_THAT(Failure(TEST_PLUGIN_RESIDENT), HasSubstr("not register"));
@@ -65,7 +65,7 @@ TEST_F(PluginLoading, PluginThatCannotBeUnloadedIsLoadedAgain) {
 
 TEST_F(PluginLoading, ExceptionsOfThePluginAreFailures) {
     {
-        tqrhost::Plugin plugin(TEST_PLUGIN);
+        NQORTQR20::Plugin plugin(TEST_PLUGIN);
         setenv("TEST_PLUGIN_FAULT", "throw", 1);
         EXPECT_EQ(plugin.Collect({"A"}, sink).code, kStatusFailed);
     }

@@ -14,9 +14,9 @@ using Bytes = std::vector<std::uint8_t>;
 class SmbiosReader : public ::testing::Test {
 protected:
     void SetUp() override {
-        tqrhost::MachineFacts facts;
+        NQORTQR20::MachineFacts facts;
         facts.smbios = {{38, 4, 1, 0, 0, 0}, {}, {11, 4, 2, 0, 'A', 0, 0}, {38, 4, 3, 0, 0, 0}};
-        tqrhost::SetMachineFacts(facts);
+        NQORTQR20::SetMachineFacts(facts);
         fdrGetHandle(context_.get(), &provider);
         ASSERT_EQ(smBiosLoad(provider, &handle), 0);
     }
@@ -25,7 +25,7 @@ protected:
             EXPECT_EQ(smBiosClose(&handle), 0);
         }
         EXPECT_EQ(handle, nullptr);
-        tqrhost::SetMachineFacts({});
+        NQORTQR20::SetMachineFacts({});
     }
     /// The structure that smBiosGetFirst (a type) or smBiosGetNext (none) copies.
     Bytes Read(std::optional<int> type, int capacity = 64) {
@@ -42,7 +42,7 @@ protected:
     void* handle = nullptr;
 
 private:
-    tqrhost::PluginContext context_{"/plugins"};
+    NQORTQR20::PluginContext context_{"/plugins"};
 };
 
 TEST_F(SmbiosReader, WalksTheStructuresOfOneType) {
@@ -54,7 +54,7 @@ TEST_F(SmbiosReader, WalksTheStructuresOfOneType) {
     EXPECT_EQ(Read(1), Bytes());
     EXPECT_EQ(Read(256 + 38), Bytes());
     Read(38);
-    tqrhost::SetMachineFacts({});  // another machine in the middle of a walk
+    NQORTQR20::SetMachineFacts({});  // another machine in the middle of a walk
     EXPECT_EQ(Read({}), Bytes());
 }
 

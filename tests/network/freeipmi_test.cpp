@@ -46,13 +46,13 @@ Bytes AskWithFreeIpmi(const NetworkBmc& bmc, int suite, const std::string& kg, u
 
 Bytes AskWithOurs(const NetworkBmc& bmc, int suite, const std::string& kg,
                   const std::vector<std::string>& workarounds) {
-    tqrhost::SourceOptions options;
+    NQORTQR20::SourceOptions options;
     options.user = ipmisim::kUser;
     options.password = [] { return std::string(ipmisim::kPassword); };
     options.kg = [kg] { return Bytes(kg.begin(), kg.end()); };
     options.cipherSuite = suite;
     options.workarounds = workarounds;
-    const tqrhost::Source source = tqrhost::OpenSources({bmc.Place()}, options);
+    const NQORTQR20::Source source = NQORTQR20::OpenSources({bmc.Place()}, options);
     return tqrhost::ExchangeOver(*source.nodes[0].pipeline, ipmi::GetDeviceId()).value_or(Bytes());
 }
 

@@ -50,7 +50,7 @@ void ExpectSame(const Collected& found, const Collected& expected, const std::st
 class Network : public ipmiseltest::MachineTest {
 protected:
     ServerDescription server;
-    tqrhost::SourceOptions options;
+    NQORTQR20::SourceOptions options;
 
     Network() {
         options.user = "root";
@@ -69,23 +69,23 @@ protected:
     /// A machine of 40 events, 25 sensors and FRU devices.
     void DescribeRack() { Describe(IPMISEL_EXAMPLES "/rack-server.json"); }
 
-    Collected CollectFrom(tqrhost::Source source) {
+    Collected CollectFrom(NQORTQR20::Source source) {
         source.facts = {server.machineType, server.integratedBmc, server.ipmiDriver,
                         server.ipmiLan,     server.localTime,     server.smbios};
         const std::string file = (folder_.path() / "capture").string();
-        tqrhost::ReadLiveNodes(source, {});
-        const auto capture = tqrhost::RecordTo(file, source);
+        NQORTQR20::ReadLiveNodes(source, {});
+        const auto capture = NQORTQR20::RecordTo(file, source);
         ipmisel::ResetModuleState();
         IPMISELPluginInit(context.get());
-        tqrhost::OpenMachine(std::move(source));
+        NQORTQR20::OpenMachine(std::move(source));
         std::vector<const char*> classes = ipmiseltest::DefaultClasses();
         ipmiseltest::InstanceRecorder report;
-        const tqrhost::OutputHandle output(report);
+        const NQORTQR20::OutputHandle output(report);
         IPMISELGetData(context.get(), output.get(), classes.data(),
                        static_cast<int>(classes.size()));
         Collected collected;
-        for (const auto& node : tqrhost::GetCompleteness()) collected.whole &= node.Whole();
-        tqrhost::CloseMachine();
+        for (const auto& node : NQORTQR20::GetCompleteness()) collected.whole &= node.Whole();
+        NQORTQR20::CloseMachine();
         capture->Finish();
         std::istringstream lines(ipmiseltest::ReadText(file));
         for (std::string line; std::getline(lines, line);) {
@@ -99,7 +99,7 @@ protected:
         return collected;
     }
     Collected CollectDirectly() {
-        tqrhost::Source source;
+        NQORTQR20::Source source;
         for (const ipmisim::BmcDescription& bmc : server.bmcs) {
             source.nodes.push_back(
                 {"", std::make_unique<ipmiseltest::SimulatedTransport>(bmc, &requests), nullptr});
@@ -115,7 +115,7 @@ protected:
             places.push_back(peers.back()->Place());
         }
         const auto began = std::chrono::steady_clock::now();
-        Collected collected = CollectFrom(tqrhost::OpenSources(places, options));
+        Collected collected = CollectFrom(NQORTQR20::OpenSources(places, options));
         collected.seconds =
             std::chrono::duration<double>(std::chrono::steady_clock::now() - began).count();
         for (const auto& peer : peers) {
@@ -127,8 +127,8 @@ protected:
     std::string Refusal(const Peer::Character& character) {
         const Peer peer({}, character);
         try {
-            tqrhost::OpenSources({peer.Place()}, options);
-        } catch (const tqrhost::SourceError& error) {
+            NQORTQR20::OpenSources({peer.Place()}, options);
+        } catch (const NQORTQR20::SourceError& error) {
             return error.what();
         }
         return "";
@@ -317,9 +317,9 @@ TEST_F(Network, ABmcThatIsGoneLeavesAPartialReport) {
     const std::set<std::string> known(all.capture.begin(), all.capture.end());
     for (const auto& c : cases) {
         options.timeoutSeconds = c.timeout;
-        tqrhost::StopAt(std::chrono::steady_clock::now() + std::chrono::seconds(7));
+        NQORTQR20::StopAt(std::chrono::steady_clock::now() + std::chrono::seconds(7));
         const Collected found = CollectOver(c.character);
-        tqrhost::ClearStop();
+        NQORTQR20::ClearStop();
         EXPECT_FALSE(found.whole) << c.fault;
         EXPECT_LT(found.seconds, 10) << c.fault;
         EXPECT_GT(found.capture.size(), 20u) << c.fault;

@@ -20,12 +20,12 @@ namespace ipmiseltest {
 class LogRecorder {
 public:
     LogRecorder()
-        : identity_(tqrhost::AddLogConsumer(
+        : identity_(NQORTQR20::AddLogConsumer(
               NQORTQR20::ILogger::kTrace,
               [this](NQORTQR20::ILogger::ETQRLogSeverity severity, std::string_view text) {
                   lines_.emplace_back(severity, text);
               })) {}
-    ~LogRecorder() { tqrhost::RemoveLogConsumer(identity_); }
+    ~LogRecorder() { NQORTQR20::RemoveLogConsumer(identity_); }
     LogRecorder(const LogRecorder&) = delete;
     LogRecorder& operator=(const LogRecorder&) = delete;
 
@@ -49,23 +49,23 @@ private:
 class Machine {
 public:
     explicit Machine(std::string type, std::optional<std::string> localTime = {}) {
-        tqrhost::MachineFacts facts;
+        NQORTQR20::MachineFacts facts;
         facts.machineType = std::move(type);
         facts.localTime = std::move(localTime);
-        tqrhost::SetMachineFacts(std::move(facts));
+        NQORTQR20::SetMachineFacts(std::move(facts));
     }
-    ~Machine() { tqrhost::SetMachineFacts({}); }
+    ~Machine() { NQORTQR20::SetMachineFacts({}); }
     Machine(const Machine&) = delete;
     Machine& operator=(const Machine&) = delete;
 };
 
 /// A simulated BMC as the host's transport, which also keeps the request frames.
-class SimulatedTransport : public tqrhost::Transport {
+class SimulatedTransport : public NQORTQR20::Transport {
 public:
     SimulatedTransport(ipmisim::BmcDescription description,
                        std::vector<std::vector<std::uint8_t>>* requests)
         : bmc_(std::move(description)), requests_(requests) {}
-    std::optional<tqrhost::Response> Exchange(const tqrhost::RequestFrame& request) override {
+    std::optional<NQORTQR20::Response> Exchange(const NQORTQR20::RequestFrame& request) override {
         requests_->emplace_back(request.bytes().begin(), request.bytes().end());
         return bmc_.Execute(request.netFn(), request.lun(), request.command(), request.data());
     }
@@ -138,7 +138,8 @@ private:
 };
 
 /// The text of a property; empty optional when the instance has none of that name.
-inline std::optional<std::string> TextOf(const tqrhost::Instance& instance, std::string_view name) {
+inline std::optional<std::string> TextOf(const NQORTQR20::Instance& instance,
+                                         std::string_view name) {
     for (const auto& [propertyName, value] : instance.properties) {
         if (propertyName == name) return std::get<std::string>(value);
     }
@@ -146,13 +147,13 @@ inline std::optional<std::string> TextOf(const tqrhost::Instance& instance, std:
 }
 
 /// The instances of a collection, in memory.
-class InstanceRecorder : public tqrhost::WholeInstanceSink {
+class InstanceRecorder : public NQORTQR20::WholeInstanceSink {
 public:
-    std::vector<tqrhost::Instance> instances;
+    std::vector<NQORTQR20::Instance> instances;
     /// A property that the host refuses the next time that it is written.
     std::string refusedProperty;
 
-    bool AddProperty(std::string_view name, const tqrhost::PropertyValue& value) override {
+    bool AddProperty(std::string_view name, const NQORTQR20::PropertyValue& value) override {
         if (refusedProperty.empty() || name != refusedProperty) {
             return WholeInstanceSink::AddProperty(name, value);
         }
@@ -162,14 +163,14 @@ public:
     /// The texts of one property in all instances.
     std::vector<std::string> Texts(std::string_view property) const {
         std::vector<std::string> texts;
-        for (const tqrhost::Instance& instance : instances) {
+        for (const NQORTQR20::Instance& instance : instances) {
             texts.push_back(TextOf(instance, property).value_or("(none)"));
         }
         return texts;
     }
 
 protected:
-    bool Take(const tqrhost::Instance& instance) override {
+    bool Take(const NQORTQR20::Instance& instance) override {
         instances.push_back(instance);
         return true;
     }

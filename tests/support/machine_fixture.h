@@ -23,27 +23,27 @@ namespace ipmiseltest {
 /// machine in `facts` and `nodes`, then Collect().
 class MachineTest : public ::testing::Test {
 protected:
-    tqrhost::MachineFacts facts;
+    NQORTQR20::MachineFacts facts;
     std::vector<ipmisim::BmcDescription> nodes{1};
     LogRecorder log;
     InstanceRecorder written;
     /// Request frames of all nodes in the order in which they came.
     std::vector<std::vector<std::uint8_t>> requests;
-    tqrhost::PluginContext context{IPMISEL_TEXTS};
+    NQORTQR20::PluginContext context{IPMISEL_TEXTS};
 
     MachineTest() {
         facts.smbios = {IpmiDeviceStructure()};
         ipmisel::ResetModuleState();
         IPMISELPluginInit(context.get());
-        tqrhost::TakeNotices();
+        NQORTQR20::TakeNotices();
     }
     ~MachineTest() override {
-        tqrhost::CloseMachine();
+        NQORTQR20::CloseMachine();
         ipmisel::ResetModuleState();
     }
 
     void OpenMachine() {
-        tqrhost::Source source;
+        NQORTQR20::Source source;
         source.facts = facts;
         for (const ipmisim::BmcDescription& node : nodes) {
             source.nodes.push_back({"",
@@ -51,14 +51,14 @@ protected:
                                         std::make_unique<SimulatedTransport>(node, &requests)),
                                     nullptr});
         }
-        tqrhost::OpenMachine(std::move(source));
+        NQORTQR20::OpenMachine(std::move(source));
     }
     /// One pass over the machine as it is described now; its status code. The log holds the lines
     /// of this pass alone, `written` and `requests` grow.
     int Collect(std::vector<const char*> classNames) {
         OpenMachine();
         log.Clear();
-        const tqrhost::OutputHandle output(written);
+        const NQORTQR20::OutputHandle output(written);
         return IPMISELGetData(context.get(), output.get(), classNames.data(),
                               static_cast<int>(classNames.size()))
             .code;

@@ -28,7 +28,7 @@ protected:
         int length = 256;
         Library()->sendIPMICommand(buffer.data(), &length, 256, true);
     }
-    static std::string Counts(const tqrhost::SourceAccount& account) {
+    static std::string Counts(const NQORTQR20::SourceAccount& account) {
         return (account.announced ? std::to_string(*account.announced) : "-") + "/" +
                std::to_string(account.read);
     }
@@ -36,7 +36,7 @@ protected:
         Send(0x40);
         for (const std::uint8_t record : {0, 2, 3}) Send(0x43, {0, 0, record, 0, 0, 0xFF});
     }
-    tqrhost::NodeCompleteness Account() { return tqrhost::CompletenessOf(*Library()); }
+    NQORTQR20::NodeCompleteness Account() { return NQORTQR20::CompletenessOf(*Library()); }
     std::vector<std::string> Faults() {
         std::vector<std::string> texts;
         for (const auto& fault : Account().faults) {

@@ -10,20 +10,20 @@
 namespace ipmiseltest {
 namespace {
 
+using NQORTQR20::Response;
 using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-using tqrhost::Response;
 using Answer = std::optional<Response>;
 
 class Reading : public ::testing::Test {
 protected:
     ipmisim::BmcDescription bmc;
     std::vector<ipmi::Command> asked;
-    tqrhost::Source source;
+    NQORTQR20::Source source;
 
     Reading() { bmc.selTime = 1; }
-    ~Reading() override { tqrhost::CloseMachine(); }
+    ~Reading() override { NQORTQR20::CloseMachine(); }
 
     void Describe(std::uint16_t events, std::uint16_t sensors, unsigned step = 1) {
         bmc.selEntries.clear();
@@ -37,16 +37,16 @@ protected:
                                                 static_cast<std::uint8_t>(i), 7, 1, "Sensor name"));
         }
     }
-    void Read(WindowedPipeline::Conditions conditions, tqrhost::ReadingNeeds needs = {}) {
+    void Read(WindowedPipeline::Conditions conditions, NQORTQR20::ReadingNeeds needs = {}) {
         asked.clear();
         source = {};
         source.nodes.push_back(
             {"lan:h", nullptr,
              std::make_unique<WindowedPipeline>(bmc, std::move(conditions), &asked)});
-        tqrhost::ReadLiveNodes(source, needs);
+        NQORTQR20::ReadLiveNodes(source, needs);
     }
     Answer Ask(const ipmi::Command& command) {
-        return source.nodes[0].transport->Exchange(tqrhost::RequestFrame(command));
+        return source.nodes[0].transport->Exchange(NQORTQR20::RequestFrame(command));
     }
     std::size_t Asked(ipmi::CommandCode code) const {
         return static_cast<std::size_t>(std::count_if(
@@ -69,10 +69,10 @@ protected:
     }
     /// What is missing after a pass that reads the log.
     std::vector<std::string> FaultsOfAPass() {
-        tqrhost::OpenMachine(std::move(source));
+        NQORTQR20::OpenMachine(std::move(source));
         auto* const library = NQORTQR20::SPLibrary::GetSplibraryInstance(0);
         const auto send = [&](const ipmi::Command& command) {
-            const tqrhost::RequestFrame frame(command);
+            const NQORTQR20::RequestFrame frame(command);
             std::vector<unsigned char> buffer(frame.bytes().begin(), frame.bytes().end());
             buffer.resize(256);
             int length = 256;
@@ -85,9 +85,9 @@ protected:
             if (answer.empty() || answer[8] != 0) break;
             id = static_cast<std::uint16_t>(answer[9] | answer[10] << 8);
         }
-        tqrhost::EndPass();
+        NQORTQR20::EndPass();
         std::vector<std::string> faults;
-        const tqrhost::NodeCompleteness node = tqrhost::GetCompleteness().front();
+        const NQORTQR20::NodeCompleteness node = NQORTQR20::GetCompleteness().front();
         for (const auto& fault : node.faults) faults.push_back(fault.what + ": " + fault.problem);
         if (!node.Whole() && faults.empty()) faults.emplace_back("records are missing");
         return faults;

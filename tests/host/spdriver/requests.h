@@ -8,18 +8,18 @@
 namespace ipmiseltest {
 
 /// A request frame of the Storage NetFn.
-inline tqrhost::RequestFrame StorageRequest(std::uint8_t command,
-                                            const std::vector<std::uint8_t>& data = {}) {
+inline NQORTQR20::RequestFrame StorageRequest(std::uint8_t command,
+                                              const std::vector<std::uint8_t>& data = {}) {
     std::vector<std::uint8_t> frame{
         0x01, 0x20, 0x0A, 0x00, command, static_cast<std::uint8_t>(data.size()), 0, 0, 0};
     frame.insert(frame.end(), data.begin(), data.end());
     if (frame.size() < 15) frame.resize(15);
-    return *tqrhost::RequestFrame::FromBuffer(frame);
+    return *NQORTQR20::RequestFrame::FromBuffer(frame);
 }
 
 /// Get SEL Entry or Get SDR of a whole record, or from `offset`.
-inline tqrhost::RequestFrame ReadRequest(std::uint8_t command, std::uint16_t id,
-                                         std::uint8_t offset = 0) {
+inline NQORTQR20::RequestFrame ReadRequest(std::uint8_t command, std::uint16_t id,
+                                           std::uint8_t offset = 0) {
     return StorageRequest(command, {0, 0, static_cast<std::uint8_t>(id),
                                     static_cast<std::uint8_t>(id >> 8), offset, 0xFF});
 }

@@ -68,7 +68,7 @@ TEST(Capture, AReplayAnswersWhatWasRecorded) {
     const ipmiseltest::TemporaryFolder folder;
     const std::string file = (folder.path() / "capture").string();
     Source source = OpenSources({"sim:" + folder.Write("s.json", kServer)}, {});
-    const auto capture = tqrhost::RecordTo(file, source);
+    const auto capture = NQORTQR20::RecordTo(file, source);
     const auto recorded = Converse(source);
     EXPECT_TRUE(capture->Finish());
     ASSERT_THAT(recorded, ElementsAre(std::nullopt, Response{0xC3}, Response{0, 1, 0, 0, 0},
@@ -102,7 +102,7 @@ TEST(Capture, AReplayShowsTheClockAsItWasAtTheQuestion) {
     const std::string server =
         folder.Write("s.json", R"({"bmcs": [{"latency_us": 20000, "sel": {"time": 5}}]})");
     const auto times = [](Source source) {
-        tqrhost::SetMachineFacts(source.facts);
+        NQORTQR20::SetMachineFacts(source.facts);
         std::vector<std::string> seen;
         const auto see = [&seen] {
             seen.push_back(NQORTQR20::TOSSpecific::GetLocalTime().ToString());
@@ -113,13 +113,13 @@ TEST(Capture, AReplayShowsTheClockAsItWasAtTheQuestion) {
             source.nodes[0].transport->Exchange(StorageRequest(kGetSelTime));
             see();
         }
-        tqrhost::SetMachineFacts({});
+        NQORTQR20::SetMachineFacts({});
         return seen;
     };
     Source source = OpenSources({"sim:" + server}, {});
     std::vector<std::string> recorded;
     {
-        const auto capture = tqrhost::RecordTo(file, source, {"A", "B"});
+        const auto capture = NQORTQR20::RecordTo(file, source, {"A", "B"});
         recorded = times(std::move(source));
         EXPECT_TRUE(capture->Finish());
     }
@@ -157,7 +157,7 @@ TEST(Capture, OneThatEndsInTheMiddleOfALineIsReplayedAsFarAsItGoes) {
 TEST(Capture, WhatCannotBeWrittenIsTold) {
     for (const char* file : {"/nonexistent/capture", "/dev/full", "/"}) {
         Source source;
-        EXPECT_THROW(tqrhost::RecordTo(file, source), SourceError) << file;
+        EXPECT_THROW(NQORTQR20::RecordTo(file, source), SourceError) << file;
     }
 }
 

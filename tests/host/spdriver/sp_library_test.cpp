@@ -18,7 +18,7 @@ struct Script {
     std::optional<RequestFrame> asked;
 };
 
-class ScriptedTransport : public tqrhost::Transport {
+class ScriptedTransport : public NQORTQR20::Transport {
 public:
     explicit ScriptedTransport(Script* script) : script_(script) {}
     std::optional<Response> Exchange(const RequestFrame& request) override {
@@ -103,15 +103,15 @@ TEST_F(Send, MisuseIsRefusedBeforeAnythingIsSent) {
 
 TEST(Machine, ItsNodesLastUntilItIsClosed) {
     Script script;
-    tqrhost::Source source;
+    NQORTQR20::Source source;
     for (int i = 0; i < 2; ++i)
         source.nodes.push_back({"", std::make_unique<ScriptedTransport>(&script), nullptr});
-    tqrhost::OpenMachine(std::move(source));
+    NQORTQR20::OpenMachine(std::move(source));
     ASSERT_EQ(SPLibrary::GetNumberBMCNode(), 2);
     EXPECT_NE(SPLibrary::GetSplibraryInstance(1), nullptr);
     EXPECT_EQ(SPLibrary::GetSplibraryInstance(2), nullptr);
     EXPECT_EQ(SPLibrary::GetSplibraryInstance(-1), nullptr);
-    tqrhost::CloseMachine();
+    NQORTQR20::CloseMachine();
     EXPECT_EQ(SPLibrary::GetSplibraryInstance(0), nullptr);
 }
 

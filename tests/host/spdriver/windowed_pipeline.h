@@ -15,7 +15,7 @@ namespace ipmiseltest {
 
 /// A simulated BMC behind a pipeline of a fixed window, which answers the newest request first
 /// where it is told to, and keeps what it was asked.
-class WindowedPipeline : public tqrhost::RequestPipeline {
+class WindowedPipeline : public NQORTQR20::RequestPipeline {
 public:
     struct Conditions {
         std::size_t window = 1;

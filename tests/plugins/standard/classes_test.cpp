@@ -38,20 +38,20 @@ constexpr const char* kServer = R"({"local_time": "20240305130000.000000+060", "
 }, {}]})";
 
 /// A value of a property as text, and its type.
-std::string Shown(const tqrhost::PropertyValue& value) {
+std::string Shown(const NQORTQR20::PropertyValue& value) {
     struct Visitor {
         std::string operator()(const std::string& v) const { return v; }
         std::string operator()(std::int64_t v) const { return std::to_string(v); }
         std::string operator()(double v) const { return ipmisel::Format("%.10g", v); }
         std::string operator()(bool v) const { return v ? "true" : "false"; }
-        std::string operator()(const tqrhost::Time& v) const { return tqrhost::TimeText(v); }
+        std::string operator()(const NQORTQR20::Time& v) const { return NQORTQR20::TimeText(v); }
         std::string operator()(const std::vector<std::string>& v) const {
             std::string all;
             for (const std::string& text : v) all += "[" + text + "]";
             return all.empty() ? "[]" : all;
         }
         std::string operator()(const std::vector<std::uint8_t>&) const { return "bytes"; }
-        std::string operator()(const tqrhost::ObjectPath&) const { return "reference"; }
+        std::string operator()(const NQORTQR20::ObjectPath&) const { return "reference"; }
     };
     return std::visit(Visitor(), value);
 }
@@ -60,13 +60,13 @@ std::string ServerWithInventory();
 
 class StandardClasses : public Test {
 protected:
-    ~StandardClasses() override { tqrhost::CloseMachine(); }
+    ~StandardClasses() override { NQORTQR20::CloseMachine(); }
 
     /// One pass over a simulated server; every property of every instance as text.
     std::vector<std::map<std::string, std::string>> Collect(const std::string& json,
                                                             std::vector<const char*> classNames) {
         auto server = ipmisim::ParseServer(json, "test");
-        tqrhost::Source source;
+        NQORTQR20::Source source;
         source.facts.localTime = server.localTime;
         source.facts.smbios = server.smbios;
         for (auto& bmc : server.bmcs) {
@@ -75,9 +75,9 @@ protected:
                  std::make_unique<ipmiseltest::SimulatedTransport>(std::move(bmc), &requests),
                  {}});
         }
-        tqrhost::OpenMachine(std::move(source));
+        NQORTQR20::OpenMachine(std::move(source));
         written.instances.clear();
-        const tqrhost::OutputHandle output(written);
+        const NQORTQR20::OutputHandle output(written);
         EXPECT_EQ(GetData(context.get(), output.get(), classNames.data(),
                           static_cast<int>(classNames.size()))
                       .code,
@@ -92,7 +92,7 @@ protected:
 
     ipmiseltest::InstanceRecorder written;
     std::vector<std::vector<std::uint8_t>> requests;
-    tqrhost::PluginContext context{"/nowhere"};
+    NQORTQR20::PluginContext context{"/nowhere"};
 };
 
 TEST_F(StandardClasses, AControllerTellsWhatItIsAndHowItIs) {
@@ -356,13 +356,13 @@ TEST_F(StandardClasses, EachRecordIsReadOnceForAllClasses) {
 TEST_F(StandardClasses, AHostThatRefusesEndsThePass) {
     written.refusedProperty = "Number";
     auto server = ipmisim::ParseServer(kServer, "test");
-    tqrhost::Source source;
+    NQORTQR20::Source source;
     source.nodes.push_back({"sim",
                             std::make_unique<ipmiseltest::SimulatedTransport>(
                                 std::move(server.bmcs.front()), &requests),
                             {}});
-    tqrhost::OpenMachine(std::move(source));
-    const tqrhost::OutputHandle output(written);
+    NQORTQR20::OpenMachine(std::move(source));
+    const NQORTQR20::OutputHandle output(written);
     const char* names[] = {"IPMI_Sensor"};
     EXPECT_EQ(GetData(context.get(), output.get(), names, 1).code, NQORTQR20::kStatusFailed);
     EXPECT_EQ(GetData(context.get(), output.get(), nullptr, 0).code, NQORTQR20::kStatusOk);

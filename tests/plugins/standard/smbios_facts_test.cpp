@@ -15,12 +15,12 @@ TEST(SmbiosFacts, EveryStructureOfTheHostsMachineIsRead) {
         return SmbiosStructure(17, {0, 0, 0, 0, 0, 0, 0, 0, 0, 0x20, 0, 0, 1, 0, 0x1A, 0, 0},
                                {slot});
     };
-    tqrhost::MachineFacts machine;
+    NQORTQR20::MachineFacts machine;
     machine.smbios = {memory("DIMM_1"), SmbiosStructure(1, {1, 0, 0, 0}, {"Acme"}),
                       SmbiosStructure(9, {1, 0, 0, 0, 0, 0, 0, 0}, {"Slot 1"}), memory("DIMM_2"),
                       SmbiosStructure(17, {0, 0}, {})};  // too short to be one
-    tqrhost::SetMachineFacts(machine);
-    const tqrhost::PluginContext context("/plugins");
+    NQORTQR20::SetMachineFacts(machine);
+    const NQORTQR20::PluginContext context("/plugins");
     const NQORTQR20::TPluginManagerProvider* provider = nullptr;
     NQORTQR20::fdrGetHandle(context.get(), &provider);
     const SmbiosFacts facts = ReadSmbios(provider);
@@ -29,7 +29,7 @@ TEST(SmbiosFacts, EveryStructureOfTheHostsMachineIsRead) {
     EXPECT_EQ(facts.system->manufacturer, "Acme");
     EXPECT_EQ(facts.slots.size(), 1u);
     EXPECT_TRUE(facts.processors.empty());
-    tqrhost::SetMachineFacts({});
+    NQORTQR20::SetMachineFacts({});
     EXPECT_FALSE(ReadSmbios(provider).system);
     EXPECT_FALSE(ReadSmbios(nullptr).system);
 }

@@ -8,8 +8,8 @@ namespace {
 
 using ipmisel::OutcomeOf;
 using ipmisel::ReportEnd;
-using tqrhost::Instance;
-using tqrhost::StopReason;
+using NQORTQR20::Instance;
+using NQORTQR20::StopReason;
 
 /// An event as a plug-in writes it.
 Instance Event(std::int64_t record, const std::string& severity, const std::string& text) {
@@ -17,7 +17,7 @@ Instance Event(std::int64_t record, const std::string& severity, const std::stri
             {{"Key", std::string(32, static_cast<char>('a' + record))},
              {"Node", std::int64_t{1}},
              {"RecordID", record},
-             {"Time", tqrhost::Time{1773023504 + record}},
+             {"Time", NQORTQR20::Time{1773023504 + record}},
              {"Severity", severity},
              {"State", std::string("open")},
              {"Direction", std::string("asserted")},
@@ -98,8 +98,8 @@ TEST_F(Table, FindingsStandFirstWithWhatToOrder) {
                             {"PartNumber", std::string("MC4")},
                             {"SerialNumber", std::string("0A1B")},
                             {"PartCandidates", std::vector<std::string>{"DIMM_11", "DIMM_12"}},
-                            {"FirstTime", tqrhost::Time{1773023504}},
-                            {"LastTime", tqrhost::Time{1773023508}},
+                            {"FirstTime", NQORTQR20::Time{1773023504}},
+                            {"LastTime", NQORTQR20::Time{1773023508}},
                             {"Count", std::int64_t{2}},
                             {"StillPresent", true}}};
     end.completeness = {{"sim:x", {1, 1}, {}, {{"Read FRU Data", "0005", "no response", false}}}};
@@ -126,10 +126,10 @@ TEST_F(Table, AClassThatIsNamedIsShownByItsProperties) {
     const Instance one{"NEW_Class\x1b", {{"Name", std::string("a\nb")}, {"Last", std::string()}}};
     const Instance other{"NEW_Class\x1b",
                          {{"RawData", std::vector<std::uint8_t>{1, 0xAB}},
-                          {"Log", tqrhost::ObjectPath{"NEW_Y", {{"Name", "z"}}}},
+                          {"Log", NQORTQR20::ObjectPath{"NEW_Y", {{"Name", "z"}}}},
                           {"Real", 1.5},
                           {"Truth", true},
-                          {"At", tqrhost::Time{0}},
+                          {"At", NQORTQR20::Time{0}},
                           {"Texts", std::vector<std::string>{"p", "q"}},
                           {"Long", std::string(90, 'x')}}};
     EXPECT_EQ(Print({one, other, {"OTHER_Class", {{"Name", std::string("not asked for")}}}}),
@@ -148,11 +148,11 @@ TEST_F(Table, AClassThatIsNamedIsShownByItsProperties) {
 }
 
 TEST(Outcome, SaysHowItWentAndWhatIsMissing) {
-    tqrhost::NodeCompleteness whole;
+    NQORTQR20::NodeCompleteness whole;
     whole.log = {5, 5};
-    tqrhost::NodeCompleteness fru = whole;
+    NQORTQR20::NodeCompleteness fru = whole;
     fru.faults = {{"Read FRU Data", "0003", "no response", false}};
-    tqrhost::NodeCompleteness part = whole;
+    NQORTQR20::NodeCompleteness part = whole;
     part.source = "lan:b";
     part.log.read = 3;
     part.sensors = {7, 6};
@@ -163,13 +163,13 @@ TEST(Outcome, SaysHowItWentAndWhatIsMissing) {
     const std::string missing =
         "2 of 5 log records not read, 1 of 7 sensor records not read, Get SEL Entry 0004: short "
         "answer";
-    tqrhost::NodeCompleteness dropped = whole;
+    NQORTQR20::NodeCompleteness dropped = whole;
     dropped.log.exported = 4;
     const struct {
         int status;
         bool hasBmc;
         StopReason stopped;
-        std::vector<tqrhost::NodeCompleteness> nodes;
+        std::vector<NQORTQR20::NodeCompleteness> nodes;
         int exitStatus;
         std::string problem;
     } cases[] = {

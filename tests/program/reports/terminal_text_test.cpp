@@ -67,12 +67,12 @@ TEST(Text, LinesBreakAtBlanksWhereTheyCan) {
 }
 
 TEST(Text, AnInstanceKeepsItsOrderAndItsDoubles) {
-    const tqrhost::Instance instance{
+    const NQORTQR20::Instance instance{
         "QORSG_X",
         {{"B", std::string("1")},
          {"A", std::vector<std::uint8_t>{0, 255}},
          {"Empty", std::vector<std::uint8_t>{}},
-         {"R", tqrhost::ObjectPath{"QORSG_Y", {{"K", "1"}, {"J", "\"2"}}}},
+         {"R", NQORTQR20::ObjectPath{"QORSG_Y", {{"K", "1"}, {"J", "\"2"}}}},
          {"B", std::string("2")}}};
     EXPECT_EQ(ipmisel::JsonInstance(instance),
               R"({"class": "QORSG_X", "properties": {"B": "1", "A": [0, 255], "Empty": [], )"

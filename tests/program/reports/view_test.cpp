@@ -9,8 +9,8 @@
 namespace {
 
 using ipmisel::ParseTime;
-using tqrhost::Instance;
-using tqrhost::Time;
+using NQORTQR20::Instance;
+using NQORTQR20::Time;
 
 std::optional<Time> At(std::optional<std::int64_t> seconds) {
     return seconds ? std::optional(Time{*seconds}) : std::nullopt;

@@ -41,7 +41,7 @@ protected:
     }
     unsigned Export() {
         log.Clear();
-        const tqrhost::OutputHandle output(written);
+        const NQORTQR20::OutputHandle output(written);
         return ExportAuxDebugLog(1, nullptr, output.get(), auxEntries.data(),
                                  static_cast<unsigned>(auxEntries.size()), entries.data(),
                                  static_cast<unsigned>(entries.size()), &mapping, Library());
@@ -64,7 +64,7 @@ TEST_F(AuxDebugLog, WritesDebugCodesOfKnownRecords) {
 
     EXPECT_THAT(written.Texts("RecordID"), ElementsAre("0", "3", "5"));
     ASSERT_EQ(written.instances.size(), 3U);
-    const tqrhost::Instance& first = written.instances[0];
+    const NQORTQR20::Instance& first = written.instances[0];
     EXPECT_EQ(first.className, kAuxClass);
     EXPECT_EQ(Names(first),
               "MessageTimestamp CreationClassName LogCreationClassName LogName RecordID RawData ");

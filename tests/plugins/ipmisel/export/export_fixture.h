@@ -20,20 +20,20 @@ protected:
     InstanceRecorder written;
     std::vector<IPMISELEntry> entries;
     IPMIMapping mapping;
-    tqrhost::PluginContext context{IPMISEL_TEXTS};
+    NQORTQR20::PluginContext context{IPMISEL_TEXTS};
 
     ~ExportTest() override { gNoArrays = false; }
     void Add(const SelRecord& record) {
         const s_SEL_row row = RowOf(record);
         ASSERT_EQ(entries.emplace_back().ScanSELDataFile(context.get(), &row, 0), 0U);
     }
-    static std::string Names(const tqrhost::Instance& instance) {
+    static std::string Names(const NQORTQR20::Instance& instance) {
         std::string names;
         for (const auto& property : instance.properties) names += property.first + " ";
         return names;
     }
     /// The last property.
-    static std::vector<std::uint8_t> RawData(const tqrhost::Instance& instance) {
+    static std::vector<std::uint8_t> RawData(const NQORTQR20::Instance& instance) {
         return std::get<std::vector<std::uint8_t>>(instance.properties.back().second);
     }
     std::string Text(std::size_t instance, std::string_view property) const {

@@ -9,11 +9,11 @@ namespace {
 using ::testing::ElementsAre;
 
 /// "Class: Name=text Name=Class(Key=text) "
-std::string Rendered(const tqrhost::Instance& instance) {
+std::string Rendered(const NQORTQR20::Instance& instance) {
     std::string text = instance.className + ": ";
     for (const auto& [name, value] : instance.properties) {
         text += name + "=";
-        if (const auto* path = std::get_if<tqrhost::ObjectPath>(&value)) {
+        if (const auto* path = std::get_if<NQORTQR20::ObjectPath>(&value)) {
             text +=
                 path->className + "(" + path->keys.at(0).first + "=" + path->keys[0].second + ") ";
         } else {
@@ -25,7 +25,7 @@ std::string Rendered(const tqrhost::Instance& instance) {
 
 TEST(MessageLog, TwoReferencesWhateverTheLogHolds) {
     InstanceRecorder written;
-    const tqrhost::OutputHandle output(written);
+    const NQORTQR20::OutputHandle output(written);
     EXPECT_EQ(ExportMessageLog(nullptr, output.get()), 0);
     EXPECT_EQ(ExportReferences(nullptr, output.get()), 0);
     std::vector<std::string> instances;

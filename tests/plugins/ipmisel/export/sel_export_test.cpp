@@ -36,7 +36,7 @@ protected:
         cache_.push_back(&sensor);
     }
     unsigned Export(int node = 0, int recordIdOffset = 0) {
-        const tqrhost::OutputHandle output(written);
+        const NQORTQR20::OutputHandle output(written);
         log.Clear();
         return ExportSEL(node, context.get(), output.get(), nullptr, &mapping, nullptr, &cache_,
                          entries.data(), static_cast<unsigned>(entries.size()), recordIdOffset,
@@ -72,7 +72,7 @@ TEST_F(SelExport, WritesThePropertiesOfEachRecordTypeInOrder) {
     ASSERT_EQ(written.instances.size(), std::size(cases));
     for (std::size_t i = 0; i < std::size(cases); ++i) {
         SCOPED_TRACE(cases[i].sensorType);
-        const tqrhost::Instance& instance = written.instances[i];
+        const NQORTQR20::Instance& instance = written.instances[i];
         EXPECT_EQ(instance.className, "QORSG_IPMILogRecord");
         EXPECT_EQ(Names(instance), "CreationClassName LogCreationClassName LogName RecordID " +
                                        cases[i].names + "AuxLog SourceNode RawData ");

@@ -72,7 +72,7 @@ TEST(KeptInstances, AreWrittenInOrderWithBlanksForEmptyValues) {
     entries.AddInstance();
 
     ipmiseltest::InstanceRecorder sink;
-    const tqrhost::OutputHandle output(sink);
+    const NQORTQR20::OutputHandle output(sink);
     EXPECT_EQ(entries.GenerateCIMInstance(output.get(), "QORSG_IPMIFRU"), 0u);
     ASSERT_EQ(sink.instances.size(), 2u);
     EXPECT_EQ(sink.instances[0].className, "QORSG_IPMIFRU");
@@ -91,7 +91,7 @@ TEST(KeptInstances, OneThatTheHostRefusesLeavesTheOthers) {
     ipmiseltest::InstanceRecorder sink;
     sink.refusedProperty = "PartNumber";
     const ipmiseltest::LogRecorder log;
-    const tqrhost::OutputHandle output(sink);
+    const NQORTQR20::OutputHandle output(sink);
     EXPECT_EQ(entries.GenerateCIMInstance(output.get(), "QORSG_IPMIFRU"), 1u);
     ASSERT_EQ(sink.instances.size(), 1u);
     EXPECT_EQ(log.Lines(1), std::vector<std::string>{"Error adding QORSG_IPMIFRU."});

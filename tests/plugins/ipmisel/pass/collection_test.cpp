@@ -128,7 +128,7 @@ TEST_F(Pass, WithoutABmcCollectsNothingAndLooksAgainNextTime) {
 TEST_F(Pass, PassesOverNamesThatItDoesNotKnow) {
     EXPECT_EQ(Collect({"QORSG_IPMILogRecords", "", nullptr, "qorsg_ipmilogrecord"}), 0);
     EXPECT_THAT(requests, IsEmpty());
-    const tqrhost::OutputHandle output(written);
+    const NQORTQR20::OutputHandle output(written);
     EXPECT_EQ(IPMISELGetData(context.get(), output.get(), nullptr, 3).code, 0);
 }
 
@@ -257,7 +257,7 @@ TEST_F(Pass, ObjectThatCannotBeCreatedEndsThePass) {
     for (const auto& c : cases) {
         OpenMachine();
         log.Clear();
-        const tqrhost::OutputHandle output(written);
+        const NQORTQR20::OutputHandle output(written);
         gRefusedSize = c.size;
         gRefusals = c.refusals;
         const int status = IPMISELGetData(context.get(), output.get(), nullptr, 0).code;

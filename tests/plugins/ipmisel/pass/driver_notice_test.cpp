@@ -19,7 +19,7 @@ protected:
         ipmisel::ResetModuleState();
         IPMISELPluginInit(context.get());
         EXPECT_EQ(Collect({}), 0);
-        const auto notices = tqrhost::TakeNotices();
+        const auto notices = NQORTQR20::TakeNotices();
         EXPECT_THAT(notices, SizeIs(1));
         return notices.empty() ? "" : notices[0].markupText;
     }
@@ -28,10 +28,10 @@ protected:
 TEST_F(DriverNotice, IsGivenInTwoFormsOnceInTheProcess) {
     facts.smbios.clear();
     Collect({});
-    EXPECT_THAT(tqrhost::TakeNotices(), IsEmpty()) << "without a BMC";
+    EXPECT_THAT(NQORTQR20::TakeNotices(), IsEmpty()) << "without a BMC";
     facts.smbios = {IpmiDeviceStructure()};
     Collect({});
-    const auto notices = tqrhost::TakeNotices();
+    const auto notices = NQORTQR20::TakeNotices();
     ASSERT_THAT(notices, SizeIs(1));
     for (const std::string& text : {notices[0].plainText, notices[0].markupText}) {
         EXPECT_THAT(text,
@@ -44,12 +44,12 @@ TEST_F(DriverNotice, IsGivenInTwoFormsOnceInTheProcess) {
     EXPECT_THAT(notices[0].markupText,
                 HasSubstr("<a href=\"https://docs.kernel.org/driver-api/ipmi.html\">"));
     Collect({});
-    EXPECT_THAT(tqrhost::TakeNotices(), IsEmpty()) << "again";
+    EXPECT_THAT(NQORTQR20::TakeNotices(), IsEmpty()) << "again";
     ipmisel::ResetModuleState();
     IPMISELPluginInit(context.get());
     facts.ipmiDriver = true;
     Collect({});
-    EXPECT_THAT(tqrhost::TakeNotices(), IsEmpty()) << "with a driver";
+    EXPECT_THAT(NQORTQR20::TakeNotices(), IsEmpty()) << "with a driver";
 }
 
 TEST_F(DriverNotice, HasNoLinksWhereNobodyCanFollowThem) {

@@ -110,7 +110,7 @@ TEST_F(FruSection, MachinesWithoutLocatedDevicesHaveAList) {
 
 TEST_F(FruSection, DeviceZeroNeedsAPass) {
     OpenMachine();
-    const tqrhost::OutputHandle output(written);
+    const NQORTQR20::OutputHandle output(written);
     IPMIRequestFRULocator request(NQORTQR20::SPLibrary::GetSplibraryInstance(0));
     EXPECT_EQ(IPMISELGetDataZero(context.get(), output.get(), &request).code, 3);
     EXPECT_EQ(requests.size(), 16U) << "read first";

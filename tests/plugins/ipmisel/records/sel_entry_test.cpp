@@ -219,7 +219,7 @@ TEST(Source, TellsSoftwareFromAddresses) {
     const ipmiseltest::TextFolder folder(
         "535=BIOS. \r\n536=SMI. \n537=System. \n538=OEM. \n539=Remote. \n540=Terminal. \n"
         "541=Reserved. \n543=LUN %d. \n544=Channel %d.\n");
-    const tqrhost::PluginContext context(folder.path());
+    const NQORTQR20::PluginContext context(folder.path());
     const std::tuple<int, const char*> software[] = {
         {0x00, "BIOS. "},     {0x0F, "BIOS. "},    {0x10, "SMI. "},    {0x20, "System. "},
         {0x3F, "OEM. "},      {0x40, "Remote. "},  {0x46, "Remote. "}, {0x47, "Terminal. "},
@@ -235,7 +235,7 @@ TEST(Source, TellsSoftwareFromAddresses) {
 TEST(Source, LeavesOutTextsThatAreNotThereAndCutsLongOnes) {
     const ipmiseltest::TextFolder folder("543=" + std::string(110, 'L') +
                                          "\n544=" + std::string(50, 'C') + "%d\n");
-    const tqrhost::PluginContext context(folder.path());
+    const NQORTQR20::PluginContext context(folder.path());
     const ipmiseltest::LogRecorder log;
     EXPECT_EQ(SourceText(context.get(), 0x41, 0x30), std::string(50, 'C') + "3");
     EXPECT_THAT(log.Lines(0),

@@ -27,7 +27,7 @@ unsigned gSends;
 namespace NQORTQR20 {
 
 struct SPLibrary::Impl {};
-SPLibrary::SPLibrary(std::unique_ptr<tqrhost::Transport>, bool) {}
+SPLibrary::SPLibrary(std::unique_ptr<NQORTQR20::Transport>, bool) {}
 SPLibrary::~SPLibrary() = default;
 bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSize, bool) {
     std::fill_n(buffer, bufferSize, static_cast<unsigned char>(0x51));

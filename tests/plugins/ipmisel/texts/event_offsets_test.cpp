@@ -164,7 +164,7 @@ TEST_F(SensorOffset, SeverityAndPreviousState) {
 TEST(EventOffsets, FailedFetchLeavesItsPieceOut) {
     const ipmiseltest::LogRecorder log;
     const ipmiseltest::TextFolder folder("526=was \n");
-    const tqrhost::PluginContext context(folder.path());
+    const NQORTQR20::PluginContext context(folder.path());
     const auto sensor = [&](std::uint8_t type, std::uint8_t data1, std::uint8_t data2) {
         return ipmisel::SensorOffsetText(context.get(), type, {data1, data2, 0}, 0x6F);
     };

@@ -38,7 +38,7 @@ protected:
     LogRecorder log;
     IPMIMapping mapping;
     TextFolder folder{MarkerTexts()};
-    tqrhost::PluginContext context{folder.path()};
+    NQORTQR20::PluginContext context{folder.path()};
 
     std::string Sensor(int sensorType, int data1, int data2 = 0, int data3 = 0) {
         char out[kRoom] = {};

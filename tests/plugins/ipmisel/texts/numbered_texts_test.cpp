@@ -46,7 +46,7 @@ TEST(NumberedTexts, LookupRules) {
 
 TEST(NumberedTexts, EveryNumberFindsItsOwnLine) {
     IPMIMapping mapping;
-    const tqrhost::PluginContext context(IPMISEL_TEXTS);
+    const NQORTQR20::PluginContext context(IPMISEL_TEXTS);
     std::ifstream file(IPMISEL_TEXTS "/ipmisel.INI");
     int previous = -1;
     for (std::string line; std::getline(file, line);) {
@@ -77,7 +77,7 @@ TEST(NumberedTexts, NoneThatIsAskedForIsMissing) {
     const ipmiseltest::LogRecorder log;
     const ipmiseltest::Machine machine("SIM-1");
     IPMIMapping mapping;
-    const tqrhost::PluginContext context(IPMISEL_TEXTS);
+    const NQORTQR20::PluginContext context(IPMISEL_TEXTS);
     char out[256];
     const auto decode = [&](int type, int data1, int data2, int data3) {
         out[0] = '\0';
@@ -123,7 +123,7 @@ TEST(GetString, LogsWhyThereIsNoTextAndLeavesTheBufferEmpty) {
 
     const ipmiseltest::TemporaryFolder folder;
     const auto file = folder.path() / "ipmisel.INI";
-    const tqrhost::PluginContext context(folder.path());
+    const NQORTQR20::PluginContext context(folder.path());
     EXPECT_NE(mapping.GetString(context.get(), 7, out, sizeof out), 0);
     std::filesystem::create_directory(file);  // no file, though it can be opened
     EXPECT_NE(mapping.GetString(context.get(), 8, out, sizeof out), 0);
@@ -132,7 +132,7 @@ TEST(GetString, LogsWhyThereIsNoTextAndLeavesTheBufferEmpty) {
                                           could + ". Did not obtain string #8\n"));
 
     const TextFolder texts("1=a\n");
-    const tqrhost::PluginContext other(texts.path());
+    const NQORTQR20::PluginContext other(texts.path());
     EXPECT_NE(mapping.GetString(other.get(), 7, out, sizeof out), 0);
     EXPECT_EQ(log.Lines(0).back(), "Could not find data_number 7");
     EXPECT_EQ(log.Lines(3).back(),
@@ -144,7 +144,7 @@ TEST(GetString, ReadsTheFileAnewAndKeepsNoDescriptor) {
         return std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {});
     };
     const TextFolder folder("1=before\n");
-    const tqrhost::PluginContext context(folder.path());
+    const NQORTQR20::PluginContext context(folder.path());
     IPMIMapping mapping;
     char out[16];
     const auto open = descriptors();

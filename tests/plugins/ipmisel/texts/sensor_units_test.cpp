@@ -56,7 +56,7 @@ TEST_F(SensorUnits, WithinTheBufferAndCutToTheRoomOfAReading) {
         EXPECT_EQ(std::string(out.data()), std::string("64.00 <731>").substr(0, room - 1));
     }
     const ipmiseltest::TextFolder wordy("7=\n731=" + std::string(80, 'u') + "\n100=low\n");
-    const tqrhost::PluginContext other(wordy.path());
+    const NQORTQR20::PluginContext other(wordy.path());
     const s_SDR_Mod_Units pair{1, 0x02, 1, 1, 0, 2, 0, 0, 0};
     char out[256] = {};
     mapping.GetThresholdOffset(other.get(), 0x40, 0x20, 0, out, sizeof out, &pair);
