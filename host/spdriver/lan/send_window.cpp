@@ -10,7 +10,7 @@ void SendWindow::Answered(Delay delay, std::uint64_t sent, std::uint64_t lastSen
     ++unbroken_;
     if (delay == Delay::kCongested && size_ > 1) {
         if (sent > reducedAt_) Reduce(size_ / 2, lastSent);
-        if (size_ == 1) Hold(4);
+        if (size_ == 1) Hold(8);
         return;
     }
     if (held_ > 0) --held_;

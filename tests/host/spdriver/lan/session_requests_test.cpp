@@ -99,7 +99,10 @@ private:
         codec_.ParseRakp2(ask(codec_.Rakp1(2)), 2);
         codec_.ParseRakp4(ask(codec_.Rakp3(3)), 3);
     }
-    bool IsLost() { return character_.isLost && character_.isLost(number_++, now); }
+    bool IsLost() {
+        ++number_;
+        return character_.isLost && character_.isLost(number_ - 1, now);
+    }
     void Take(const rmcpplus::Packet& packet) {
         ++packets;
         if (IsLost()) return;
@@ -190,7 +193,6 @@ TEST(SessionRequests, WhateverABmcOrALineDoesItIsNotSlowerThanOneAtATime) {
         const char* what;
         Line::Character character;
         unsigned outside = 0;
-        double slower = 1.1;
     } cases[] = {
         {"takes 1", {.mostOutstanding = 1}},
         {"takes 1, slowly", {.service = milliseconds(5), .mostOutstanding = 1}},
@@ -198,9 +200,7 @@ TEST(SessionRequests, WhateverABmcOrALineDoesItIsNotSlowerThanOneAtATime) {
         {"takes 4", {.service = milliseconds(5), .mostOutstanding = 4}},
         {"takes 8", {.service = milliseconds(5), .mostOutstanding = 8}},
         {"slower together",
-         {.service = milliseconds(200), .oneAtATime = true, .slowerTogether = true},
-         0,
-         1.15},
+         {.service = milliseconds(200), .oneAtATime = true, .slowerTogether = true}},
         {"window of 8", {.sequenceWindow = 8, .isLost = Lost(0.02)}, 50},
         {"window of 16", {.sequenceWindow = 16, .isLost = Lost(0.02)}},
         {"2 % lost", {.isLost = Lost(0.02)}},
@@ -209,8 +209,8 @@ TEST(SessionRequests, WhateverABmcOrALineDoesItIsNotSlowerThanOneAtATime) {
          {.extra = [random = std::mt19937(1)](
                        unsigned) mutable { return milliseconds(random() % 32); }}},
         {"round trips that jump",
-         {.roundTrip = milliseconds(1),
-          .extra = [](unsigned number) { return milliseconds(number / 100 % 2 == 0 ? 0 : 199); }}},
+         {.roundTrip = milliseconds(2),
+          .extra = [](unsigned number) { return milliseconds(number / 100 % 2 == 0 ? 0 : 198); }}},
     };
     for (const auto& c : cases) {
         constexpr seconds kLong(6000);  // that nothing fails is the question here
@@ -218,7 +218,7 @@ TEST(SessionRequests, WhateverABmcOrALineDoesItIsNotSlowerThanOneAtATime) {
         const LogRead one = ReadLog(c.character, 1, kLong);
         EXPECT_EQ(adaptive.right, kRecords) << c.what;
         EXPECT_EQ(one.right, kRecords) << c.what;
-        EXPECT_LE(adaptive.seconds, c.slower * one.seconds) << c.what;
+        EXPECT_LE(adaptive.seconds, 1.1 * one.seconds) << c.what;
         EXPECT_LE(adaptive.outside, c.outside) << c.what;
         const LogRead wide = ReadLog(c.character, 15, kLong);
         EXPECT_EQ(wide.right, kRecords) << c.what;
