@@ -111,7 +111,7 @@ constexpr std::array<std::string_view, 13> kSlotTypes{
     "external peripheral connector",
     "docking connector",
     "internal expansion slot",
-    "entity's slot",
+    "slot of the sensor's entity",
     "AdvancedTCA slot",
     "memory slot",
     "fan slot",
@@ -356,8 +356,10 @@ private:
         }
         std::string words(out_.slotType ? At(kSlotTypes, *out_.slotType) : std::string_view());
         if (out_.slotNumber) {
+            const std::string number = ' ' + std::to_string(*out_.slotNumber);
             if (words.empty()) words = "slot";
-            words += ' ' + std::to_string(*out_.slotNumber);
+            words = out_.slotType == kEntitySlot ? "slot" + number + " of the sensor's entity"
+                                                 : words + number;
         }
         Say(words);
     }

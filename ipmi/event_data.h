@@ -21,7 +21,11 @@ DataUse UseOfData2(const SelRecord& record);
 DataUse UseOfData3(const SelRecord& record);
 
 /// Slot types of sensor type 21h that code asks for by name.
+constexpr std::uint8_t kPciSlot = 0;
+constexpr std::uint8_t kExpansionSlot = 4;
+constexpr std::uint8_t kEntitySlot = 5;  ///< its number is an instance of the sensor's entity
 constexpr std::uint8_t kMemorySlot = 7;
+constexpr std::uint8_t kPciExpressSlot = 9;
 
 /// Event data 2 and 3 of a sensor event by what the standard says they mean. What is unspecified
 /// there (FFh where the standard has it so) is left out.

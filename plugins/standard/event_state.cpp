@@ -22,22 +22,28 @@ SensorAndTypes KeyOf(const Event& event) {
 }
 
 // The place where a part is put: an entity of the node, or of one controller where it is relative
-// to that; else the sensor itself.
+// to that; else what one sensor watches.
 struct Place {
     ipmi::Entity entity;
     ipmi::SensorKey sensor;
     auto operator<=>(const Place&) const = default;
 };
 
-Place PlaceOf(const Event& event) {
+Place PlaceOfSensor(const Event& event) { return {.entity = {}, .sensor = event.sensorKey()}; }
+
+std::optional<Place> PlaceOfEntity(const Event& event) {
     const SensorFacts* const facts = event.agreeingSensor();
-    if (facts == nullptr || !ipmi::IsPhysicalEntity(facts->sensor.entity.id)) {
-        return {.entity = {}, .sensor = event.sensorKey()};
-    }
+    if (facts == nullptr || !ipmi::IsPhysicalEntity(facts->sensor.entity.id)) return std::nullopt;
     const ipmi::Entity& entity = facts->sensor.entity;
     Place place{.entity = entity, .sensor = {}};
     if (entity.IsDeviceRelative()) place.sensor.owner = event.sensorKey().owner;
     return place;
+}
+
+// What a record of presence says is there or not.
+Place PlaceOfPresence(const Event& event) {
+    const std::optional<Place> entity = PlaceOfEntity(event);
+    return entity && TellsOfItsEntity(event.sensor->sensor) ? *entity : PlaceOfSensor(event);
 }
 
 template <typename T>
@@ -103,7 +109,8 @@ private:
             if (event.isSensorEvent()) {
                 const ipmi::SelRecord& record = event.record;
                 openOf_[KeyOf(event)][{record.offset(), record.deassertion}].push_back(i);
-                openAt_[PlaceOf(event)].push_back(i);
+                openAt_[PlaceOfSensor(event)].push_back(i);
+                if (const auto entity = PlaceOfEntity(event)) openAt_[*entity].push_back(i);
             }
         }
     }
@@ -139,7 +146,7 @@ private:
     void PartReplaced(std::size_t now) {
         const auto presence = PresenceToldBy(events_[now]);
         if (!presence) return;
-        const Place place = PlaceOf(events_[now]);
+        const Place place = PlaceOfPresence(events_[now]);
         if (*presence == ipmi::Presence::kAbsent) {
             goneAt_[place] = now;
             return;

@@ -176,7 +176,8 @@ std::string SubjectText(const Event& event) {
     std::string sensor = SensorText(event);
     const bool isNamed = event.sensor != nullptr && !event.sensor->sensor.name.empty();
     if (part.empty()) return sensor;
-    return isNamed && part != sensor ? part + ", " + sensor : part;
+    if (!isNamed || part == sensor) return part;
+    return event.part.parts.size() > 1 ? sensor + " (" + part + ')' : part + ", " + sensor;
 }
 
 }  // namespace standard

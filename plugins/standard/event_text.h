@@ -37,7 +37,7 @@ std::string PartText(const PartEvidence& evidence);
 /// no sensor event.
 std::string SensorText(const Event& event);
 /// Part and sensor, which stand before what happened; a name that both have once, a sensor without
-/// a name only where there is no part.
+/// a name only where there is no part: "PS 2, PS 2 Status", "Inlet Temp (one of Riser 1, Riser 2)".
 std::string SubjectText(const Event& event);
 
 }  // namespace standard

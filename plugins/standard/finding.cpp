@@ -7,6 +7,8 @@
 #include <utility>
 
 #include "base/text.h"
+#include "ipmi/entities.h"
+#include "ipmi/event_data.h"
 #include "ipmi/event_types.h"
 #include "ipmi/sensor_types.h"
 #include "ipmi/units.h"
@@ -21,6 +23,7 @@ namespace {
 constexpr std::int64_t kBurstGap = 300;
 constexpr std::int64_t kRecent = std::int64_t{7} * 24 * 3600;
 constexpr std::size_t kRecentRecords = 64;
+constexpr std::size_t kMaxKinds = 4;  // of events that are summed up among the evidence
 
 bool IsOf(const Event& event, std::uint8_t sensorType, std::uint16_t offsets) {
     const ipmi::SelRecord& record = event.record;
@@ -42,6 +45,7 @@ bool IsSystemStop(const Event& event) {
            IsOf(event, ipmi::sensor_type::kWatchdog2, kAnyOffset) ||
            IsOf(event, ipmi::sensor_type::kBootError, kAnyOffset);
 }
+bool IsOfSlot(const Event& event) { return IsOf(event, ipmi::sensor_type::kSlot, kAnyOffset); }
 bool IsPcieError(const Event& event) { return ipmi::ParsePcieError(event.record).has_value(); }
 bool IsAny(const Event&) { return true; }
 
@@ -50,6 +54,7 @@ enum class Scope : std::uint8_t {
     kModule,        ///< of one memory module, whichever sensor told of it
     kBurst,         ///< of one burst
     kDevice,        ///< of one PCI Express device
+    kSlot,          ///< of one expansion slot, whichever sensor told of it
     kSensorOffset,  ///< of one offset of a sensor
     kSensor,        ///< of one sensor
 };
@@ -63,6 +68,7 @@ constexpr std::array kRules = std::to_array<Rule>({
     {IsOfMemory, Scope::kModule},
     {IsSystemStop, Scope::kBurst},
     {IsPcieError, Scope::kDevice},
+    {IsOfSlot, Scope::kSlot},
     {IsThermalTrip, Scope::kSensorOffset},
     {IsAny, Scope::kSensor},
 });
@@ -80,8 +86,55 @@ std::string ModuleId(const Event& event) {
     return SensorId(event);
 }
 
+// The numbers of the expansion slots that a machine's slot sensors watch, by their names: "Slot 2".
+// A number that several have, and one of a drive bay or of a connector, is none.
+class ExpansionSlots {
+public:
+    explicit ExpansionSlots(const NodeFacts& node) {
+        std::map<unsigned, unsigned> count;
+        for (const SensorFacts& facts : node.sensors) {
+            if (const auto number = NumberIn(facts.sensor)) ++count[*number];
+        }
+        for (const SensorFacts& facts : node.sensors) {
+            const auto number = NumberIn(facts.sensor);
+            if (number && count[*number] == 1) numbers_.emplace(facts.sensor.key, *number);
+        }
+    }
+    std::optional<unsigned> NumberOf(const ipmi::SensorKey& key) const {
+        const auto found = numbers_.find(key);
+        return found == numbers_.end() ? std::nullopt : std::optional(found->second);
+    }
+    // By the event's own data, else by its sensor.
+    std::optional<unsigned> NumberOf(const Event& event) const {
+        constexpr auto kTypes = std::to_array<std::uint8_t>(
+            {ipmi::kPciSlot, ipmi::kExpansionSlot, ipmi::kPciExpressSlot});
+        const ipmi::EventData& data = event.data;
+        if (!data.slotType && !data.slotNumber) {
+            return event.agreeingSensor() ? NumberOf(event.sensorKey()) : std::nullopt;
+        }
+        const bool isExpansion =
+            data.slotType && std::ranges::find(kTypes, *data.slotType) != kTypes.end();
+        return isExpansion ? data.slotNumber : std::nullopt;
+    }
+
+private:
+    static std::optional<unsigned> NumberIn(const ipmi::Sensor& sensor) {
+        constexpr auto kEntities = std::to_array<std::uint8_t>(
+            {ipmi::entity::kSystemBoard, 0x0B /* add-in card */,
+             0x10 /* internal expansion board */, 0x30 /* PCI bus */, 0x31 /* PCI Express bus */});
+        const bool isSlot = sensor.sensorType == ipmi::sensor_type::kSlot &&
+                            sensor.eventType == ipmi::kSensorSpecificEvents &&
+                            std::ranges::find(kEntities, sensor.entity.id) != kEntities.end();
+        return isSlot ? NumberAtEnd(sensor.name) : std::nullopt;
+    }
+
+    std::map<ipmi::SensorKey, unsigned> numbers_;
+};
+
+std::string SlotId(unsigned number) { return "slot " + std::to_string(number); }
+
 // What the finding of an event is called among those of the node.
-std::string GroupOf(const Event& event, std::size_t burst) {
+std::string GroupOf(const Event& event, std::size_t burst, const ExpansionSlots& slots) {
     const auto* const rule = std::ranges::find_if(
         kRules, [&event](const Rule& candidate) { return candidate.applies(event); });
     const std::string prefix = std::to_string(rule - kRules.begin()) + ' ';
@@ -94,6 +147,10 @@ std::string GroupOf(const Event& event, std::size_t burst) {
             const ipmi::PcieError error = ipmi::ParsePcieError(event.record).value();
             return prefix + ipmisel::Format("%x:%x:%x.%x", error.segment, error.bus, error.device,
                                             error.function);
+        }
+        case Scope::kSlot: {
+            const auto number = slots.NumberOf(event);
+            return prefix + (number ? SlotId(*number) : SensorId(event));
         }
         case Scope::kSensorOffset:
             return prefix + SensorId(event) + ' ' + std::to_string(event.record.offset());
@@ -128,12 +185,47 @@ std::string EvidenceText(const Event& event) {
     return event.time ? TimeText(*event.time) + ": " + event.sentence : event.sentence;
 }
 
-std::string TitleOf(const Event& worst, std::size_t count) {
-    std::string title = SubjectText(worst);
-    if (!title.empty()) title += ": ";
-    title += worst.text;
-    if (count > 1) title += " (" + std::to_string(count) + " events)";
-    return title;
+// What stands behind a title for the events that are not shown in it: those that say the same, and
+// the others.
+std::string CountText(std::size_t times, std::size_t others) {
+    std::string text = times > 1 ? std::to_string(times) + " times" : "";
+    if (others > 0) {
+        text += (text.empty() ? "and " : ", and ") + std::to_string(others) + " other event" +
+                (others == 1 ? "" : "s");
+    }
+    return text.empty() ? text : " (" + text + ')';
+}
+
+std::string TitleOf(const Event& worst) {
+    const std::string subject = SubjectText(worst);
+    return subject.empty() ? worst.text : subject + ": " + worst.text;
+}
+
+// The events of a finding that are not shown one by one, summed up by what they say.
+std::vector<std::string> OthersText(std::span<const Event> events,
+                                    std::span<const std::size_t> finding,
+                                    const std::set<std::size_t>& shown) {
+    std::vector<std::pair<std::string, std::size_t>> kinds;  // in the order of the log
+    std::size_t rest = finding.size() - shown.size();
+    for (const std::size_t i : finding) {
+        if (shown.contains(i)) continue;
+        const std::string& text = events[i].text;
+        const auto kind = std::ranges::find(kinds, text, &decltype(kinds)::value_type::first);
+        if (kind != kinds.end()) {
+            ++kind->second;
+        } else if (kinds.size() < kMaxKinds) {
+            kinds.emplace_back(text, 1);
+        }
+    }
+    std::vector<std::string> lines;
+    for (const auto& [text, count] : kinds) {
+        lines.push_back(std::to_string(count) + " more: " + text);
+        rest -= count;
+    }
+    if (rest > 0) {
+        lines.push_back(std::to_string(rest) + " more event" + (rest == 1 ? "" : "s"));
+    }
+    return lines;
 }
 
 // "CPU1 Temp reads 96 degrees C now".
@@ -167,14 +259,14 @@ Finding FindingOf(std::span<const Event> events, std::vector<std::size_t> indice
     finding.severity = *event.severity;
     finding.isOpen = event.state == EventState::kOpen;
     finding.part = event.part;
-    finding.title = TitleOf(event, finding.events.size());
+    const auto same = static_cast<std::size_t>(std::ranges::count_if(
+        finding.events, [&](std::size_t i) { return events[i].text == event.text; }));
+    finding.title = TitleOf(event) + CountText(same, finding.events.size() - same);
 
     const std::set<std::size_t> shown{finding.events.front(), worst, finding.events.back()};
     for (const std::size_t i : shown) finding.evidence.push_back(EvidenceText(events[i]));
-    const std::size_t others = finding.events.size() - shown.size();
-    if (others > 0) {
-        finding.evidence.push_back(std::to_string(others) + " more event" +
-                                   (others == 1 ? "" : "s"));
+    for (std::string& line : OthersText(events, finding.events, shown)) {
+        finding.evidence.push_back(std::move(line));
     }
     for (const std::size_t i : finding.events) {
         if (events[i].stillPresent) finding.stillPresent = events[i].stillPresent;
@@ -254,7 +346,7 @@ std::optional<Finding> FindingOfSensor(const NodeFacts& node, const SensorFacts&
     Finding finding;
     finding.severity = *worst->severity;
     finding.part = worst->part;
-    finding.title = TitleOf(*worst, 1);
+    finding.title = TitleOf(*worst);
     finding.evidence.push_back("now: " + worst->sentence);
     finding.evidence.emplace_back("no event of it in the log");
     AddOrigin(*worst, &finding);
@@ -289,9 +381,10 @@ std::vector<Finding> DeriveFindings(const NodeFacts& node, std::span<const Event
                                     const DerivationTools& tools) {
     const std::vector<std::size_t> bursts = BurstsOf(events);
     const Recency recency(events);
+    const ExpansionSlots slots(node);
     std::map<std::string, std::vector<std::size_t>> groups;
     std::map<std::size_t, std::size_t> causeOf;  // by burst
-    std::set<ipmi::SensorKey> told;
+    std::set<ipmi::SensorKey> toldBy;
     for (std::size_t i = 0; i < events.size(); ++i) {
         const Event& event = events[i];
         if (IsLogCleared(event)) {
@@ -306,21 +399,37 @@ std::vector<Finding> DeriveFindings(const NodeFacts& node, std::span<const Event
         if (!isOpen && !(event.state == EventState::kMomentary && recency.IsRecent(event, i))) {
             continue;
         }
-        groups[(isOpen ? "open " : "momentary ") + GroupOf(event, bursts[i])].push_back(i);
-        if (isOpen && event.sensor != nullptr) told.insert(event.sensorKey());
+        groups[(isOpen ? "open " : "momentary ") + GroupOf(event, bursts[i], slots)].push_back(i);
+        if (isOpen && event.agreeingSensor() != nullptr) toldBy.insert(event.sensorKey());
     }
 
     std::vector<Finding> findings;
+    std::map<unsigned, std::size_t> openSlots;  // findings of expansion slots, by their number
     for (auto& [name, indices] : groups) {
+        const Event& first = events[indices.front()];
+        if (const auto number = slots.NumberOf(first);
+            number && IsOfSlot(first) && first.state == EventState::kOpen) {
+            openSlots.emplace(*number, findings.size());
+        }
         Finding& finding =
             findings.emplace_back(FindingOf(events, std::move(indices), tools.convert));
         finding.firstCause = causeOf.at(bursts[finding.events.front()]);
     }
     for (const SensorFacts& facts : node.sensors) {
-        if (told.contains(facts.sensor.key)) continue;
-        if (auto finding = FindingOfSensor(node, facts, tools)) {
+        if (toldBy.contains(facts.sensor.key)) continue;
+        auto finding = FindingOfSensor(node, facts, tools);
+        if (!finding) continue;
+        const auto number = slots.NumberOf(facts.sensor.key);
+        const auto known = number ? openSlots.find(*number) : openSlots.end();
+        if (known == openSlots.end()) {
             findings.push_back(std::move(*finding));
+            continue;
         }
+        // The firmware told of the slot, and its sensor says so too.
+        Finding& told = findings[known->second];
+        told.severity = std::max(told.severity, finding->severity);
+        told.evidence.push_back(std::move(finding->evidence.front()));
+        told.stillPresent = true;
     }
     std::ranges::stable_sort(findings, [&events](const Finding& a, const Finding& b) {
         const auto place = [&events](const Finding& finding) {

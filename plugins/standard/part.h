@@ -1,6 +1,8 @@
 #pragma once
 
+#include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "ipmi/sdr_record.h"
@@ -22,6 +24,9 @@ struct Part {
 /// 7".
 std::string CandidateText(const Part& part);
 
+/// The number that a label ends in: 4 of "DIMM_A04"; none of more than four digits.
+std::optional<unsigned> NumberAtEnd(std::string_view label);
+
 /// What the evidence says of the part that an event is about: nothing, one part, or several of
 /// which it is one.
 struct PartEvidence {
@@ -30,6 +35,11 @@ struct PartEvidence {
 
     bool operator==(const PartEvidence&) const = default;
 };
+
+/// Whether the presence that a sensor tells of is that of its entity itself: by the sensor's type,
+/// or since the entity is one that is put in and taken out. A slot on a system board is neither:
+/// the board does not go with the card.
+bool TellsOfItsEntity(const ipmi::Sensor& sensor);
 
 class PartLookup {
 public:

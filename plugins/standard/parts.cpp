@@ -58,17 +58,6 @@ EntityKey KeyOf(const ipmi::Sensor& sensor) {
     return {sensor.entity, sensor.key.owner, sensor.channel};
 }
 
-/// The number that a label ends in: 4 of "DIMM_A04".
-std::optional<unsigned> NumberAtEnd(std::string_view label) {
-    constexpr std::size_t kMaxDigits = 4;
-    const std::size_t last = label.find_last_not_of("0123456789");
-    const std::string_view digits = last == label.npos ? label : label.substr(last + 1);
-    if (digits.empty() || digits.size() > kMaxDigits) return std::nullopt;
-    unsigned number = 0;
-    for (const char digit : digits) number = number * 10 + static_cast<unsigned>(digit - '0');
-    return number;
-}
-
 /// Those of a list that carry the number in their label.
 template <typename T, typename Label>
 std::vector<const T*> Labelled(const std::vector<T>& list, unsigned number, Label label) {
@@ -151,8 +140,9 @@ bool MayBeOfOnePart(const ipmi::SelRecord& one, const ipmi::SelRecord& other) {
 bool IsOfModule(const Event& event, unsigned number) {
     if (event.data.memoryModule) return *event.data.memoryModule == number;
     if (event.data.slotType == ipmi::kMemorySlot) return event.data.slotNumber == number;
-    return event.sensor != nullptr && IsMemory(event.sensor->sensor.entity.id) &&
-           event.sensor->sensor.entity.instance == number;
+    const SensorFacts* const facts = event.agreeingSensor();
+    return facts != nullptr && IsMemory(facts->sensor.entity.id) &&
+           facts->sensor.entity.instance == number;
 }
 
 bool MadeAfter(const std::optional<std::int64_t>& made, const ipmi::SelRecord& record) {
@@ -311,14 +301,15 @@ Parts::Found Parts::ByMemoryModule(unsigned number) const {
 
 std::optional<Parts::Found> Parts::BySlot(unsigned type, unsigned number,
                                           const ipmi::Sensor* sensor) const {
-    enum : unsigned { kPci = 0, kInternalExpansion = 4, kOfEntity = 5, kPciExpress = 9 };
     if (type == ipmi::kMemorySlot) return ByMemoryModule(number);
-    if (type == kOfEntity && sensor != nullptr && number < 0x80) {
+    if (type == ipmi::kEntitySlot && sensor != nullptr && number < 0x80) {
         ipmi::Entity entity = sensor->entity;
         entity.instance = static_cast<std::uint8_t>(number);
         return ByEntity({entity, sensor->key.owner, sensor->channel}, false);
     }
-    if (type != kPci && type != kInternalExpansion && type != kPciExpress) return std::nullopt;
+    if (type != ipmi::kPciSlot && type != ipmi::kExpansionSlot && type != ipmi::kPciExpressSlot) {
+        return std::nullopt;
+    }
     auto slots = Labelled(facts_.smbios.slots, number,
                           [](const ipmi::SmbiosSlot& slot) { return slot.designation; });
     if (slots.size() != 1) {
@@ -353,8 +344,8 @@ std::optional<Parts::Found> Parts::ByEventData(const Event& event) const {
     }
     if (data.memoryModule) return ByMemoryModule(*data.memoryModule);
     if (data.slotType && data.slotNumber) {
-        const ipmi::Sensor* const sensor =
-            event.sensor == nullptr ? nullptr : &event.sensor->sensor;
+        const SensorFacts* const facts = event.agreeingSensor();
+        const ipmi::Sensor* const sensor = facts == nullptr ? nullptr : &facts->sensor;
         if (auto found = BySlot(*data.slotType, *data.slotNumber, sensor)) return found;
     }
     if (data.processorInstance) {
@@ -401,11 +392,12 @@ bool Parts::Removes(const ipmi::SelRecord& record, const Event& event,
         return MayBeOfOnePart(record, event.record);
     }
     if (candidate.memoryModule && IsOfModule(removal, *candidate.memoryModule)) return true;
-    if (removal.sensor == nullptr) return false;
-    const ipmi::Sensor& sensor = removal.sensor->sensor;
+    const SensorFacts* const facts = removal.agreeingSensor();
+    if (facts == nullptr) return false;
+    const ipmi::Sensor& sensor = facts->sensor;
     if (!sensor.name.empty() && sensor.name == candidate.part.name) return true;
     const auto& entities = candidate.entities;
-    return ipmi::IsPhysicalEntity(sensor.entity.id) &&
+    return ipmi::IsPhysicalEntity(sensor.entity.id) && TellsOfItsEntity(sensor) &&
            std::find(entities.begin(), entities.end(), KeyOf(sensor)) != entities.end();
 }
 
@@ -421,9 +413,8 @@ PartEvidence Parts::OfEvent(const Event& event) const {
     Found found;
     if (auto byData = ByEventData(event)) {
         found = *std::move(byData);
-    } else if (event.sensor != nullptr) {
-        const ipmi::Sensor& sensor = event.sensor->sensor;
-        found = ByEntity(KeyOf(sensor), sensor.entityIsLogical);
+    } else if (const SensorFacts* const facts = event.agreeingSensor()) {
+        found = ByEntity(KeyOf(facts->sensor), facts->sensor.entityIsLogical);
     }
     PartEvidence evidence;
     for (Candidate& candidate : found.candidates) {

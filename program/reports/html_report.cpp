@@ -193,7 +193,7 @@ private:
         return std::min(index, systems_.All().size() - 1);
     }
     std::string NameOf(std::size_t index) const {
-        const std::string& name = systems_.All()[index].name;
+        std::string name = systems_.LabelOf(static_cast<std::int64_t>(index + 1));
         return name.empty() ? Format("node %zu", index + 1) : name;
     }
 

@@ -26,6 +26,13 @@ const SystemInfo& Systems::Of(Integer node) const {
     return index < systems_.size() ? systems_[index] : kNone;
 }
 
+std::string Systems::LabelOf(Integer node) const {
+    if (systems_.size() < 2) return {};
+    const std::string& name = Of(node).name;
+    const bool isUnique = std::ranges::count(systems_, name, &SystemInfo::name) == 1;
+    return isUnique || !node ? name : "node " + std::to_string(*node);
+}
+
 Json Systems::AsJson() const {
     Json list = Json::array();
     for (const SystemInfo& system : std::span(systems_).first(known_)) {

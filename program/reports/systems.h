@@ -20,6 +20,9 @@ public:
     /// By node, from 1. A system of no known node has no name.
     const SystemInfo& Of(Integer node) const;
     const std::vector<SystemInfo>& All() const { return systems_; }
+    /// What tells a node from the others: its name, "node 2" where another has the same name; empty
+    /// when there is only one.
+    std::string LabelOf(Integer node) const;
     /// `systems` of a report.
     Json AsJson() const;
 

@@ -198,9 +198,9 @@ private:
                 Fit(f.severity ? InfoOf(*f.severity).shortName : "-", sizeof "critical" + 1);
             const std::string indent(label.size(), ' ');
             std::string lead = Painted(label, f.severity, look_);
-            const std::string node = systems_.All().size() > 1 ? systems_.Of(f.node).name : "";
             for (const std::string& line :
-                 Wrap(TerminalText(Listed({node, f.title}, ": ")), look_.width - indent.size())) {
+                 Wrap(TerminalText(Listed({systems_.LabelOf(f.node), f.title}, ": ")),
+                      look_.width - indent.size())) {
                 PrintLine(lead + line);
                 lead = indent;
             }

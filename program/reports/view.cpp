@@ -1,5 +1,6 @@
 #include "program/reports/view.h"
 
+#include <algorithm>
 #include <charconv>
 #include <chrono>
 #include <type_traits>
@@ -298,7 +299,12 @@ bool MachineState::Add(const Instance& instance) {
     } else if (instance.className == kFruClass) {
         frus.push_back(FruOf(instance));
     } else if (instance.className == kFindingClass) {
-        findings.push_back(FindingOf(instance));
+        // Each node has its own worst first.
+        Finding finding = FindingOf(instance);
+        const auto place = std::upper_bound(
+            findings.begin(), findings.end(), finding,
+            [](const Finding& a, const Finding& b) { return a.severity > b.severity; });
+        findings.insert(place, std::move(finding));
     } else {
         return false;
     }

@@ -97,6 +97,18 @@ TEST(EventState, APartThatCameByAnotherSensorOfItsPlaceIsAbsentNoLonger) {
     EXPECT_THAT(States(log), ElementsAre("resolved by 1", "-"));
 }
 
+TEST(EventState, ACardTakenOutOfABoardsSlotResolvesNothingOfTheBoard) {
+    LogBuilder log;
+    const ipmi::Entity board{.id = 0x07, .instance = 1};
+    log.Sensor(0x0C, 0x21, 0x6F, "Slot 2", board);
+    log.Sensor(0x31, 0x02, 0x07, "12V", board);
+    log.Event(0x02, 0x31, 0x07, Offset(2))
+        .Event(0x21, 0x0C, kAsserted, Offset(0))
+        .Event(0x21, 0x0C, kDeasserted, Offset(2))
+        .Event(0x21, 0x0C, kAsserted, Offset(2));
+    EXPECT_THAT(States(log), ElementsAre("open", "resolved by 3", "resolved by 3", "-"));
+}
+
 TEST(EventState, AClearedLogResolvesEverythingBefore) {
     LogBuilder log;
     log.Event(kPowerSupply, 0x71, kAsserted, Offset(1))

@@ -99,6 +99,10 @@ TEST(EventText, NamesASensorWithoutANameOnlyWhereThereIsNoPart) {
     EXPECT_EQ(SubjectText(event), "DIMM 4");
     event.part.parts.push_back({.name = "DIMM 5", .partNumber = {}, .serialNumber = {}});
     EXPECT_EQ(SubjectText(event), "one of DIMM 4, DIMM 5");
+    SensorFacts named;
+    named.sensor.name = "Mem";
+    event.sensor = &named;
+    EXPECT_EQ(SubjectText(event), "Mem (one of DIMM 4, DIMM 5)");
 }
 
 TEST(EventText, TakesASensorByOwnerLunAndNumberNeverByItsNumberAlone) {

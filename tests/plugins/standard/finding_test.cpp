@@ -34,14 +34,15 @@ TEST(Finding, TenCorrectedErrorsOfOneModuleAreOneWithACount) {
     EXPECT_EQ(findings[0].severity, ipmi::Severity::kCritical);
     EXPECT_EQ(findings[0].title,
               "Memory sensor 82h: uncorrectable memory error (ECC or other), memory "
-              "module 4 (12 events)");
+              "module 4 (and 11 other events)");
     EXPECT_EQ(findings[0].events.size(), 12u);
     EXPECT_THAT(findings[0].evidence,
                 ElementsAre("2026-03-09T12:00:00Z: Memory sensor 80h: correctable memory error "
                             "(ECC or other), memory module 4",
                             "2026-03-09T12:00:30Z: Memory sensor 82h: uncorrectable memory error "
                             "(ECC or other), memory module 4",
-                            "10 more events"));
+                            "9 more: correctable memory error (ECC or other), memory module 4",
+                            "1 more: memory device disabled, memory module 4"));
     EXPECT_THAT(findings[1].events, ElementsAre(10));
 }
 
@@ -51,10 +52,64 @@ TEST(Finding, EventsOfOneSensorAreOneAndAThermalTripIsOneOfItsOwn) {
         .Event(0x01, 0x30, 0x01, Offset(9))
         .Event(0x07, 0x91, kAsserted, Offset(0))
         .Event(0x07, 0x91, kAsserted, Offset(1));
-    EXPECT_THAT(Titles(log),
-                ElementsAre("Temperature sensor 30h: above the upper critical threshold (2 events)",
-                            "Processor sensor 91h: internal error (IERR)",
-                            "Processor sensor 91h: thermal trip"));
+    EXPECT_THAT(
+        Titles(log),
+        ElementsAre("Temperature sensor 30h: above the upper critical threshold (and 1 other "
+                    "event)",
+                    "Processor sensor 91h: internal error (IERR)",
+                    "Processor sensor 91h: thermal trip"));
+}
+
+TEST(Finding, ItsTitleCountsWhatSaysTheSameApartFromTheOthers) {
+    LogBuilder log;
+    for (const std::uint8_t sensor : {0x30, 0x31, 0x31, 0x32, 0x33, 0x34, 0x35, 0x31}) {
+        log.Event(0x28, 0x70, kAsserted, {0xC4, sensor, 0xFF});  // a sensor that failed
+    }
+    const auto findings = Findings(log);
+    ASSERT_EQ(findings.size(), 1u);
+    const std::string subject = "Management Subsystem Health sensor 70h: ";
+    EXPECT_EQ(findings[0].title,
+              subject + "sensor failed, sensor 31h (3 times, and 5 other events)");
+    EXPECT_THAT(
+        findings[0].evidence,
+        ElementsAre("2026-03-09T12:00:00Z: " + subject + "sensor failed, sensor 30h",
+                    "2026-03-09T12:00:00Z: " + subject + "sensor failed, sensor 31h",
+                    "2 more: sensor failed, sensor 31h", "1 more: sensor failed, sensor 32h",
+                    "1 more: sensor failed, sensor 33h", "1 more: sensor failed, sensor 34h",
+                    "1 more event"));
+}
+
+TEST(Finding, ASlotThatFirmwareAndItsOwnSensorTellOfIsOne) {
+    const ipmi::Entity board{.id = 0x10, .instance = 1};
+    const struct {
+        const char* what;
+        const char* name;
+        std::uint8_t entity, slotType, slotNumber;
+        bool twice;  // another sensor of that number
+        std::size_t findings;
+    } cases[] = {
+        {"the same slot", "Slot 2", 0x10, 9, 2, false, 1},
+        {"another slot", "Slot 3", 0x10, 9, 2, false, 2},
+        {"a name without a number", "Slots", 0x10, 9, 2, false, 2},
+        {"two slots of that number", "Slot 2", 0x10, 9, 2, true, 2},
+        {"a slot of a drive array", "Slot 2", 0x10, 1, 2, false, 2},
+        {"a drive bay", "Slot 2", 0x1A, 9, 2, false, 2},
+        {"a slot without a number", "Slot 2", 0x10, 9, 0xFF, false, 2},
+    };
+    for (const auto& c : cases) {
+        for (const bool hasEvent : {false, true}) {
+            LogBuilder log;
+            SensorFacts& slot =
+                log.Sensor(0x0C, 0x21, 0x6F, c.name, {.id = c.entity, .instance = 1});
+            LogBuilder::Reads(&slot, 0, 0b101);
+            if (c.twice) log.Sensor(0x0D, 0x21, 0x6F, "Riser Slot 2", board);
+            log.Event(0x21, 0x80, kAsserted, {0xF0, c.slotType, c.slotNumber});
+            if (hasEvent) log.Event(0x21, 0x0C, kAsserted, Offset(0));
+            const auto findings = Findings(log);
+            EXPECT_EQ(findings.size(), c.findings) << c.what;
+            EXPECT_EQ(findings[0].stillPresent.has_value(), c.findings == 1) << c.what;
+        }
+    }
 }
 
 TEST(Finding, WhatIsTakenBackIsNone) {
@@ -82,7 +137,8 @@ TEST(Finding, StopsOfOneBurstAreOneAndComeAfterOpenProblemsOfTheirSeverity) {
     EXPECT_TRUE(findings[0].isOpen);
     EXPECT_FALSE(findings[1].isOpen);
     EXPECT_THAT(findings[1].events, ElementsAre(0, 1, 2));
-    EXPECT_EQ(findings[1].title, "Watchdog 2 sensor 03h: hard reset by the watchdog (3 events)");
+    EXPECT_EQ(findings[1].title,
+              "Watchdog 2 sensor 03h: hard reset by the watchdog (and 2 other events)");
     EXPECT_THAT(findings[2].events, ElementsAre(3));
 }
 

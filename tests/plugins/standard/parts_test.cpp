@@ -309,6 +309,27 @@ TEST_F(PartsTest, AnEventFromBeforeAPartWasTakenOutHasNoNumbersOfTheNewOne) {
     }
 }
 
+TEST_F(PartsTest, ACardTakenOutOfABoardsSlotLeavesTheBoardItsNumbers) {
+    facts.devices = {Device("Baseboard", {kBoard, 1}, WholeFruImage().Bytes())};
+    Sensors({SensorRecord(1, kBoard, 1, 0x02), SensorRecord(2, kBoard, 1, kSlotSensor),
+             SensorRecord(3, kBoard, 1, 0x25)});
+    for (const auto& [type, sensor, gone] :
+         {std::tuple{kSlotSensor, 2, false}, {std::uint8_t{0x25}, 3, true}}) {
+        node.log.clear();
+        Event(0x02, 1, 0x07, 0x02);
+        Event(type, static_cast<std::uint8_t>(sensor), 0xEF, type == kSlotSensor ? 0x02 : 0x00);
+        EXPECT_EQ(OfEvent().parts[0].serialNumber, gone ? "" : "BS01") << sensor;
+    }
+}
+
+TEST_F(PartsTest, ASensorOfAnotherTypeThanItsEventsSaysNothingOfThePart) {
+    Sensors({SensorRecord(1, kSupply, 1, kSupplySensor)});
+    Event(kSupplySensor, 1, 0x6F, 0x01);
+    Event(kMemorySensor, 1, 0x6F, 0x00);
+    EXPECT_THAT(Texts(OfEvent(0)), ElementsAre("Power Supply 1"));
+    EXPECT_THAT(OfEvent(1).parts, IsEmpty());
+}
+
 TEST_F(PartsTest, OneModuleTakenOutIsNotTheOthers) {
     facts.smbios.memoryDevices = {Module("DIMM_1", "S1"), Module("DIMM_2", "S2")};
     for (const std::uint8_t module : {1, 2}) Event(kMemorySensor, 9, 0x6F, 0x30, 0xFF, module);

@@ -4,6 +4,7 @@
 
 #include "program/reports/event_filter.h"
 #include "program/reports/severity.h"
+#include "program/reports/systems.h"
 #include "program/reports/wording.h"
 
 namespace {
@@ -75,6 +76,32 @@ TEST(View, PropertiesAreTakenByNameInAnyOrderAndOnlyInTheirType) {
         broken.raw = raw;
         EXPECT_FALSE(broken.Record()) << raw;
     }
+}
+
+TEST(View, FindingsOfSeveralNodesAreTheWorstFirst) {
+    ipmisel::MachineState machine;
+    const std::pair<const char*, const char*> findings[] = {
+        {"critical", "a"}, {"warning", "b"}, {"fatal", "c"}, {"critical", "d"}, {"warning", "e"}};
+    for (const auto& [severity, title] : findings) {
+        machine.Add(
+            {"IPMI_Finding", {{"Severity", std::string(severity)}, {"Title", std::string(title)}}});
+    }
+    std::string order;
+    for (const ipmisel::Finding& finding : machine.findings) order += finding.title;
+    EXPECT_EQ(order, "cadbe");
+}
+
+TEST(View, ANodeIsCalledByItsNumberWhereAnotherHasItsName) {
+    const auto label = [](std::vector<std::string> names, std::int64_t node) {
+        ipmisel::ReportHead head;
+        head.nodes = names.size();
+        for (const std::string& name : names) head.systems.emplace_back().name = name;
+        return ipmisel::Systems(head).LabelOf(node);
+    };
+    EXPECT_EQ(label({"a"}, 1), "");
+    EXPECT_EQ(label({"a", "b"}, 2), "b");
+    EXPECT_EQ(label({"a", "a"}, 2), "node 2");
+    EXPECT_EQ(label({"", ""}, 1), "node 1");
 }
 
 TEST(View, AMomentIsADateATimeOrHowLongAgo) {
