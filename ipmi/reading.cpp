@@ -118,7 +118,8 @@ std::optional<double> Conversion::Value(std::uint8_t raw) const {
 std::optional<double> Conversion::ValueByFactors(std::uint8_t raw,
                                                  const ReadingFactors& asked) const {
     const auto count = SignedCount(raw, format);
-    if (!count || !IsNonLinear()) return std::nullopt;
+    // Zeros are no answer; a constant other than 0 is one.
+    if (!count || !IsNonLinear() || (asked.m == 0 && asked.b == 0)) return std::nullopt;
     return Finite(Linear(*count, asked));
 }
 

@@ -311,6 +311,11 @@ std::optional<SdrRecord> SdrRecord::Parse(std::span<const std::uint8_t> bytes) {
     return record;
 }
 
+bool SdrRecord::IsOfSensor() const {
+    return header.type == SdrType::kFull || header.type == SdrType::kCompact ||
+           header.type == SdrType::kEventOnly;
+}
+
 std::vector<Sensor> SdrRecord::Sensors() const {
     const auto* first = std::get_if<Sensor>(&body);
     if (first == nullptr) return {};

@@ -198,6 +198,8 @@ struct SdrRecord {
     /// looked at. Empty when there is no whole header.
     static std::optional<SdrRecord> Parse(std::span<const std::uint8_t> bytes);
 
+    /// Whether its type is one of the three that describe sensors.
+    bool IsOfSensor() const;
     /// The record's sensors: none, one, or each that shares it, with its own number and name.
     std::vector<Sensor> Sensors() const;
 };

@@ -16,8 +16,8 @@ constexpr NQORTQR20::fdrPropertyInfo kProperties[] = {
     {"Node", kInteger, "number of the node, from 1"},
     {"GUID", kText, "identity of the system in the text form of RFC 4122"},
     {"GUIDOrder", kText,
-     "where SMBIOS has the identity too: whose order of bytes the controller keeps to, \"IPMI\", "
-     "\"SMBIOS\" or \"RFC 4122\""},
+     "where SMBIOS has an identity too: in whose order of bytes it was read, \"IPMI\", \"SMBIOS\" "
+     "or \"RFC 4122\""},
     {"SystemManufacturer", kText, "by SMBIOS, else by the inventory of device 0"},
     {"SystemProduct", kText, "by SMBIOS, else by the inventory of device 0"},
     {"SystemSerialNumber", kText, "by SMBIOS, else by the inventory of device 0"},
@@ -73,13 +73,15 @@ void Write(NodePass& pass, Output& output) {
         output.Text("FirmwareVersion", ipmi::FirmwareVersionText(*id));
         output.Text("AuxiliaryRevision", ipmi::AuxiliaryRevisionText(*id));
         output.Text("IPMIVersion", ipmi::IpmiVersionText(*id));
-        output.Text("DeviceID", std::to_string(id->deviceId));
+        if (id->deviceId != ipmi::kUnspecifiedDeviceId) {
+            output.Text("DeviceID", std::to_string(id->deviceId));
+        }
         output.Text("DeviceRevision", std::to_string(id->deviceRevision));
-        if (id->manufacturerId != 0) {  // 0 is "unspecified"
+        if (id->HasManufacturer()) {
             output.Integer("ManufacturerID", id->manufacturerId);
             output.Text("Manufacturer", EnterpriseName(id->manufacturerId));
         }
-        output.Integer("ProductID", id->productId);
+        if (id->HasProduct()) output.Integer("ProductID", id->productId);
         output.Texts("Capabilities", Strings(ipmi::CapabilityNames(*id)));
     }
     output.Text("SelfTest", node.SelfTest().value_or(""));
@@ -102,9 +104,11 @@ void Write(NodePass& pass, Output& output) {
 GuidReading ReadGuid(const std::optional<ipmi::Guid>& guid,
                      const std::optional<ipmi::Guid>& smbiosUuid) {
     if (!guid) return {};
-    const auto order = smbiosUuid ? ipmi::GuidOrderBySmbios(*guid, *smbiosUuid) : std::nullopt;
-    return {ipmi::GuidText(*guid, order.value_or(ipmi::GuidOrder::kIpmi)),
-            order ? OrderName(*order) : ""};
+    // Where both differ in every order it is the standard's, as without SMBIOS.
+    constexpr ipmi::GuidOrder kStandard = ipmi::GuidOrder::kIpmi;
+    if (!smbiosUuid) return {ipmi::GuidText(*guid, kStandard), ""};
+    const auto order = ipmi::GuidOrderBySmbios(*guid, *smbiosUuid).value_or(kStandard);
+    return {ipmi::GuidText(*guid, order), OrderName(order)};
 }
 
 const ClassEntry kControllerClass{

@@ -7,8 +7,8 @@
 
 namespace standard {
 
-/// The system's GUID in its text form, and, where SMBIOS tells, which order of bytes was taken;
-/// empty without a GUID.
+/// The system's GUID in its text form, and, where SMBIOS has one too, which order of bytes was
+/// taken; empty without a GUID.
 struct GuidReading {
     std::string text;
     std::string order;

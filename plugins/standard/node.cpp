@@ -131,9 +131,10 @@ bool Node::IsReadable(const ipmi::Sensor& sensor) {
 }
 
 const SensorState& Node::StateOf(const ipmi::Sensor& sensor) {
-    const auto known = states_.find(sensor.key);
+    const std::pair which{sensor.recordId, sensor.key};
+    const auto known = states_.find(which);
     if (known != states_.end()) return known->second;
-    return states_.emplace(sensor.key, ReadState(sensor)).first->second;
+    return states_.emplace(which, ReadState(sensor)).first->second;
 }
 
 std::optional<double> Node::ValueOf(const ipmi::Sensor& sensor, std::uint8_t raw) {
@@ -141,21 +142,35 @@ std::optional<double> Node::ValueOf(const ipmi::Sensor& sensor, std::uint8_t raw
     const ipmi::Conversion& conversion = sensor.analog->conversion;
     if (!conversion.IsNonLinear()) return conversion.Value(raw);
     if (!IsReadable(sensor)) return std::nullopt;
-    const auto [value, isNew] = nonLinearValues_.try_emplace({sensor.key, raw});
+    const auto [asked, isNew] = factors_.try_emplace({sensor.key, raw});
     if (isNew) {
-        const auto asked =
+        asked->second =
             Ask(controller_, ipmi::GetSensorReadingFactors(sensor.key.number, raw, sensor.key.lun),
                 ipmi::AskedFactors::Parse);
-        if (asked) value->second = conversion.ValueByFactors(raw, asked->factors);
     }
-    return value->second;
+    if (!asked->second) return std::nullopt;
+    return conversion.ValueByFactors(raw, asked->second->factors);
+}
+
+const std::optional<Answer>& Node::ReadingOf(const ipmi::SensorKey& key) {
+    const auto [answer, isNew] = readings_.try_emplace(key);
+    if (isNew) answer->second = controller_.Send(ipmi::GetSensorReading(key.number, key.lun));
+    return answer->second;
+}
+
+const std::optional<ipmi::SensorThresholds>& Node::ThresholdsOf(const ipmi::SensorKey& key) {
+    const auto [thresholds, isNew] = thresholds_.try_emplace(key);
+    if (isNew) {
+        thresholds->second = Ask(controller_, ipmi::GetSensorThresholds(key.number, key.lun),
+                                 ipmi::SensorThresholds::Parse);
+    }
+    return thresholds->second;
 }
 
 SensorState Node::ReadState(const ipmi::Sensor& sensor) {
     SensorState state;
     if (!IsReadable(sensor)) return state;
-    const auto answer = controller_.Send(ipmi::GetSensorReading(sensor.key.number, sensor.key.lun));
-    if (answer) {
+    if (const auto& answer = ReadingOf(sensor.key)) {
         auto reading = answer->Completed() ? ipmi::SensorReading::Parse(answer->data)
                                            : std::optional<ipmi::SensorReading>();
         state.unavailable = !answer->Completed() || (reading && !reading->Available());
@@ -168,10 +183,7 @@ SensorState Node::ReadState(const ipmi::Sensor& sensor) {
     state.thresholds = sensor.FixedThresholds();
     if (sensor.thresholdAccess == ipmi::LimitAccess::kReadable ||
         sensor.thresholdAccess == ipmi::LimitAccess::kSettable) {
-        const auto asked =
-            Ask(controller_, ipmi::GetSensorThresholds(sensor.key.number, sensor.key.lun),
-                ipmi::SensorThresholds::Parse);
-        if (asked) state.thresholds = *asked;
+        if (const auto& asked = ThresholdsOf(sensor.key)) state.thresholds = *asked;
     }
     for (std::size_t i = 0; i < ipmi::kThresholdCount; ++i) {
         if (const auto raw = state.thresholds.Get(static_cast<ipmi::Threshold>(i))) {

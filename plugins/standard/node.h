@@ -81,6 +81,8 @@ private:
     std::vector<ipmi::EventFilter> ReadFilters();
     std::vector<ipmi::SdrRecord> ReadRepository();
     SensorState ReadState(const ipmi::Sensor& sensor);
+    const std::optional<Answer>& ReadingOf(const ipmi::SensorKey& key);
+    const std::optional<ipmi::SensorThresholds>& ThresholdsOf(const ipmi::SensorKey& key);
 
     unsigned number_;
     Controller controller_;
@@ -96,8 +98,11 @@ private:
     std::optional<std::vector<ipmi::EventFilter>> filters_;
     std::optional<std::vector<ipmi::SdrRecord>> repository_;
     std::optional<std::vector<ipmi::Sensor>> sensors_;
-    std::map<ipmi::SensorKey, SensorState> states_;
-    std::map<std::pair<ipmi::SensorKey, std::uint8_t>, std::optional<double>> nonLinearValues_;
+    // What the controller answered for a sensor, whichever of its records it was asked by.
+    std::map<ipmi::SensorKey, std::optional<Answer>> readings_;
+    std::map<ipmi::SensorKey, std::optional<ipmi::SensorThresholds>> thresholds_;
+    std::map<std::pair<ipmi::SensorKey, std::uint8_t>, std::optional<ipmi::AskedFactors>> factors_;
+    std::map<std::pair<std::uint16_t, ipmi::SensorKey>, SensorState> states_;  // of each record
 };
 
 }  // namespace standard

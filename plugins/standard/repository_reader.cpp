@@ -28,17 +28,25 @@ std::size_t ClaimedLength(const std::vector<std::uint8_t>& record) {
 
 std::optional<RepositoryReader::Record> RepositoryReader::Read(std::uint16_t recordId) {
     std::optional<Record> record;
-    if (!inParts_) record = ReadWhole(recordId);
-    if (inParts_ && !record) {
-        const auto header = ReadPart(recordId, 0, ipmi::kSdrHeaderLength);
-        if (!header || !header->Completed() || header->data.size() < kNextIdLength) {
-            return std::nullopt;
-        }
-        record = Record{NextId(header->data),
-                        {header->data.begin() + kNextIdLength, header->data.end()}};
+    for (int i = 0; i < kMaxReservations; ++i) {
+        record.reset();
+        if (!inParts_) record = ReadWhole(recordId);
+        if (inParts_ && !record) record = ReadHeader(recordId);
+        if (!record || ReadRest(recordId, &*record)) return record;
     }
-    if (record && record->bytes.size() < ClaimedLength(record->bytes)) ReadRest(recordId, &*record);
     return record;
+}
+
+std::optional<RepositoryReader::Record> RepositoryReader::ReadHeader(std::uint16_t recordId) {
+    for (int i = 0; i < kMaxReservations; ++i) {
+        const auto header = ReadPart(recordId, 0, ipmi::kSdrHeaderLength);
+        if (!header) return std::nullopt;
+        if (header->completionCode == ipmi::kReservationCanceled) continue;
+        if (!header->Completed() || header->data.size() < kNextIdLength) return std::nullopt;
+        return Record{NextId(header->data),
+                      {header->data.begin() + kNextIdLength, header->data.end()}};
+    }
+    return std::nullopt;
 }
 
 std::optional<RepositoryReader::Record> RepositoryReader::ReadWhole(std::uint16_t recordId) {
@@ -52,32 +60,35 @@ std::optional<RepositoryReader::Record> RepositoryReader::ReadWhole(std::uint16_
     return Record{NextId(answer->data), {answer->data.begin() + kNextIdLength, answer->data.end()}};
 }
 
-void RepositoryReader::ReadRest(std::uint16_t recordId, Record* record) {
-    // The ID in the record is the one to go on with: 0000h has only asked for the first.
-    if (recordId == ipmi::kFirstRecordId)
-        recordId = ipmi::SdrHeader::Parse(record->bytes)->recordId;
+bool RepositoryReader::ReadRest(std::uint16_t recordId, Record* record) {
     const std::size_t length = ClaimedLength(record->bytes);
+    // The ID in the record is the one to go on with: 0000h has only asked for the first.
+    if (recordId == ipmi::kFirstRecordId && length > 0) {
+        recordId = ipmi::SdrHeader::Parse(record->bytes)->recordId;
+    }
+    const std::size_t begun = record->bytes.size();
     while (record->bytes.size() < length) {
         const std::size_t count = std::min(kPart, length - record->bytes.size());
         const auto part = ReadPart(recordId, record->bytes.size(), count);
-        if (!part || !part->Completed() || part->data.size() <= kNextIdLength) return;
+        if (part && part->completionCode == ipmi::kReservationCanceled) {
+            record->bytes.resize(begun);
+            return false;
+        }
+        if (!part || !part->Completed() || part->data.size() <= kNextIdLength) return true;
         const auto bytes = part->data.begin() + kNextIdLength;
         const auto end = std::min(part->data.end(), bytes + static_cast<std::ptrdiff_t>(count));
         record->bytes.insert(record->bytes.end(), bytes, end);
     }
+    return true;
 }
 
 std::optional<Answer> RepositoryReader::ReadPart(std::uint16_t recordId, std::size_t offset,
                                                  std::size_t count) {
-    for (int i = 0; i < kMaxReservations; ++i) {
-        if (!reservation_ && !Reserve()) return std::nullopt;
-        auto answer =
-            controller_.Send(ipmi::GetSdr(recordId, static_cast<std::uint8_t>(offset),
-                                          static_cast<std::uint8_t>(count), *reservation_));
-        if (!answer || answer->completionCode != ipmi::kReservationCanceled) return answer;
-        reservation_.reset();
-    }
-    return std::nullopt;
+    if (!reservation_ && !Reserve()) return std::nullopt;
+    auto answer = controller_.Send(ipmi::GetSdr(recordId, static_cast<std::uint8_t>(offset),
+                                                static_cast<std::uint8_t>(count), *reservation_));
+    if (answer && answer->completionCode == ipmi::kReservationCanceled) reservation_.reset();
+    return answer;
 }
 
 bool RepositoryReader::Reserve() {

@@ -24,8 +24,11 @@ public:
 
 private:
     std::optional<Record> ReadWhole(std::uint16_t recordId);
-    /// Adds what is missing of a record.
-    void ReadRest(std::uint16_t recordId, Record* record);
+    /// Adds what is missing of a record; false when its reservation was lost: another record may
+    /// now have its ID, and what was read of it cannot be gone on with.
+    bool ReadRest(std::uint16_t recordId, Record* record);
+    std::optional<Record> ReadHeader(std::uint16_t recordId);
+    /// Under the present reservation, else a new one; a refusal of it drops it.
     std::optional<Answer> ReadPart(std::uint16_t recordId, std::size_t offset, std::size_t count);
     bool Reserve();
 

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <iterator>
 
+#include "base/text.h"
 #include "ipmi/entities.h"
 #include "ipmi/event_offsets.h"
 #include "ipmi/event_types.h"
@@ -51,6 +52,7 @@ constexpr NQORTQR20::fdrPropertyInfo kProperties[] = {
     {"States", kTextList, "states that are asserted"},
     {"Status", kText, "\"ok\", \"warning\", \"critical\" or \"unavailable\""},
     {"Part", kText, "the part that it watches"},
+    {"Problems", kTextList, "why a value is missing, where the sensor itself or its record says"},
 };
 
 struct ThresholdName {
@@ -106,10 +108,12 @@ void WriteRecord(Output& output, const ipmi::Sensor& sensor) {
     output.Integer("TypeCode", sensor.sensorType);
     output.Text("EventType", ipmi::EventTypeName(sensor.eventType));
     output.Integer("EventTypeCode", sensor.eventType);
-    output.Text("Entity", ipmi::EntityName(sensor.entity.id));
-    output.Integer("EntityID", sensor.entity.id);
-    output.Integer("EntityInstance", sensor.entity.instance);
-    output.Boolean("EntityIsDeviceRelative", sensor.entity.IsDeviceRelative());
+    if (sensor.entity.IsSpecified()) {
+        output.Text("Entity", ipmi::EntityName(sensor.entity.id));
+        output.Integer("EntityID", sensor.entity.id);
+        output.Integer("EntityInstance", sensor.entity.instance);
+        output.Boolean("EntityIsDeviceRelative", sensor.entity.IsDeviceRelative());
+    }
     if (sensor.IsAnalog()) output.Text("Unit", ipmi::UnitText(sensor.units));
 }
 
@@ -137,25 +141,78 @@ void WriteAnalog(Output& output, const ipmi::Sensor& sensor) {
     output.Real("NegativeHysteresis", difference(analog.negativeHysteresis));
 }
 
-void Write(NodePass& pass, Output& output) {
+/// Why raw counts of the sensor cannot be converted; empty when they can.
+std::string ConversionProblem(const ipmi::Sensor& sensor, const SensorState& state) {
+    if (!sensor.IsAnalog()) return {};
+    const ipmi::Conversion& conversion = sensor.analog->conversion;
+    if (!conversion.IsNonLinear() && conversion.linearization > ipmi::kCubeRoot) {
+        return ipmisel::Format("not converted: linearization %02xh is reserved",
+                               conversion.linearization);
+    }
+    if (!conversion.IsNonLinear() && conversion.factors.m == 0) {
+        return "not converted: the record's factor M is 0";
+    }
+    if (!state.reading || state.value) return {};
+    return ipmisel::Format(conversion.IsNonLinear()
+                               ? "not converted: no reading factors for raw reading %02xh"
+                               : "not converted: raw reading %02xh has no value",
+                           state.reading->raw);
+}
+
+std::vector<std::string> ProblemsOf(const ipmi::SdrRecord& record, const ipmi::Sensor& sensor,
+                                    const SensorState& state) {
+    std::vector<std::string> problems;
+    if (!record.whole) problems.emplace_back("the sensor's record is cut short");
+    // A software ID is no controller that could be asked.
+    if (!Node::IsReadable(sensor) && sensor.type != ipmi::SdrType::kEventOnly &&
+        (sensor.key.owner & 0x01) == 0) {
+        std::string owner = ipmisel::Format("behind the controller at %02xh", sensor.key.owner);
+        if (sensor.channel != 0) owner += ipmisel::Format(", channel %u", sensor.channel);
+        problems.push_back(owner + ": not read");
+    }
+    std::string conversion = ConversionProblem(sensor, state);
+    if (!conversion.empty()) problems.push_back(std::move(conversion));
+    return problems;
+}
+
+void WriteSensor(NodePass& pass, Output& output, const ipmi::SdrRecord& record,
+                 const ipmi::Sensor& sensor) {
     Node& node = pass.node();
-    for (const ipmi::Sensor& sensor : node.Sensors()) {
-        output.Begin(kName);
-        output.Integer("Node", node.number());
-        WriteRecord(output, sensor);
-        const SensorState& state = node.StateOf(sensor);
-        output.Real("Reading", state.value);
-        if (sensor.IsAnalog()) WriteAnalog(output, sensor);
-        for (std::size_t i = 0; i < ipmi::kThresholdCount; ++i) {
-            output.Real(kThresholds[i].property, state.limits[i]);
-        }
-        if (state.reading && state.reading->states) {
-            output.Texts("States", StateTexts(sensor, *state.reading));
-        }
-        output.Text("Status", StatusOf(sensor, state));
-        const PartEvidence part = pass.PartOf(sensor);
-        if (part.parts.size() == 1) output.Text("Part", part.parts.front().name);
-        output.End();
+    output.Begin(kName);
+    output.Integer("Node", node.number());
+    WriteRecord(output, sensor);
+    const SensorState& state = node.StateOf(sensor);
+    output.Real("Reading", state.value);
+    if (sensor.IsAnalog()) WriteAnalog(output, sensor);
+    for (std::size_t i = 0; i < ipmi::kThresholdCount; ++i) {
+        output.Real(kThresholds[i].property, state.limits[i]);
+    }
+    if (state.reading && state.reading->states) {
+        output.Texts("States", StateTexts(sensor, *state.reading));
+    }
+    output.Text("Status", StatusOf(sensor, state));
+    const PartEvidence part = pass.PartOf(sensor);
+    if (part.parts.size() == 1) output.Text("Part", part.parts.front().name);
+    output.Texts("Problems", ProblemsOf(record, sensor, state));
+    output.End();
+}
+
+/// A sensor's record that ends before it says what the sensor is.
+void WriteCutRecord(Output& output, unsigned node, const ipmi::SdrRecord& record) {
+    const std::string problem = "the sensor's record ends before the sensor's type";
+    output.Begin(kName);
+    output.Integer("Node", node);
+    output.Integer("RecordID", record.header.recordId);
+    output.Texts("Problems", std::span(&problem, 1));
+    output.End();
+}
+
+void Write(NodePass& pass, Output& output) {
+    for (const ipmi::SdrRecord& record : pass.node().Repository()) {
+        if (!record.IsOfSensor()) continue;
+        const std::vector<ipmi::Sensor> sensors = record.Sensors();
+        if (sensors.empty()) WriteCutRecord(output, pass.node().number(), record);
+        for (const ipmi::Sensor& sensor : sensors) WriteSensor(pass, output, record, sensor);
     }
 }
 

@@ -3,6 +3,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <array>
 #include <vector>
 
 namespace ipmi {
@@ -45,6 +47,24 @@ TEST(DeviceId, KeepsFlagsAndReservedBitsOutOfTheNumbers) {
     EXPECT_EQ(FirmwareVersionText(*id), "10.05");
     EXPECT_EQ(IpmiVersionText(*id), "1.5");
     EXPECT_EQ(id->manufacturerId, 0x17ED9u);
+}
+
+TEST(DeviceId, UnspecifiedAndReservedNumbersNameNobody) {
+    const struct {
+        std::array<std::uint8_t, 5> numbers;  // manufacturer ID, product ID
+        bool manufacturer, product;
+    } cases[] = {{{0, 0, 0, 0, 0}, false, false},
+                 {{0xFF, 0xFF, 0x0F, 0xFF, 0xFF}, false, false},
+                 {{0, 0, 1, 0, 1}, true, true},
+                 {{0xFF, 0xFF, 0x0E, 0xFF, 0xFE}, true, true}};
+    for (const auto& c : cases) {
+        auto answer = kAnswer;
+        std::ranges::copy(c.numbers, answer.begin() + 6);
+        const auto id = ParseDeviceId(answer);
+        ASSERT_TRUE(id);
+        EXPECT_EQ(id->HasManufacturer(), c.manufacturer) << id->manufacturerId;
+        EXPECT_EQ(id->HasProduct(), c.product) << id->productId;
+    }
 }
 
 TEST(DeviceId, IsWholeWithoutTheAuxiliaryRevisionAndNothingWhenCutBefore) {

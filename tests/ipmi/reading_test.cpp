@@ -103,6 +103,7 @@ TEST(Reading, ANonLinearSensorIsConvertedByTheFactorsAskedFor) {
     EXPECT_EQ(conversion.ValueByFactors(10, asked), 8.0);
     conversion.linearization = 0x7F;
     EXPECT_EQ(conversion.ValueByFactors(10, {.b = 7}), 7.0);  // a constant is what was answered
+    EXPECT_EQ(conversion.ValueByFactors(10, {.resultExponent = 1}), std::nullopt);
 }
 
 TEST(Reading, FactorsAreSignedAndSplitOverTheirBytes) {

@@ -204,6 +204,67 @@ TEST_F(StandardClasses, SensorsWithReadingLimitsAndStates) {
     EXPECT_EQ(all[3].count("Status") + all[3].count("States"), 0u);  // cannot be read
 }
 
+TEST_F(StandardClasses, WhatIsUnspecifiedIsLeftOut) {
+    const auto all = Collect(R"({"bmcs": [{"device_id": "00 01 02 15 02 00 000000 0000",
+        "sdr": {"records": [
+    "0100 51 02 1c 2000 30 0001 7f40 016f 0000 0000 0000 c00000 0100 000000000000 c141"]}}]})",
+                             {"IPMI_Controller", "IPMI_Sensor"});
+    ASSERT_EQ(all.size(), 2u);
+    for (const char* name : {"DeviceID", "ManufacturerID", "ProductID", "Capabilities"}) {
+        EXPECT_EQ(all[0].count(name), 0u) << name;
+    }
+    EXPECT_EQ(all[1].at("Name"), "A");
+    for (const char* name : {"Entity", "EntityID", "EntityInstance", "EntityIsDeviceRelative"}) {
+        EXPECT_EQ(all[1].count(name), 0u) << name;
+    }
+}
+
+TEST_F(StandardClasses, ASensorSaysWhyAValueIsMissing) {
+    // kServer's temperature with one thing broken each; linearization and M stand after the units.
+    const std::string record =
+        "0100 51 01 32 2000 30 0301 7f68 0101 0000 0000 3f00 000100 00 01 00 f6 c0 10 00 05 202000 "
+        "0000 645f5a0f0a05 0203 000000 c7 43505520546d70";
+    const struct {
+        const char *from, *to, *reading, *problem;
+    } cases[] = {
+        {"", "", "\"reading\": \"69\"", nullptr},
+        {"00 01 00 f6", "0c 01 00 f6", "\"reading\": \"69\"",
+         "[not converted: linearization 0ch is reserved]"},
+        {"00 01 00 f6", "0f 01 00 f6", "\"reading\": \"69\"",
+         "[not converted: linearization 0fh is reserved]"},
+        {"00 01 00 f6", "6f 01 00 f6", "\"reading\": \"69\"",
+         "[not converted: linearization 6fh is reserved]"},
+        {"00 01 00 f6", "00 00 00 f6", "\"reading\": \"69\"",
+         "[not converted: the record's factor M is 0]"},
+        {"00 01 00 f6", "71 01 00 f6", "\"reading\": \"69\"",
+         "[not converted: no reading factors for raw reading 69h]"},
+        {"00 01 00 f6", "01 01 00 f6", "\"reading\": \"05\"",
+         "[not converted: raw reading 05h has no value]"},
+        {"2000 30", "2c00 30", "\"reading\": \"69\"", "[behind the controller at 2ch: not read]"},
+        {"2000 30", "2c70 30", "\"reading\": \"69\"",
+         "[behind the controller at 2ch, channel 7: not read]"},
+        {"2000 30", "4100 30", "\"reading\": \"69\"", nullptr},  // software
+        {"01 32 2000", "01 20 2000", "\"reading\": \"69\"", "[the sensor's record is cut short]"},
+        {"01 32 2000", "01 08 2000", "\"reading\": \"69\"",
+         "[the sensor's record ends before the sensor's type]"},
+    };
+    for (const auto& c : cases) {
+        std::string broken = record;
+        broken.replace(broken.find(c.from), std::string(c.from).size(), c.to);
+        const auto all = Collect("{\"bmcs\": [{\"sdr\": {\"records\": [\"" + broken +
+                                     "\"]}, \"sensors\": {\"30\": {" + c.reading +
+                                     ", \"states\": \"c0 00\"}}}]}",
+                                 {"IPMI_Sensor"});
+        ASSERT_EQ(all.size(), 1u) << c.to;
+        EXPECT_EQ(all[0].at("RecordID"), "1");
+        EXPECT_EQ(all[0].count("Problems"), c.problem == nullptr ? 0u : 1u) << c.to;
+        if (c.problem == nullptr) continue;
+        EXPECT_EQ(all[0].at("Problems"), c.problem);
+        // What comes before the cut can be had.
+        EXPECT_EQ(all[0].count("Reading"), std::string(c.to) == "01 20 2000") << c.to;
+    }
+}
+
 TEST_F(StandardClasses, WhatIsWrittenStandsInTheClassTableWithItsType) {
     constexpr fdrPropertyType kTypes[] = {
         fdrPropertyType::kText,    fdrPropertyType::kByteList, fdrPropertyType::kReference,
@@ -400,7 +461,8 @@ TEST(GuidReading, SmbiosDecidesTheOrderWhereItHasTheSameIdentity) {
     EXPECT_EQ(ReadGuid(wire, smbios).order, "IPMI");
     EXPECT_EQ(ReadGuid(smbios, smbios).text, text);
     EXPECT_EQ(ReadGuid(smbios, smbios).order, "SMBIOS");
-    EXPECT_EQ(ReadGuid(wire, ipmi::Guid{1}).order, "");  // another system: nothing is decided
+    EXPECT_EQ(ReadGuid(wire, ipmi::Guid{1}).order, "IPMI");  // another system: the standard's
+    EXPECT_EQ(ReadGuid(wire, ipmi::Guid{1}).text, text);
     EXPECT_EQ(ReadGuid(std::nullopt, smbios).text, "");
 }
 

@@ -203,10 +203,54 @@ TEST_F(NodeTest, ARepositoryIsReadInPartsWhereWholeRecordsAreRefused) {
     }
     const auto cut = Open("{" + Repository({kTemperature, kSupply}) + R"(, "faults": [
         {"netfn": "0a", "command": "23", "call": 1, "truncate": 20},
-        {"netfn": "0a", "command": "23", "call": 3, "completion_code": "c5"}]})");
+        {"netfn": "0a", "command": "23", "call": 4, "truncate": 20}]})");
     ASSERT_THAT(cut->Sensors(), SizeIs(2));
     EXPECT_TRUE(cut->Repository()[0].whole);
-    EXPECT_EQ(Sent(ipmi::kReserveSdrRepository), 2);  // the first was cancelled
+    EXPECT_TRUE(cut->Repository()[1].whole);
+    EXPECT_EQ(Sent(ipmi::kReserveSdrRepository), 1);
+}
+
+TEST_F(NodeTest, ARecordWhoseReservationIsLostIsReadAnewFromItsBeginning) {
+    // The first record is cut, its rest refused; what stands at its ID by then is another.
+    const auto node = Open("{" + Repository({kSupply, kForeign}) + R"(, "faults": [
+        {"netfn": "0a", "command": "23", "call": 1, "data":
+         "0200 0100 51 01 32 20 00 30 03 01 7f 68 01 01 00 00 00 00 3f"},
+        {"netfn": "0a", "command": "23", "call": 2, "completion_code": "c5"}]})");
+    ASSERT_THAT(node->Sensors(), SizeIs(2));
+    EXPECT_EQ(node->Sensors()[0].name, "PS1");
+    EXPECT_TRUE(node->Repository()[0].whole);
+    // One that is lost each time leaves what one answer has, not a mixture of several.
+    const auto never = Open("{" + Repository({kTemperature}) + R"(, "faults": [
+        {"netfn": "0a", "command": "23", "call": 1, "truncate": 20},
+        {"netfn": "0a", "command": "23", "call": 2, "completion_code": "c5"},
+        {"netfn": "0a", "command": "23", "call": 3, "truncate": 20},
+        {"netfn": "0a", "command": "23", "call": 4, "completion_code": "c5"},
+        {"netfn": "0a", "command": "23", "call": 5, "truncate": 20},
+        {"netfn": "0a", "command": "23", "call": 6, "completion_code": "c5"},
+        {"netfn": "0a", "command": "23", "call": 7, "truncate": 20},
+        {"netfn": "0a", "command": "23", "call": 8, "completion_code": "c5"}]})");
+    ASSERT_THAT(never->Repository(), SizeIs(1));
+    EXPECT_FALSE(never->Repository()[0].whole);
+    EXPECT_EQ(never->Sensors().at(0).key.number, 0x30);
+}
+
+TEST_F(NodeTest, RecordsOfOneSensorAreConvertedEachByItsOwn) {
+    // An event-only record of the same sensor first, and one that counts in another way.
+    std::string other = kTemperature;
+    other.replace(0, 4, "0300");
+    other.replace(other.find("f6 c0"), 5, "00 00");
+    const auto node = Open("{" +
+                           Repository({"0200 51 03 0f 20 00 30 03 01 01 01 00 00 00 00 c3 545454",
+                                       kTemperature, other.c_str()}) +
+                           R"(, "sensors": {"30": {"reading": "59", "states": "c0 00",
+                                     "thresholds": "3f 05 0a 0f 50 5a 64"}}})");
+    ASSERT_THAT(node->Sensors(), SizeIs(3));
+    EXPECT_FALSE(node->StateOf(node->Sensors()[0]).value);
+    EXPECT_EQ(node->StateOf(node->Sensors()[1]).value, 79);
+    EXPECT_EQ(node->StateOf(node->Sensors()[2]).value, 89);
+    EXPECT_EQ(node->StateOf(node->Sensors()[2]).limits[0], 5);
+    EXPECT_EQ(Sent(ipmi::kGetSensorReading), 1);
+    EXPECT_EQ(Sent(ipmi::kGetSensorThresholds), 1);
 }
 
 TEST_F(NodeTest, ARecordOfWhichThePartsFailKeepsWhatCame) {
