@@ -17,14 +17,15 @@
 #include "program/commands/diff.h"
 #include "program/commands/failure.h"
 #include "program/commands/report.h"
+#include "program/fleet/worker.h"
 #include "program/reports/terminal_text.h"
 
 namespace ipmisel {
 namespace {
 
 /// In the order of the help.
-constexpr Command (*kCommands[])(CLI::App* program) = {AddCollectCommand, AddReportCommand,
-                                                       AddDiffCommand, AddClassesCommand};
+constexpr Command (*kCommands[])(CLI::App* program) = {
+    AddCollectCommand, AddReportCommand, AddDiffCommand, AddClassesCommand, AddWorkerCommand};
 
 /// Letters to put in, take out or change to make one word the other.
 std::size_t Distance(std::string_view a, std::string_view b) {
@@ -50,6 +51,7 @@ void RefuseUnknownCommand(const std::vector<Command>& commands, int argc, char**
     for (const Command& command : commands) {
         const std::string name = command.arguments->get_name();
         if (name == argv[1]) return;
+        if (command.arguments->get_group().empty()) continue;  // is none for users
         known += (known.empty() ? "" : ", ") + name;
         if (near.empty() && Distance(word, name) <= 2) near = name;
     }

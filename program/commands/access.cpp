@@ -1,6 +1,11 @@
 #include "program/commands/access.h"
 
+#include <unistd.h>
+
 #include <algorithm>
+#include <array>
+#include <climits>
+#include <filesystem>
 #include <new>
 
 #include "program/commands/arguments.h"
@@ -71,10 +76,25 @@ void AddAccessOptions(CLI::App* command, AccessOptions* options) {
         ->check(Seconds(kSecondsPerDay));
 }
 
+std::string HostOf(const std::string& source) {
+    const auto colon = source.find(':');
+    if (colon == std::string::npos) {
+        std::array<char, HOST_NAME_MAX + 1> name{};
+        return gethostname(name.data(), name.size() - 1) == 0 ? name.data() : source;
+    }
+    const std::string place = source.substr(colon + 1);
+    if (!source.starts_with("lan:")) return std::filesystem::path(place).stem().string();
+    if (place.starts_with('[')) return place.substr(1, place.find(']') - 1);
+    const auto port = place.find(':');
+    return port == place.rfind(':') ? place.substr(0, port) : place;  // several: an IPv6 address
+}
+
 NQORTQR20::Source OpenSource(const AccessOptions& options) {
     NQORTQR20::SourceOptions access = options.source;
-    access.password = [&options] { return ReadPassword(options.passwordFile); };
-    access.kg = [&options] { return ReadKg(options.kgFile); };
+    access.password = [&options] {
+        return options.password ? *options.password : ReadPassword(options.passwordFile);
+    };
+    access.kg = [&options] { return options.kg ? *options.kg : ReadKg(options.kgFile); };
     try {
         return NQORTQR20::OpenSources(options.Sources(), access);
     } catch (const NQORTQR20::SourceUsageError& error) {

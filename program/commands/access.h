@@ -1,6 +1,7 @@
 #pragma once
 
 #include <CLI/CLI.hpp>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
@@ -15,6 +16,9 @@ struct AccessOptions {
     std::optional<std::string> passwordFile;
     std::optional<std::string> kgFile;
     NQORTQR20::SourceOptions source;
+    // What is known already, so that it is read from nowhere.
+    std::optional<std::string> password;
+    std::optional<std::vector<std::uint8_t>> kg;
 
     /// As the user named them, or the default one.
     std::vector<std::string> Sources() const;
@@ -23,6 +27,10 @@ struct AccessOptions {
 /// Adds the options to a command, and what there is to say of them at the end of its help.
 void AddAccessOptions(CLI::App* command, AccessOptions* options);
 std::string WorkaroundHelp();
+
+/// The host that a source names, as the user calls it: of a network source without its port, of a
+/// file without its folder and ending; else this machine.
+std::string HostOf(const std::string& source);
 
 /// Opens the sources; asks for a password where one is needed and not given. Throws Failure.
 NQORTQR20::Source OpenSource(const AccessOptions& options);

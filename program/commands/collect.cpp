@@ -1,14 +1,9 @@
 #include "program/commands/collect.h"
 
-#include <unistd.h>
-
 #include <CLI/CLI.hpp>
 #include <algorithm>
-#include <array>
 #include <chrono>
-#include <climits>
 #include <cstdint>
-#include <filesystem>
 #include <memory>
 #include <optional>
 #include <string>
@@ -32,6 +27,7 @@
 #include "program/commands/plugins.h"
 #include "program/commands/stop_signals.h"
 #include "program/commands/text_file.h"
+#include "program/fleet/collect_hosts.h"
 #include "program/reports/progress.h"
 #include "program/reports/report.h"
 #include "program/reports/report_sink.h"
@@ -87,21 +83,6 @@ NQORTQR20::ReadingNeeds NeedsOf(const std::vector<std::string>& wanted,
         needs.sensors |= info->Is(NQORTQR20::kReadsSensors);
     }
     return needs;
-}
-
-/// The host that a source names, as the user calls it: of a network source without its port, of a
-/// file without its folder and ending; else this machine.
-std::string HostOf(const std::string& source) {
-    const auto colon = source.find(':');
-    if (colon == std::string::npos) {
-        std::array<char, HOST_NAME_MAX + 1> name{};
-        return gethostname(name.data(), name.size() - 1) == 0 ? name.data() : source;
-    }
-    const std::string place = source.substr(colon + 1);
-    if (!source.starts_with("lan:")) return std::filesystem::path(place).stem().string();
-    if (place.starts_with('[')) return place.substr(1, place.find(']') - 1);
-    const auto port = place.find(':');
-    return port == place.rfind(':') ? place.substr(0, port) : place;  // several: an IPv6 address
 }
 
 /// One for each node, named as the user says, else by its source.
@@ -192,7 +173,7 @@ private:
     std::optional<ProgressLine> line_;
 };
 
-int CollectTo(const CollectOptions& options, ReportOutput& output) {
+Outcome CollectTo(const CollectOptions& options, ReportOutput& output) {
     const auto begin = std::chrono::steady_clock::now();
     // The plug-ins first: without them nobody is asked for a password.
     const std::unique_ptr<NQORTQR20::PluginSet> plugins = LoadPlugins(options.plugins);
@@ -260,9 +241,7 @@ int CollectTo(const CollectOptions& options, ReportOutput& output) {
         throw Failure(kExitUsage, "the capture " + *options.record +
                                       " is cut short; make room there, or name another --record");
     }
-    const Outcome outcome = OutcomeOf(end);
-    if (outcome.exitStatus != kExitCollected) Say(outcome.problem + "; " + outcome.advice);
-    return outcome.exitStatus;
+    return OutcomeOf(end);
 }
 
 constexpr const char* kExitStatusHelp =
@@ -296,7 +275,7 @@ std::vector<NamedFile> FilesOf(const CollectOptions& options) {
 
 }  // namespace
 
-int Collect(const CollectOptions& options) {
+Outcome CollectOutcome(const CollectOptions& options) {
     RefuseSameFile(FilesOf(options));
     const StopSignals signals;
     if (options.deadlineSeconds) {
@@ -307,9 +286,15 @@ int Collect(const CollectOptions& options) {
     }
     LogLines log(options.log);
     ReportOutput output(options.report);
-    const int status = CollectTo(options, output);
+    Outcome outcome = CollectTo(options, output);
     log.Finish();
-    return status;
+    return outcome;
+}
+
+int Collect(const CollectOptions& options) {
+    const Outcome outcome = CollectOutcome(options);
+    if (outcome.exitStatus != kExitCollected) Say(outcome.problem + "; " + outcome.advice);
+    return outcome.exitStatus;
 }
 
 Command AddCollectCommand(CLI::App* program) {
@@ -336,8 +321,12 @@ Command AddCollectCommand(CLI::App* program) {
     command->add_option("--severities", options->severities, "File with severities of your own")
         ->type_name("FILE")
         ->check(FileName());
+    const auto hosts = std::make_shared<HostsOptions>();
+    AddHostsOptions(command, hosts.get());
     command->footer(FormatHelp() + WorkaroundHelp() + kExitStatusHelp);
-    return {command, [options] { return Collect(*options); }};
+    return {command, [options, hosts] {
+                return hosts->lists.empty() ? Collect(*options) : CollectHosts(*options, *hosts);
+            }};
 }
 
 }  // namespace ipmisel

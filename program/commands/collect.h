@@ -24,7 +24,10 @@ struct CollectOptions {
     bool progress = true;  ///< on standard error, where that is a terminal
 };
 
-/// Collects and writes a report; the exit status. Throws Failure.
+/// Collects and writes a report; how it went, of which whoever runs it is still to be told. Throws
+/// Failure.
+Outcome CollectOutcome(const CollectOptions& options);
+/// The same, told; the exit status.
 int Collect(const CollectOptions& options);
 
 /// `ipmisel collect`.

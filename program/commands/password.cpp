@@ -39,12 +39,25 @@ private:
 
 [[noreturn]] void Refuse(const std::string& line) { throw Failure(kExitUsage, line); }
 
+/// "credential:NAME" is one that the service manager hands over, systemd.exec(5).
+std::string PathOf(const std::string& name) {
+    constexpr std::string_view kCredential = "credential:";
+    if (!name.starts_with(kCredential)) return name;
+    const char* const folder = std::getenv("CREDENTIALS_DIRECTORY");
+    if (folder == nullptr) {
+        Refuse("there is no " + name +
+               ": CREDENTIALS_DIRECTORY is not set; hand it over with "
+               "LoadCredential= in the service's unit");
+    }
+    return std::string(folder) + "/" + name.substr(kCredential.size());
+}
+
 std::string FromFile(const std::string& name, const std::string& what) {
     const auto refuse = [&name, &what](const char* why) {
         Refuse("cannot read a " + what + " from " + name + ": " + why + "; name a file with the " +
                what + " in its first line");
     };
-    const Descriptor file(open(name.c_str(), O_RDONLY | O_CLOEXEC));
+    const Descriptor file(open(PathOf(name).c_str(), O_RDONLY | O_CLOEXEC));
     if (file.get() < 0) refuse(std::strerror(errno));
     std::string line;
     for (char c = 0;;) {

@@ -7,6 +7,8 @@
 
 namespace ipmisel {
 
+// A file "credential:NAME" is the credential that a service has under this name.
+
 /// The password: the first line of the file, else the environment variable IPMISEL_PASSWORD, else
 /// what is typed at the terminal. Throws Failure when there is none to be had.
 std::string ReadPassword(const std::optional<std::string>& file);

@@ -22,6 +22,8 @@ public:
     OutputFile& operator=(const OutputFile&) = delete;
 
     void Write(std::string_view text);
+    /// What was written is with the reader, where the output is no regular file.
+    void Flush();
     /// Everything is on its way to the disk and stands in its place. Nothing may follow.
     void Commit();
 
@@ -29,7 +31,6 @@ private:
     void OpenBeside();
     /// Mode and owner of the file that is to be replaced.
     void TakeOver(const struct stat& before) const;
-    void Flush();
     [[noreturn]] void Fail(int error) const;
 
     std::string name_;       ///< as the user wrote it; empty for standard output

@@ -112,11 +112,15 @@ std::optional<std::int64_t> NodeOf(const NQORTQR20::Instance& instance, std::str
     return std::nullopt;
 }
 
+std::string_view NodeProperty(std::string_view className, const ReportHead& head) {
+    const auto info =
+        std::find_if(head.classes.begin(), head.classes.end(),
+                     [&](const NQORTQR20::ClassInfo& each) { return each.name == className; });
+    return info == head.classes.end() ? "Node" : std::string_view(info->nodeProperty);
+}
+
 std::optional<std::int64_t> NodeOf(const NQORTQR20::Instance& instance, const ReportHead& head) {
-    const auto info = std::find_if(
-        head.classes.begin(), head.classes.end(),
-        [&](const NQORTQR20::ClassInfo& each) { return each.name == instance.className; });
-    return NodeOf(instance, info == head.classes.end() ? "Node" : info->nodeProperty);
+    return NodeOf(instance, NodeProperty(instance.className, head));
 }
 
 Outcome OutcomeOf(const ReportEnd& end) {

@@ -70,6 +70,8 @@ struct ReportEnd {
 /// or that of its class; empty when it belongs to none.
 std::optional<std::int64_t> NodeOf(const NQORTQR20::Instance& instance, std::string_view property);
 std::optional<std::int64_t> NodeOf(const NQORTQR20::Instance& instance, const ReportHead& head);
+/// The property that says so in a class.
+std::string_view NodeProperty(std::string_view className, const ReportHead& head);
 
 /// How a report for people looks.
 struct ReportLook {

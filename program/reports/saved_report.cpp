@@ -6,6 +6,7 @@
 #include <cstring>
 #include <fstream>
 #include <limits>
+#include <utility>
 
 #include "program/commands/failure.h"
 #include "program/reports/completeness_json.h"
@@ -101,10 +102,15 @@ Instance InstanceOf(const Json& json) {
     return instance;
 }
 
-/// Parses the file; the elements of `instances` are handed over one by one and kept nowhere.
-Json Parse(const std::string& file, const std::function<void(const Json&)>& take) {
-    std::ifstream in(file, std::ios::binary);
-    if (!in) Fail(file, std::string("cannot be read: ") + std::strerror(errno));
+std::unique_ptr<std::istream> OpenFile(const std::string& file) {
+    auto in = std::make_unique<std::ifstream>(file, std::ios::binary);
+    if (!*in) Fail(file, std::string("cannot be read: ") + std::strerror(errno));
+    return in;
+}
+
+/// Parses a report; the elements of `instances` are handed over one by one and kept nowhere.
+Json Parse(const std::string& file, std::istream& in,
+           const std::function<void(const Json&)>& take) {
     bool inInstances = false;
     Json json = Json::parse(
         in,
@@ -163,8 +169,12 @@ NQORTQR20::NodeCompleteness CompletenessOf(const Json& json) {
 
 }  // namespace
 
-SavedReport::SavedReport(const std::string& file) : file_(file) {
-    const Json json = Parse(file, [](const Json&) {});
+SavedReport::SavedReport(const std::string& file)
+    : SavedReport(file, [file] { return OpenFile(file); }) {}
+
+SavedReport::SavedReport(std::string name, std::function<std::unique_ptr<std::istream>()> open)
+    : name_(std::move(name)), open_(std::move(open)) {
+    const Json json = Parse(name_, *open_(), [](const Json&) {});
     head_.source = TextAt(json, "source");
     head_.machineType = TextAt(json, "machine_type");
     head_.plugin = PluginOf(ObjectAt(json, "plugin"));
@@ -203,7 +213,7 @@ SavedReport::SavedReport(const std::string& file) : file_(file) {
 }
 
 void SavedReport::ForEach(const std::function<void(const Instance&)>& take) const {
-    Parse(file_, [&take](const Json& json) { take(InstanceOf(json)); });
+    Parse(name_, *open_(), [&take](const Json& json) { take(InstanceOf(json)); });
 }
 
 bool IsCapture(const std::string& file) {

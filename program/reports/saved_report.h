@@ -1,6 +1,8 @@
 #pragma once
 
 #include <functional>
+#include <istream>
+#include <memory>
 #include <string>
 
 #include "program/reports/report.h"
@@ -12,13 +14,16 @@ class SavedReport {
 public:
     /// Reads all but the instances. Throws Failure when the file cannot be read or is no report.
     explicit SavedReport(const std::string& file);
+    /// One that is read from elsewhere: each call opens it anew, at its beginning.
+    SavedReport(std::string name, std::function<std::unique_ptr<std::istream>()> open);
     const ReportHead& Head() const { return head_; }
     const ReportEnd& End() const { return end_; }
     /// The instances in their order. Throws Failure, and whatever `take` throws.
     void ForEach(const std::function<void(const NQORTQR20::Instance&)>& take) const;
 
 private:
-    std::string file_;
+    std::string name_;
+    std::function<std::unique_ptr<std::istream>()> open_;
     ReportHead head_;
     ReportEnd end_;
 };

@@ -16,6 +16,8 @@ class Spool {
 public:
     Spool();
     void Write(std::string_view text);
+    /// The file, for whoever reads parts of it; what was written is there after Rewind.
+    int Descriptor() const { return fileno(file_.get()); }
     /// All that was written, in one piece.
     void CopyTo(OutputFile& out);
 

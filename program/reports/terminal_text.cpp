@@ -21,6 +21,8 @@ std::size_t ByteAt(std::string_view text, std::size_t columns) {
     return std::min(at, text.size());
 }
 
+std::string gSaidFor;
+
 }  // namespace
 
 Character FirstCharacter(std::string_view text) {
@@ -105,8 +107,10 @@ std::string Fit(std::string_view text, std::size_t width) {
     return out + std::string(width - Columns(out), ' ');
 }
 
+void SayFor(const std::string& name) { gSaidFor = TerminalText(name) + ": "; }
+
 void Say(std::string_view text) {
-    const std::string line = "ipmisel: " + TerminalText(text) + "\n";
+    const std::string line = "ipmisel: " + gSaidFor + TerminalText(text) + "\n";
     HideProgress();
     // In one piece; there is nobody to tell when it fails.
     std::fwrite(line.data(), 1, line.size(), stderr);

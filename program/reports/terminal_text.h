@@ -32,5 +32,7 @@ std::string Fit(std::string_view text, std::size_t width);
 
 /// One line on standard error: "ipmisel: " and the text as TerminalText has it.
 void Say(std::string_view text);
+/// From now on Say puts a name before each text.
+void SayFor(const std::string& name);
 
 }  // namespace ipmisel

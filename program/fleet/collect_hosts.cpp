@@ -1,0 +1,237 @@
+#include "program/fleet/collect_hosts.h"
+
+#include <sys/resource.h>
+#include <unistd.h>
+
+#include <CLI/CLI.hpp>
+#include <algorithm>
+#include <chrono>
+#include <memory>
+#include <utility>
+
+#include "host/spdriver/stop.h"
+#include "program/commands/arguments.h"
+#include "program/commands/failure.h"
+#include "program/commands/plugins.h"
+#include "program/commands/stop_signals.h"
+#include "program/fleet/fleet_report.h"
+#include "program/fleet/host_list.h"
+#include "program/fleet/host_options.h"
+#include "program/fleet/worker.h"
+#include "program/fleet/worker_pool.h"
+#include "program/reports/progress.h"
+#include "program/reports/terminal.h"
+#include "program/reports/terminal_text.h"
+
+namespace ipmisel {
+namespace {
+
+using Clock = WorkerPool::Clock;
+
+constexpr int kMaxJobs = 4096;
+/// Beyond its deadline, for a worker to write what it has.
+constexpr std::chrono::seconds kTimeToEnd{5};
+constexpr std::chrono::seconds kMaxWait{1};
+
+/// What goes with one machine only.
+void RefuseOptions(const CollectOptions& options) {
+    const auto refuse = [](bool given, const char* option) {
+        if (!given) return;
+        throw Failure(kExitUsage, std::string(option) +
+                                      " goes with one collection; leave it out, or collect from "
+                                      "this controller alone with --from");
+    };
+    refuse(options.record.has_value(), "--record");
+    refuse(options.log.file.has_value(), "--log-file");
+    refuse(!options.names.empty(), "--name");
+    refuse(options.report.since.has_value(), "--since");
+    refuse(options.report.severity.has_value(), "--severity");
+    refuse(options.report.last.has_value(), "--last");
+}
+
+std::vector<HostEntry> HostsOf(const CollectOptions& options, const HostsOptions& hosts) {
+    std::vector<HostEntry> all;
+    for (const std::string& source : options.access.sources) all.push_back({source});
+    // The configuration has no groups yet.
+    for (HostEntry& host : ParseHostLists(hosts.lists, nullptr)) {
+        const bool isNew = std::none_of(
+            all.begin(), all.begin() + static_cast<std::ptrdiff_t>(options.access.sources.size()),
+            [&](const HostEntry& before) { return before.source == host.source; });
+        if (isNew) all.push_back(std::move(host));
+    }
+    return all;
+}
+
+std::string AsNamed(const CollectOptions& options, const HostsOptions& hosts) {
+    std::string text;
+    for (const auto* const names : {&options.access.sources, &hosts.lists}) {
+        for (const std::string& name : *names) text += (text.empty() ? "" : ",") + name;
+    }
+    return text + (hosts.shard ? ", part " + *hosts.shard : "");
+}
+
+/// Three descriptors a worker, and some of our own.
+void RaiseFileLimit() {
+    rlimit limit{};
+    if (getrlimit(RLIMIT_NOFILE, &limit) != 0) return;
+    limit.rlim_cur = limit.rlim_max;
+    setrlimit(RLIMIT_NOFILE, &limit);
+}
+
+class Collection {
+public:
+    Collection(const CollectOptions& options, std::size_t jobs, FleetReport& report)
+        : options_(options), report_(report), pool_(jobs, [](std::string_view line) {
+              HideProgress();
+              std::fprintf(stderr, "%.*s\n", static_cast<int>(line.size()), line.data());
+          }) {}
+
+    /// Says on the terminal how far it is.
+    void BeginProgress() { progress_.emplace(); }
+
+    Outcome Run(const std::vector<HostEntry>& hosts, HostOptions* own) {
+        const SignalsHeld held;
+        StopSignals::BeginCollecting();
+        std::size_t next = 0;
+        while (next < hosts.size() || pool_.Running() > 0) {
+            if (NQORTQR20::Stopped() != NQORTQR20::StopReason::kNone) {
+                if (!std::exchange(stopped_, true)) pool_.Stop();
+                for (; next < hosts.size(); ++next) LeaveOut(next, own->Of(hosts[next]));
+            }
+            for (; next < hosts.size() && pool_.HasRoom(); ++next) {
+                Start(next, own->Of(hosts[next]));
+            }
+            for (WorkerEnd& end : pool_.Wait(Clock::now() + kMaxWait)) Take(std::move(end));
+            ShowProgress(hosts.size());
+        }
+        StopSignals::EndCollecting();
+        progress_.reset();
+        return outcome_.Get();
+    }
+
+private:
+    void Start(std::size_t index, CollectOptions options) {
+        options.report.format = WorkerFormat(options_.report.format);
+        options.report.classes = options_.report.classes;
+        const std::chrono::duration<double> deadline(*options.deadlineSeconds);
+        const auto limit =
+            Clock::now() + std::chrono::duration_cast<Clock::duration>(deadline) + kTimeToEnd;
+        names_.resize(std::max(names_.size(), index + 1));
+        names_[index] = {options.access.sources.front(), options.names.front()};
+        pool_.Start(index, options.names.front(), WriteWorkerRequest(options), limit);
+    }
+    void LeaveOut(std::size_t index, const CollectOptions& options) {
+        Add({index,
+             options.access.sources.front(),
+             options.names.front(),
+             {{kExitNoSource, "interrupted before it was its turn", ""}},
+             {}});
+    }
+    void Take(WorkerEnd end) {
+        const auto& [source, name] = names_[end.id];
+        const Outcome& outcome = end.result.outcome;
+        if (outcome.exitStatus != kExitCollected) {
+            Say(name + ": " + outcome.problem +
+                (outcome.advice.empty() ? "" : "; " + outcome.advice));
+        }
+        Add({end.id, source, name, std::move(end.result), std::move(end.report)});
+    }
+    void Add(const ControllerEnd& end) {
+        outcome_.Add(end.result.outcome);
+        ++done_;
+        if (end.result.outcome.exitStatus != kExitCollected) ++failed_;
+        report_.Add(end);
+    }
+    void ShowProgress(std::size_t all) {
+        if (!progress_ || !progress_->Enabled()) return;
+        const std::string note = failed_ == 0 ? "" : std::to_string(failed_) + " not read whole";
+        progress_->Show({.what = "collecting",
+                         .done = done_,
+                         .total = all,
+                         .unit = "controllers",
+                         .note = note});
+    }
+
+    const CollectOptions& options_;
+    FleetReport& report_;
+    FleetOutcome outcome_;
+    std::optional<ProgressLine> progress_;
+    std::size_t done_ = 0, failed_ = 0;
+    bool stopped_ = false;
+    std::vector<std::pair<std::string, std::string>> names_;  ///< source and name, by index
+    WorkerPool pool_;
+};
+
+}  // namespace
+
+void AddHostsOptions(CLI::App* command, HostsOptions* options) {
+    command
+        ->add_option("--hosts", options->lists,
+                     "Many controllers: node[001-128]-bmc,rack7, @FILE with a host a line, "
+                     "%GROUP of the configuration; each in a process of its own")
+        ->type_name("LIST")
+        ->allow_extra_args(false)
+        ->check(NotEmpty("the list is empty; name hosts"));
+    command->add_option("--jobs", options->jobs, "Controllers of --hosts at a time")
+        ->type_name("N")
+        ->capture_default_str()
+        ->check(Number(1, kMaxJobs));
+    command->add_option("--shard", options->shard, "The I-th of N parts of the list")
+        ->type_name("I/N")
+        ->check(CLI::Validator(
+            [](const std::string& text) {
+                return ParseShard(text) ? std::string()
+                                        : "\"" + text +
+                                              "\" is no part; write it as 3/8, from 1/8 "
+                                              "to 8/8";
+            },
+            ""));
+}
+
+int CollectHosts(const CollectOptions& options, const HostsOptions& hosts) {
+    RefuseOptions(options);
+    std::vector<HostEntry> list = HostsOf(options, hosts);
+    const FormatInfo& format = *FindFormat(options.report.format);
+    CollectOptions common = options;
+    ReportHead head{.source = AsNamed(options, hosts),
+                    .plugin = {},
+                    .machineType = "",
+                    .collected = {std::chrono::duration_cast<std::chrono::seconds>(
+                                      std::chrono::system_clock::now().time_since_epoch())
+                                      .count()}};
+    {
+        const auto plugins = LoadPlugins(options.plugins);
+        head.plugin = plugins->Plugins().front()->Info();
+        head.classes = plugins->Classes();
+        head.wanted = ClassesToCollect(options.report.classes, format.classes, *plugins);
+        head.named = !options.report.classes.empty();
+    }
+    // What a worker makes of its own is for another format than this one.
+    if (WorkerFormat(format.name) != format.name) common.report.classes = head.wanted;
+    HostOptions own(common, list);
+    if (hosts.shard) {
+        std::erase_if(list, [shard = *ParseShard(*hosts.shard)](const HostEntry& host) {
+            return !shard.Has(host.source);
+        });
+    }
+    RaiseFileLimit();
+    const StopSignals signals;
+    OutputFile out(options.report.output);
+    const bool toFile = options.report.output.has_value() && *options.report.output != "-";
+    const auto report =
+        MakeFleetReport(format, out, head, LookOfOutput(options.report.colour, toFile));
+    Collection collection(common, hosts.jobs, *report);
+    const bool linesToTerminal =
+        WorkerFormat(format.name) == format.name && !toFile && isatty(STDOUT_FILENO) == 1;
+    if (options.progress && !linesToTerminal) collection.BeginProgress();
+    const Outcome outcome = collection.Run(list, &own);
+    Pager pager;
+    if (format.name == "table" && options.report.pager && !toFile) pager.Start();
+    report->Finish(outcome);
+    out.Commit();
+    pager.Wait();
+    if (outcome.exitStatus != kExitCollected) Say(outcome.problem + "; " + outcome.advice);
+    return outcome.exitStatus;
+}
+
+}  // namespace ipmisel
