@@ -91,10 +91,9 @@ Source OpenInbandDevice(const std::vector<std::filesystem::path>& devices, Syste
         std::string(kLoadDriver));
 }
 
-Source OpenInband(const std::vector<std::string>& /*places*/, const SourceOptions& options) {
-    return OpenInbandDevice(
-        {"/dev/ipmi0", "/dev/ipmi/0", "/dev/ipmidev/0"}, {ReadSystemSmbios(), SystemSmbiosError()},
-        std::chrono::milliseconds(static_cast<std::int64_t>(options.timeoutSeconds * 1000)));
+Source OpenInband(const std::vector<std::string>& /*places*/, const Access& access) {
+    return OpenInbandDevice({"/dev/ipmi0", "/dev/ipmi/0", "/dev/ipmidev/0"},
+                            {ReadSystemSmbios(), SystemSmbiosError()}, access.timeout);
 }
 
 }  // namespace tqrhost

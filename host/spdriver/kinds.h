@@ -14,9 +14,9 @@
 namespace tqrhost {
 
 /// A simulated server that a file describes.
-Source OpenSimulated(const std::vector<std::string>& places, const SourceOptions& options);
+Source OpenSimulated(const std::vector<std::string>& places, const Access& access);
 /// The exchanges of a capture file.
-Source OpenReplay(const std::vector<std::string>& places, const SourceOptions& options);
+Source OpenReplay(const std::vector<std::string>& places, const Access& access);
 
 /// What is known of the SMBIOS of this machine.
 struct SystemSmbios {
@@ -24,7 +24,7 @@ struct SystemSmbios {
     int error = 0;  ///< why it may not be read although it is there: an error number of the system
 };
 /// This machine's BMC through the kernel's driver.
-Source OpenInband(const std::vector<std::string>& places, const SourceOptions& options);
+Source OpenInband(const std::vector<std::string>& places, const Access& access);
 /// The same over given device files and SMBIOS structures. Without a device that has a driver, but
 /// with an IPMI device record (type 38), the source opens with a node that never answers, so that
 /// the missing driver can be reported. `timeout` is how long one request may go unanswered.
@@ -33,7 +33,7 @@ Source OpenInbandDevice(const std::vector<std::filesystem::path>& devices, Syste
 #ifdef IPMISEL_LAN
 /// BMCs over the network, each HOST, HOST:PORT, [ADDRESS] or [ADDRESS]:PORT. The sessions are
 /// opened together.
-Source OpenLan(const std::vector<std::string>& places, const SourceOptions& options);
+Source OpenLan(const std::vector<std::string>& places, const Access& access);
 #endif
 
 }  // namespace tqrhost

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "host/spdriver/kinds.h"
-#include "host/spdriver/lan/lan_access.h"
+#include "host/spdriver/lan/lan_place.h"
 #include "host/spdriver/lan/lan_session.h"
 #include "host/spdriver/lan/name_lookup.h"
 #include "host/spdriver/stop.h"
@@ -15,10 +15,28 @@
 namespace tqrhost {
 namespace {
 
+constexpr std::size_t kMaxPassword = 20;
+
+/// With the password and the key, which are asked for here.
+LanSessionOptions OptionsOf(const Access& access) {
+    LanSessionOptions options{.credentials = {.user = access.user,
+                                              .password = access.password ? access.password() : "",
+                                              .kg = {},
+                                              .privilege = access.privilege,
+                                              .deviations = access.deviations},
+                              .cipherSuites = access.cipherSuites,
+                              .window = access.window,
+                              .timeout = access.timeout};
+    if (options.credentials.password.size() > kMaxPassword) {
+        throw SourceUsageError("the password is longer than the 20 bytes of IPMI 2.0; check it");
+    }
+    if (access.kg) options.credentials.kg = access.kg();
+    return options;
+}
+
 /// A BMC on its way to be a node.
 struct Candidate {
     std::string name;  ///< as the user wrote it
-    LanAccess access;
     NameLookup lookup;
     std::unique_ptr<LanSession> session;
     std::optional<OpeningError> error;
@@ -37,13 +55,13 @@ LookupResult Look(const NameLookup& lookup, Clock::time_point deadline) {
     }
 }
 
-void BeginOpening(Candidate* candidate, Clock::time_point deadline) {
+void BeginOpening(Candidate* candidate, const LanSessionOptions& options,
+                  Clock::time_point deadline) {
     const LookupResult found = Look(candidate->lookup, deadline);
     candidate->error = found.error;
     if (found.error) return;
     try {
-        candidate->session =
-            std::make_unique<LanSession>(candidate->name, candidate->access.session);
+        candidate->session = std::make_unique<LanSession>(candidate->name, options);
         candidate->session->Open(found.endpoints, Clock::now());
     } catch (OpeningError error) {
         candidate->error = error;
@@ -58,18 +76,18 @@ std::optional<OpeningError> ErrorOf(const Candidate& candidate) {
 
 }  // namespace
 
-Source OpenLan(const std::vector<std::string>& places, const SourceOptions& options) {
+Source OpenLan(const std::vector<std::string>& places, const Access& access) {
     std::vector<Candidate> candidates;
     for (const std::string& place : places) {
-        LanAccess access = ParseLanAccess(place, options);
-        NameLookup lookup(access.host, access.port);
-        candidates.push_back({"lan:" + place, std::move(access), std::move(lookup), nullptr, {}});
+        const LanPlace at = ParseLanPlace(place);
+        candidates.push_back({"lan:" + place, NameLookup(at.host, at.port), nullptr, {}});
     }
+    const LanSessionOptions options = OptionsOf(access);
     std::vector<LanSession*> opening;
     const auto began = Clock::now();
     try {
         for (Candidate& candidate : candidates) {
-            BeginOpening(&candidate, began + candidate.access.session.timeout);
+            BeginOpening(&candidate, options, began + options.timeout);
             if (!candidate.error) opening.push_back(candidate.session.get());
         }
         OpenTogether(opening);
@@ -96,9 +114,3 @@ Source OpenLan(const std::vector<std::string>& places, const SourceOptions& opti
 }
 
 }  // namespace tqrhost
-
-namespace NQORTQR20 {
-
-std::span<const WorkaroundInfo> KnownWorkarounds() { return tqrhost::LanWorkarounds(); }
-
-}  // namespace NQORTQR20

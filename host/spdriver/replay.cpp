@@ -220,7 +220,7 @@ std::optional<std::string> ReadLine(std::istream& in, bool* whole) {
 
 }  // namespace
 
-Source OpenReplay(const std::vector<std::string>& places, const SourceOptions& /*options*/) {
+Source OpenReplay(const std::vector<std::string>& places, const Access& /*access*/) {
     const std::string& place = places.front();
     Source source;
     Nodes nodes;

@@ -24,7 +24,7 @@ private:
 
 }  // namespace
 
-Source OpenSimulated(const std::vector<std::string>& places, const SourceOptions& /*options*/) {
+Source OpenSimulated(const std::vector<std::string>& places, const Access& /*access*/) {
     const std::string& place = places.front();
     ipmisim::ServerDescription server;
     try {

@@ -19,7 +19,7 @@ struct Kind {
     bool joins;              ///< several of them make one machine
     /// One place, or several of a kind that joins: their nodes follow each other.
     /// Null for a kind that is not built in.
-    Source (*open)(const std::vector<std::string>& places, const SourceOptions& options);
+    Source (*open)(const std::vector<std::string>& places, const Access& access);
 };
 
 constexpr Kind kKinds[] = {
@@ -60,22 +60,11 @@ std::string PlaceOf(const std::string& source, const Kind& kind) {
     return place;
 }
 
-/// The password is asked for at most once, however many nodes want it.
-SourceOptions AskOnce(SourceOptions options) {
-    if (!options.password) return options;
-    options.password = [ask = std::move(options.password),
-                        answer = std::make_shared<std::optional<std::string>>()] {
-        if (!*answer) *answer = ask();
-        return **answer;
-    };
-    return options;
-}
-
 }  // namespace
 
 Source OpenSources(const std::vector<std::string>& sources, const SourceOptions& options) {
     if (sources.empty()) throw SourceError("no source is named");
-    const SourceOptions askOnce = AskOnce(options);
+    const Access access = ParseAccess(options);
     for (const std::string& source : sources) {
         if (FindKind(source).joins || sources.size() == 1) continue;
         throw SourceUsageError("the source \"" + source +
@@ -85,11 +74,7 @@ Source OpenSources(const std::vector<std::string>& sources, const SourceOptions&
     std::vector<std::string> places;
     places.reserve(sources.size());
     for (const std::string& source : sources) places.push_back(PlaceOf(source, kind));
-    return kind.open(places, askOnce);
+    return kind.open(places, access);
 }
-
-#ifndef IPMISEL_LAN
-std::span<const WorkaroundInfo> KnownWorkarounds() { return {}; }
-#endif
 
 }  // namespace NQORTQR20

@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "host/core/host.h"
+#include "host/spdriver/access.h"
 #include "host/spdriver/completeness.h"
 #include "host/spdriver/pipeline.h"
 #include "host/spdriver/transport.h"
@@ -20,35 +21,6 @@
 // Where a machine is reached: what the user says of it, and what comes of it.
 
 namespace NQORTQR20 {
-
-/// Why a source could not be opened; what() is one line for the user that says what to do.
-struct SourceError : std::runtime_error {
-    using std::runtime_error::runtime_error;
-};
-/// The sources are named wrongly: a kind that is not known, kinds that do not go together, or
-/// options that no BMC could be opened with.
-struct SourceUsageError : SourceError {
-    using SourceError::SourceError;
-};
-
-/// What the user said about access, as it was said.
-struct SourceOptions {
-    std::optional<std::string> user;
-    std::function<std::string()> password;          ///< asked for only where a password is needed
-    std::function<std::vector<std::uint8_t>()> kg;  ///< the BMC's own key; empty: it has none
-    std::optional<int> cipherSuite;                 ///< by number; else the best that the BMC has
-    std::string privilege = "admin";                ///< user, operator, admin
-    std::vector<std::string> workarounds;           ///< names of KnownWorkarounds()
-    std::optional<int> window;                      ///< requests outstanding
-    double timeoutSeconds = 20;  ///< how long one request may go unanswered in all
-};
-
-struct WorkaroundInfo {
-    std::string_view name;
-    std::string_view description;
-};
-/// The known deviations of BMCs that a user may ask to put up with.
-std::span<const WorkaroundInfo> KnownWorkarounds();
 
 /// One BMC node of a source: either of the two ways is set.
 struct SourceNode {

@@ -52,28 +52,33 @@ void AddAccessOptions(CLI::App* command, AccessOptions* options) {
         ->add_option("--cipher-suite", options->source.cipherSuite,
                      "Cipher suite by number; 17, else 3 when left out")
         ->type_name("N")
-        ->check(Number(0, 255));
+        ->check(Number());
     command->add_option("--privilege", options->source.privilege, "Privilege of the session")
-        ->type_name("LEVEL")
-        ->capture_default_str()
-        ->check(OneOf({"user", "operator", "admin"}));
+        ->type_name("LEVEL:user, operator, admin")
+        ->capture_default_str();
     command
         ->add_option("--workaround", options->source.workarounds,
                      "Deviation of the BMC to put up with; see below")
         ->type_name("NAME")
-        ->allow_extra_args(false)
-        ->check(OneOf(Names(NQORTQR20::KnownWorkarounds()), false));
+        ->allow_extra_args(false);
     command
         ->add_option("--window", options->source.window,
                      "Most requests outstanding; adaptive when left out")
         ->type_name("N")
-        ->check(Number(1, 32));
+        ->check(Number());
     command
         ->add_option("--timeout", options->source.timeoutSeconds,
                      "Seconds that one request may go unanswered")
         ->type_name("SECONDS")
-        ->capture_default_str()
-        ->check(Seconds(kSecondsPerDay));
+        ->capture_default_str();
+    // What is wrong is refused before anything else is done.
+    command->final_callback([options] {
+        try {
+            NQORTQR20::ParseAccess(options->source);
+        } catch (const NQORTQR20::SourceUsageError& error) {
+            throw CLI::ValidationError(error.what());
+        }
+    });
 }
 
 std::string HostOf(const std::string& source) {

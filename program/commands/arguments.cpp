@@ -43,6 +43,16 @@ CLI::Validator Number(int min, int max) {
         "");
 }
 
+CLI::Validator Number() {
+    return CLI::Validator(
+        [](const std::string& text) {
+            int number = 0;
+            if (CLI::detail::lexical_cast(text, number)) return std::string();
+            return "\"" + text + "\" is no number";
+        },
+        "");
+}
+
 CLI::Validator NotEmpty(const std::string& message) {
     return CLI::Validator(
         [message](const std::string& text) { return text.empty() ? message : std::string(); }, "");

@@ -13,6 +13,8 @@ CLI::Validator OneOf(std::vector<std::string> names, bool listInHelp = true);
 /// Seconds, more than none and at most so many.
 CLI::Validator Seconds(double max);
 CLI::Validator Number(int min, int max);
+/// Any number, whose range is looked at elsewhere.
+CLI::Validator Number();
 /// A text that is not empty, else this message.
 CLI::Validator NotEmpty(const std::string& message);
 CLI::Validator FileName();

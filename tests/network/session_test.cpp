@@ -8,10 +8,11 @@
 #include <mutex>
 #include <thread>
 
-#include "host/spdriver/lan/lan_access.h"
+#include "host/spdriver/lan/lan_place.h"
 #include "host/spdriver/lan/lan_session.h"
 #include "host/spdriver/lan/name_lookup.h"
 #include "host/spdriver/pipeline.h"
+#include "host/spdriver/source.h"
 #include "host/spdriver/stop.h"
 #include "simulator/network_bmc.h"
 
@@ -37,9 +38,18 @@ protected:
     void TearDown() override { ClearStop(); }
 
     std::unique_ptr<LanSession> Open(const NetworkBmc& peer) {
-        const LanAccess access = ParseLanAccess(peer.Place().substr(4), options);
-        auto session = std::make_unique<LanSession>(peer.Place(), access.session);
-        const auto found = NameLookup(access.host, access.port).Wait(Clock::now());
+        const Access access = ParseAccess(options);
+        const LanPlace place = ParseLanPlace(peer.Place().substr(4));
+        auto session = std::make_unique<LanSession>(
+            peer.Place(), LanSessionOptions{{.user = access.user,
+                                             .password = access.password(),
+                                             .kg = {},
+                                             .privilege = access.privilege,
+                                             .deviations = access.deviations},
+                                            access.cipherSuites,
+                                            access.window,
+                                            access.timeout});
+        const auto found = NameLookup(place.host, place.port).Wait(Clock::now());
         session->Open(found->endpoints, Clock::now());
         LanSession* const opening[] = {session.get()};
         OpenTogether(opening);

@@ -47,7 +47,7 @@ LanSession::LanSession(std::string name, LanSessionOptions options)
       options_(std::move(options)),
       requests_({.window = options_.window,
                  .timeout = options_.timeout,
-                 .anySessionNumber = options_.anySessionNumber,
+                 .anySessionNumber = options_.credentials.deviations.sessionNumbers,
                  .failed = LogNoResponse}) {}
 
 LanSession::~LanSession() {
@@ -70,8 +70,6 @@ void LanSession::BeginOpening(bool again, Clock::time_point now) {
     opening_.emplace(options_.credentials,
                      SessionOpening::Options{.cipherSuites = options_.cipherSuites,
                                              .deadline = now + options_.timeout,
-                                             .skipCapabilities = options_.skipCapabilities,
-                                             .anySessionNumber = options_.anySessionNumber,
                                              .again = again});
     opening_->Start(now);
     opening_->TakePackets(&toSend_);

@@ -21,8 +21,6 @@ struct LanSessionOptions {
     std::vector<int> cipherSuites;   ///< to be tried, the best first; nothing else is ever used
     std::optional<unsigned> window;  ///< fixed; adaptive when left out
     std::chrono::milliseconds timeout{20000};  ///< how long one request may go unanswered in all
-    bool skipCapabilities = false;             ///< workaround: a BMC that answers them wrongly
-    bool anySessionNumber = false;  ///< workaround: one whose session sequence numbers mean nothing
 };
 
 /// A session with one BMC over RMCP+ (IPMI 2.0, chapter 13): the socket, the opening, the requests.

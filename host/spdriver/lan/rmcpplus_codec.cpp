@@ -31,24 +31,6 @@ constexpr std::uint8_t kRakp2 = 0x13;
 constexpr std::uint8_t kRakp3 = 0x14;
 constexpr std::uint8_t kRakp4 = 0x15;
 
-// Algorithm numbers, tables 13-17 to 13-19.
-constexpr std::uint8_t kRakpHmacSha1 = 1;
-constexpr std::uint8_t kRakpHmacSha256 = 3;
-constexpr std::uint8_t kNoIntegrity = 0;
-constexpr std::uint8_t kHmacSha1_96 = 1;
-constexpr std::uint8_t kHmacSha256_128 = 4;
-constexpr std::uint8_t kNoConfidentiality = 0;
-constexpr std::uint8_t kAesCbc128 = 1;
-
-constexpr CipherSuite kCipherSuites[] = {
-    {1, kRakpHmacSha1, kNoIntegrity, kNoConfidentiality},
-    {2, kRakpHmacSha1, kHmacSha1_96, kNoConfidentiality},
-    {3, kRakpHmacSha1, kHmacSha1_96, kAesCbc128},
-    {15, kRakpHmacSha256, kNoIntegrity, kNoConfidentiality},
-    {16, kRakpHmacSha256, kHmacSha256_128, kNoConfidentiality},
-    {17, kRakpHmacSha256, kHmacSha256_128, kAesCbc128},
-};
-
 Hmac::Digest DigestOf(const CipherSuite& suite) {
     return suite.authentication == kRakpHmacSha1 ? Hmac::Digest::kSha1 : Hmac::Digest::kSha256;
 }
@@ -130,13 +112,6 @@ Packet& Packet::Append(ByteView bytes) {
 Packet& Packet::Fill(std::size_t count, std::uint8_t value) {
     for (; count > 0; --count) U8(value);
     return *this;
-}
-
-const CipherSuite* FindCipherSuite(int id) {
-    const auto* const found =
-        std::find_if(std::begin(kCipherSuites), std::end(kCipherSuites),
-                     [id](const CipherSuite& suite) { return suite.id == id; });
-    return found == std::end(kCipherSuites) ? nullptr : found;
 }
 
 // --- Before the session -----------------------------------------------------------------------

@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+#include "host/spdriver/access.h"
+#include "host/spdriver/lan/cipher_suites.h"
 #include "host/spdriver/lan/crypto.h"
 #include "ipmi/command.h"
 
@@ -20,6 +22,8 @@
 // everything from the authentication type on.
 
 namespace tqrhost::rmcpplus {
+
+using NQORTQR20::Deviations;
 
 /// A packet to be sent, in a room of its own.
 class Packet {
@@ -40,30 +44,6 @@ public:
 private:
     std::array<std::uint8_t, kCapacity> bytes_;
     std::size_t size_ = 0;
-};
-
-/// A cipher suite by its number (IPMI 2.0, table 22-20) and its algorithm numbers.
-struct CipherSuite {
-    int id;
-    std::uint8_t authentication;
-    std::uint8_t integrity;
-    std::uint8_t confidentiality;
-};
-/// Null for a suite that is not supported here.
-const CipherSuite* FindCipherSuite(int id);
-
-/// What a BMC does otherwise than the standard has it, and is put up with.
-struct Deviations {
-    /// The user name padded to 16 bytes; but for the code of RAKP 3, which leaves out the bit for
-    /// the lookup by name too. The code of RAKP 4 by the integrity algorithm.
-    bool paddedUserName = false;
-    /// The code of RAKP 2 is a byte longer than its algorithm makes it, and the payload's length
-    /// with it or alone.
-    bool longRakp2Code = false;
-    /// Open Session does not say which privilege it grants.
-    bool openSessionPrivilege = false;
-    /// Checksums of answers are wrong.
-    bool checksums = false;
 };
 
 /// Who opens a session, and as what.

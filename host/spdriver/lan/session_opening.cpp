@@ -109,7 +109,8 @@ void SessionOpening::SendStep(Clock::time_point now) {
     switch (step_) {
         case Step::kOpenSession:
             // Once: a BMC that takes one packet at a time would drop the second every time.
-            if (!options_.skipCapabilities && !options_.again && attempts_ == 0 && tries_ == 0) {
+            if (!credentials_.deviations.capabilities && !options_.again && attempts_ == 0 &&
+                tries_ == 0) {
                 toSend_.push_back(rmcpplus::AuthenticationCapabilitiesRequest(
                     credentials_.privilege, tag_ & kSixBits));
             }
@@ -266,7 +267,7 @@ void SessionOpening::HandleRakp4(ByteView packet, Clock::time_point now) {
 void SessionOpening::HandlePrivilege(ByteView packet) {
     const auto answer = session_.codec->ParseAnswer(packet);
     if (!answer || answer->command != ipmi::kSetSessionPrivilegeLevel) return;
-    if (!options_.anySessionNumber && !session_.received.IsNew(answer->sequence)) {
+    if (!credentials_.deviations.sessionNumbers && !session_.received.IsNew(answer->sequence)) {
         badNumber_ = true;
         return;
     }

@@ -21,8 +21,6 @@ public:
     struct Options {
         std::vector<int> cipherSuites;  ///< to be tried, the best first; nothing else is ever used
         Clock::time_point deadline{};
-        bool skipCapabilities = false;  ///< workaround: a BMC that answers them wrongly
-        bool anySessionNumber = false;  ///< workaround: one whose session numbers mean nothing
         bool again = false;  ///< a session was open before: a port that refuses may open again
     };
     enum class State { kOpening, kOpen, kFailed };

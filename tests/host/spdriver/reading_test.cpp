@@ -177,6 +177,12 @@ TEST_F(Reading, AControllerThatGivesNoWholeRecordsIsAskedForParts) {
         }
         bmc.faults = {fault};
         Read({.window = 4});
+        EXPECT_GE(std::count_if(asked.begin(), asked.end(),
+                                [](const ipmi::Command& command) {
+                                    return command.code() == ipmi::kGetSdr && command.data[5] <= 22;
+                                }),
+                  3)
+            << code;
         asked.clear();
         for (std::uint16_t id = 1; id <= 3; ++id) {
             const Answer record = Ask(ipmi::GetSdr(id));

@@ -133,7 +133,7 @@ TEST(SessionOpening, WhatFailsIsToldApart) {
 TEST(SessionOpening, DeniedIpmi20IsPassedOverWhenAskedTo) {
     Opening opening;
     opening.bmc.deviations.noIpmi20 = true;
-    opening.options.skipCapabilities = true;
+    opening.credentials.deviations.capabilities = true;
     EXPECT_EQ(opening.Run(), std::nullopt);
 }
 
