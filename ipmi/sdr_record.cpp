@@ -165,6 +165,24 @@ bool ReadAssociation(Bytes bytes, SdrRecord* record) {
     return in.ok();
 }
 
+/// What every locator ends with: whose it is, and its name. False when the name is not whole.
+template <typename Locator>
+bool ReadNamedEntity(ByteReader in, Bytes bytes, Locator locator, SdrRecord* record) {
+    locator.entity = ReadEntity(&in);
+    if (!in.ok()) locator.entity = {};
+    const bool whole = ReadName(bytes, kLocatorName, &locator.name);
+    record->body = std::move(locator);
+    return whole;
+}
+
+/// The end of a locator of a device: its type before that.
+template <typename Locator>
+bool ReadDevice(ByteReader in, Bytes bytes, Locator locator, SdrRecord* record) {
+    locator.deviceType = in.U8();
+    locator.deviceTypeModifier = in.U8();
+    return ReadNamedEntity(in, bytes, std::move(locator), record);
+}
+
 bool ReadFruLocator(Bytes bytes, SdrRecord* record) {
     ByteReader in(bytes.subspan(kSdrHeaderLength));
     FruLocator locator;
@@ -176,14 +194,8 @@ bool ReadFruLocator(Bytes bytes, SdrRecord* record) {
     locator.isLogical = (access & 0x80) != 0;
     locator.lun = access >> 3 & 0x03;
     locator.bus = access & 0x07;
-    in.U8();
-    locator.deviceType = in.U8();
-    locator.deviceTypeModifier = in.U8();
-    locator.entity = ReadEntity(&in);
-    if (!in.ok()) locator.entity = {};
-    const bool whole = ReadName(bytes, kLocatorName, &locator.name);
-    record->body = std::move(locator);
-    return whole;
+    in.Skip(1);  // reserved
+    return ReadDevice(in, bytes, std::move(locator), record);
 }
 
 bool ReadGenericLocator(Bytes bytes, SdrRecord* record) {
@@ -198,13 +210,7 @@ bool ReadGenericLocator(Bytes bytes, SdrRecord* record) {
     locator.lun = where >> 3 & 0x03;
     locator.bus = where & 0x07;
     in.Skip(2);  // address span, reserved
-    locator.deviceType = in.U8();
-    locator.deviceTypeModifier = in.U8();
-    locator.entity = ReadEntity(&in);
-    if (!in.ok()) locator.entity = {};
-    const bool whole = ReadName(bytes, kLocatorName, &locator.name);
-    record->body = std::move(locator);
-    return whole;
+    return ReadDevice(in, bytes, std::move(locator), record);
 }
 
 bool ReadControllerLocator(Bytes bytes, SdrRecord* record) {
@@ -216,11 +222,7 @@ bool ReadControllerLocator(Bytes bytes, SdrRecord* record) {
     in.U8();  // power states, initialisation
     locator.capabilities = in.U8();
     in.Skip(3);
-    locator.entity = ReadEntity(&in);
-    if (!in.ok()) locator.entity = {};
-    const bool whole = ReadName(bytes, kLocatorName, &locator.name);
-    record->body = std::move(locator);
-    return whole;
+    return ReadNamedEntity(in, bytes, std::move(locator), record);
 }
 
 bool ReadConfirmation(Bytes bytes, SdrRecord* record) {
