@@ -27,22 +27,29 @@ std::string_view EventStateName(EventState state) {
     }
 }
 
-ipmi::SensorKey Event::sensorKey() const {
+bool EventTarget::MayBe(const EventTarget& other) const {
+    const auto mayBe = [](const auto& a, const auto& b) { return !a || !b || *a == *b; };
+    return mayBe(memoryModule, other.memoryModule) && mayBe(slotNumber, other.slotNumber) &&
+           mayBe(processorInstance, other.processorInstance) &&
+           mayBe(sensorNumber, other.sensorNumber) && mayBe(fruDevice, other.fruDevice);
+}
+
+ipmi::SensorKey LoggedEvent::sensorKey() const {
     constexpr std::size_t kOwner = 7;
     return {
         .owner = record.bytes[kOwner], .lun = record.generator.lun, .number = record.sensorNumber};
 }
 
-const SensorFacts* Event::agreeingSensor() const {
+const SensorFacts* LoggedEvent::agreeingSensor() const {
     return sensor != nullptr && sensor->sensor.sensorType == record.sensorType ? sensor : nullptr;
 }
 
-bool Event::IsAsserted(std::uint8_t sensorType, std::uint8_t offset) const {
+bool LoggedEvent::IsAsserted(std::uint8_t sensorType, std::uint8_t offset) const {
     return isSensorEvent() && !record.deassertion && record.sensorType == sensorType &&
            record.eventType == ipmi::kSensorSpecificEvents && record.offset() == offset;
 }
 
-bool IsLogCleared(const Event& event) {
+bool IsLogCleared(const LoggedEvent& event) {
     constexpr std::uint8_t kCleared = 2;
     return event.IsAsserted(ipmi::sensor_type::kEventLoggingDisabled, kCleared);
 }

@@ -23,11 +23,28 @@ enum class EventState : std::uint8_t { kOpen, kResolved, kMomentary };
 /// "open", "resolved", "momentary".
 std::string_view EventStateName(EventState state);
 
-/// A record of the event log with all that is known of it. Times are seconds since 1970-01-01 UTC;
-/// other events are named by their place in the log, from 0. What is not known is empty.
-struct Event {
+/// What the data of an event name: two events of a sensor that name different ones are not about
+/// the same.
+struct EventTarget {
+    std::optional<std::uint8_t> memoryModule, slotType, slotNumber, processorInstance, sensorNumber,
+        fruDevice;
+    explicit EventTarget(const ipmi::EventData& data)
+        : memoryModule(data.memoryModule),
+          slotType(data.slotType),
+          slotNumber(data.slotNumber),
+          processorInstance(data.processorInstance),
+          sensorNumber(data.sensorNumber),
+          fruDevice(data.fruDevice) {}
+    EventTarget() = default;
+    /// What only one of them names may be the same.
+    bool MayBe(const EventTarget& other) const;
+};
+
+/// A record of the event log with what takes the rest of the log to tell: of the longest log all
+/// are held at once. Times are seconds since 1970-01-01 UTC; other events are named by their place
+/// in the log, from 0. What is not known is empty.
+struct LoggedEvent {
     ipmi::SelRecord record;
-    std::string key;
 
     std::optional<std::int64_t> time;  ///< by the controller's clock; of TimeKind::kClock
     std::optional<std::int64_t> correctedTime;
@@ -46,16 +63,8 @@ struct Event {
 
     /// By owner, LUN and number; borrowed of the node's facts.
     const SensorFacts* sensor = nullptr;
-    ipmi::EventData data;
-    std::optional<double> reading;
-    std::optional<double> threshold;
-    std::string unit;  ///< of reading and threshold
-
-    std::string text;
-    std::string sentence;
-    std::string vendorData;  ///< bytes that the standard leaves to the vendor, hexadecimal
+    EventTarget target;
     std::optional<std::size_t> continuationOf;
-    PartEvidence part;
 
     ipmi::TimeKind timeKind() const { return ipmi::KindOfTime(record.time); }
     bool isSensorEvent() const { return record.kind == ipmi::RecordKind::kSensorEvent; }
@@ -69,7 +78,24 @@ struct Event {
     bool IsAsserted(std::uint8_t sensorType, std::uint8_t offset) const;
 };
 
+/// The event with all that is known of it.
+struct Event : LoggedEvent {
+    Event() = default;
+    explicit Event(const LoggedEvent& logged) : LoggedEvent(logged) {}
+
+    std::string key;
+    ipmi::EventData data;
+    std::optional<double> reading;
+    std::optional<double> threshold;
+    std::string unit;  ///< of reading and threshold
+
+    std::string text;
+    std::string sentence;
+    std::string vendorData;  ///< bytes that the standard leaves to the vendor, hexadecimal
+    PartEvidence part;
+};
+
 /// Whether the record says that the event log was cleared.
-bool IsLogCleared(const Event& event);
+bool IsLogCleared(const LoggedEvent& event);
 
 }  // namespace standard

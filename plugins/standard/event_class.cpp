@@ -85,15 +85,15 @@ void WriteTime(const Event& event, bool zoneKnown, Output& output) {
     output.Integer("ClockStepSeconds", event.clockStep);
 }
 
-void WriteState(const Event& event, std::span<const Event> all, Output& output) {
+void WriteState(const Event& event, const Events& all, Output& output) {
     if (event.severity) {
         output.Text("Severity", ipmi::SeverityName(*event.severity));
         output.Text("SeverityFrom", SeverityOriginName(event.severityFrom));
     }
     if (event.state) output.Text("State", EventStateName(*event.state));
     if (event.resolvedBy) {
-        output.Text("ResolvedBy", all[*event.resolvedBy].key);
-        output.Time("ResolvedTime", all[*event.resolvedBy].time);
+        output.Text("ResolvedBy", all.KeyOf(*event.resolvedBy));
+        output.Time("ResolvedTime", all.Logged()[*event.resolvedBy].time);
     }
     output.Boolean("StillPresent", event.stillPresent);
 }
@@ -134,9 +134,10 @@ private:
 
 void WriteEvents(NodePass& pass, Output& output) {
     Manufacturers manufacturers;
-    const std::vector<Event>& events = pass.Events();
+    const Events& events = pass.GetEvents();
     const bool zoneKnown = pass.node().GetClock().utcOffsetMinutes.has_value();
-    for (const Event& event : events) {
+    for (std::size_t i = 0; i < events.size(); ++i) {
+        const Event event = events[i];
         output.Begin(kEventClass.info.name);
         output.Text("Key", event.key);
         output.Integer("Node", pass.node().number());
@@ -159,7 +160,7 @@ void WriteEvents(NodePass& pass, Output& output) {
         }
         WritePart(event.part, output);
         if (event.continuationOf) {
-            output.Text("ContinuationOf", events[*event.continuationOf].key);
+            output.Text("ContinuationOf", events.KeyOf(*event.continuationOf));
         }
         output.Text("Sentence", event.sentence);
         output.Text("Raw", ipmisel::HexText(event.record.bytes));

@@ -51,7 +51,7 @@ ipmi::EventGrade GradeOfRecord(const ipmi::SelRecord& record) {
 }  // namespace
 
 void SetSeverity(std::span<const ipmi::EventFilter> filters, const SeverityRules& rules,
-                 Event* event) {
+                 LoggedEvent* event) {
     const ipmi::EventGrade grade = GradeOfRecord(event->record);
     event->duration = grade.duration;
     event->severity = grade.Of(event->record.deassertion);

@@ -11,6 +11,6 @@ namespace standard {
 /// Sets the severity of an event and where it comes from: the user's rules, else the first of the
 /// controller's own event filters that matches, else the table of severities.
 void SetSeverity(std::span<const ipmi::EventFilter> filters, const SeverityRules& rules,
-                 Event* event);
+                 LoggedEvent* event);
 
 }  // namespace standard

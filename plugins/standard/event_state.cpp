@@ -16,7 +16,7 @@ namespace {
 
 using SensorAndTypes = std::tuple<ipmi::SensorKey, std::uint8_t, std::uint8_t, std::uint8_t>;
 
-SensorAndTypes KeyOf(const Event& event) {
+SensorAndTypes KeyOf(const LoggedEvent& event) {
     return {event.sensorKey(), event.record.generator.channel, event.record.sensorType,
             event.record.eventType};
 }
@@ -29,9 +29,11 @@ struct Place {
     auto operator<=>(const Place&) const = default;
 };
 
-Place PlaceOfSensor(const Event& event) { return {.entity = {}, .sensor = event.sensorKey()}; }
+Place PlaceOfSensor(const LoggedEvent& event) {
+    return {.entity = {}, .sensor = event.sensorKey()};
+}
 
-std::optional<Place> PlaceOfEntity(const Event& event) {
+std::optional<Place> PlaceOfEntity(const LoggedEvent& event) {
     const SensorFacts* const facts = event.agreeingSensor();
     if (facts == nullptr || !ipmi::IsPhysicalEntity(facts->sensor.entity.id)) return std::nullopt;
     const ipmi::Entity& entity = facts->sensor.entity;
@@ -41,22 +43,9 @@ std::optional<Place> PlaceOfEntity(const Event& event) {
 }
 
 // What a record of presence says is there or not.
-Place PlaceOfPresence(const Event& event) {
+Place PlaceOfPresence(const LoggedEvent& event) {
     const std::optional<Place> entity = PlaceOfEntity(event);
     return entity && TellsOfItsEntity(event.sensor->sensor) ? *entity : PlaceOfSensor(event);
-}
-
-template <typename T>
-bool MayBeEqual(const std::optional<T>& a, const std::optional<T>& b) {
-    return !a || !b || *a == *b;
-}
-
-bool SameTarget(const Event& a, const Event& b) {
-    return MayBeEqual(a.data.memoryModule, b.data.memoryModule) &&
-           MayBeEqual(a.data.slotNumber, b.data.slotNumber) &&
-           MayBeEqual(a.data.processorInstance, b.data.processorInstance) &&
-           MayBeEqual(a.data.sensorNumber, b.data.sensorNumber) &&
-           MayBeEqual(a.data.fruDevice, b.data.fruDevice);
 }
 
 // What a sensor said of one of its offsets.
@@ -73,7 +62,7 @@ bool TakesBack(const ipmi::SelRecord& now, const Statement& before) {
            ipmi::Excludes(now.eventType, now.sensorType, now.offset(), before.offset);
 }
 
-std::optional<ipmi::Presence> PresenceToldBy(const Event& event) {
+std::optional<ipmi::Presence> PresenceToldBy(const LoggedEvent& event) {
     const ipmi::SelRecord& record = event.record;
     const auto presence = ipmi::PresenceOf(record.eventType, record.sensorType, record.offset());
     if (!presence || !record.deassertion) return presence;
@@ -83,11 +72,11 @@ std::optional<ipmi::Presence> PresenceToldBy(const Event& event) {
 
 class Pairing {
 public:
-    explicit Pairing(std::span<Event> events) : events_(events) {}
+    explicit Pairing(std::span<LoggedEvent> events) : events_(events) {}
 
     void Run() {
         for (std::size_t i = 0; i < events_.size(); ++i) {
-            Event& event = events_[i];
+            LoggedEvent& event = events_[i];
             if (IsLogCleared(event)) ResolveAll(i);
             if (event.isSensorEvent()) {
                 Sensor(i);
@@ -99,7 +88,7 @@ public:
 
 private:
     void SetOwnState(std::size_t i) {
-        Event& event = events_[i];
+        LoggedEvent& event = events_[i];
         if (event.continuationOf) return;
         if (event.duration == ipmi::Duration::kMomentary) {
             if (!event.record.deassertion || event.isFault()) event.state = EventState::kMomentary;
@@ -136,7 +125,7 @@ private:
         for (auto& [statement, open] : found->second) {
             if (!TakesBack(events_[now].record, statement)) continue;
             for (const std::size_t i : open) {
-                if (IsOpen(i) && SameTarget(events_[now], events_[i])) Resolve(i, now);
+                if (IsOpen(i) && events_[now].target.MayBe(events_[i].target)) Resolve(i, now);
             }
             std::erase_if(open, [this](std::size_t i) { return !IsOpen(i); });
         }
@@ -154,7 +143,7 @@ private:
         const auto gone = goneAt_.find(place);
         if (gone == goneAt_.end()) return;
         for (const std::size_t i : openAt_[place]) {
-            if (i <= gone->second && IsOpen(i) && SameTarget(events_[now], events_[i])) {
+            if (i <= gone->second && IsOpen(i) && events_[now].target.MayBe(events_[i].target)) {
                 Resolve(i, now);
             }
         }
@@ -162,7 +151,7 @@ private:
         goneAt_.erase(gone);
     }
 
-    std::span<Event> events_;
+    std::span<LoggedEvent> events_;
     std::vector<std::size_t> open_;
     std::map<SensorAndTypes, std::map<Statement, std::vector<std::size_t>>> openOf_;
     std::map<Place, std::vector<std::size_t>> openAt_;
@@ -176,7 +165,7 @@ unsigned ComparisonMask(const ipmi::Sensor& sensor) {
 }
 
 // Whether what the event says holds by the sensor's present reading.
-std::optional<bool> IsPresent(const Event& event) {
+std::optional<bool> IsPresent(const LoggedEvent& event) {
     const SensorFacts& facts = *event.sensor;
     const ipmi::SelRecord& record = event.record;
     if (!facts.reading || !facts.reading->Available() || !facts.reading->states ||
@@ -196,10 +185,10 @@ std::optional<bool> IsPresent(const Event& event) {
 
 }  // namespace
 
-void SetStates(std::span<Event> events) { Pairing(events).Run(); }
+void SetStates(std::span<LoggedEvent> events) { Pairing(events).Run(); }
 
-void SetPresentStates(std::span<Event> events) {
-    for (Event& event : events) {
+void SetPresentStates(std::span<LoggedEvent> events) {
+    for (LoggedEvent& event : events) {
         if (event.state != EventState::kOpen || event.sensor == nullptr) continue;
         const std::optional<bool> present = IsPresent(event);
         if (!present) continue;

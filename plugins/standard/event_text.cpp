@@ -76,26 +76,28 @@ std::string ReadingText(const Event& event) {
 
 }  // namespace
 
-void JoinPanics(std::span<Event> events) {
+std::map<std::size_t, std::string> JoinPanics(std::span<LoggedEvent> events) {
     struct Panic {
         std::size_t first = 0;
         unsigned next = 0;  // sequence number of the piece that follows
     };
     std::map<std::uint8_t, Panic> panics;  // by writer
+    std::map<std::size_t, std::string> texts;
     for (std::size_t i = 0; i < events.size(); ++i) {
-        Event& event = events[i];
+        LoggedEvent& event = events[i];
         if (event.record.kind != ipmi::RecordKind::kLinuxPanic) continue;
         const ipmi::PanicPiece piece = ipmi::ParsePanicPiece(event.record);
         const auto panic = panics.find(piece.writer);
-        event.text = piece.text;
+        texts[i] = piece.text;
         if (panic != panics.end() && piece.sequence != 0 && piece.sequence == panic->second.next) {
             event.continuationOf = panic->second.first;
-            events[panic->second.first].text += piece.text;
+            texts[panic->second.first] += piece.text;
             ++panic->second.next;
         } else {
             panics[piece.writer] = {.first = i, .next = piece.sequence + 1U};
         }
     }
+    return texts;
 }
 
 std::optional<double> ConvertByRecord(const ipmi::Sensor& sensor, std::uint8_t raw) {

@@ -1,6 +1,8 @@
 #pragma once
 
+#include <cstddef>
 #include <functional>
+#include <map>
 #include <optional>
 #include <span>
 #include <string>
@@ -10,8 +12,8 @@
 namespace standard {
 
 /// Joins the pieces of Linux panic texts: the first piece of a panic gets the whole text, the
-/// others say whose continuation they are.
-void JoinPanics(std::span<Event> events);
+/// others say whose continuation they are. The texts by the places of the events.
+std::map<std::size_t, std::string> JoinPanics(std::span<LoggedEvent> events);
 
 /// The value of a raw reading or threshold of a sensor in its unit, where there is one.
 using Converter =

@@ -19,7 +19,7 @@ bool IsStep(std::int64_t seconds) { return seconds < -kResolution || seconds > k
 // Goes through the log and marks where the clock was set.
 class ClockWatch {
 public:
-    void See(Event* event) {
+    void See(LoggedEvent* event) {
         if (event->timeKind() != ipmi::TimeKind::kClock) return;
         const std::int64_t now = *event->time;
         const std::optional<ipmi::ClockSet> set = ipmi::ClockSetOf(event->record);
@@ -49,11 +49,11 @@ private:
 
 }  // namespace
 
-void SetTimes(const NodeFacts& node, std::span<Event> events) {
+void SetTimes(const NodeFacts& node, std::span<LoggedEvent> events) {
     ClockWatch watch;
     std::size_t afterLastChange = 0;
     for (std::size_t i = 0; i < events.size(); ++i) {
-        Event& event = events[i];
+        LoggedEvent& event = events[i];
         if (event.timeKind() == ipmi::TimeKind::kClock) {
             event.time = static_cast<std::int64_t>(event.record.time) -
                          node.utcOffsetMinutes.value_or(0) * kSecondsPerMinute;
@@ -63,7 +63,7 @@ void SetTimes(const NodeFacts& node, std::span<Event> events) {
     }
     if (!node.clock || std::abs(node.clock->offset) <= node.clock->uncertainty) return;
     const auto offset = static_cast<std::int64_t>(std::llround(node.clock->offset));
-    for (Event& event : events.subspan(afterLastChange)) {
+    for (LoggedEvent& event : events.subspan(afterLastChange)) {
         if (event.time) event.correctedTime = *event.time - offset;
     }
 }

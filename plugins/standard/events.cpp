@@ -2,7 +2,7 @@
 
 #include <algorithm>
 #include <array>
-#include <map>
+#include <utility>
 
 #include "ipmi/sensor_types.h"
 #include "plugins/standard/event_key.h"
@@ -29,42 +29,66 @@ bool IsAboutAPart(std::uint8_t sensorType) {
 
 }  // namespace
 
-std::vector<Event> DeriveEvents(const NodeFacts& node, const DerivationTools& tools) {
-    std::map<ipmi::SensorKey, const SensorFacts*> sensors;
-    for (const SensorFacts& facts : node.sensors) sensors.emplace(facts.sensor.key, &facts);
-
-    const std::vector<std::uint8_t> identity = SystemIdentity(node);
-    std::vector<Event> events;
-    events.reserve(node.log.size());
+Events::Events(const NodeFacts& node, DerivationTools tools)
+    : tools_(std::move(tools)), identity_(SystemIdentity(node)) {
+    for (const SensorFacts& facts : node.sensors) sensors_.emplace(facts.sensor.key, &facts);
+    logged_.reserve(node.log.size());
     for (const ipmi::SelRecord& record : node.log) {
-        Event& event = events.emplace_back();
+        LoggedEvent& event = logged_.emplace_back();
         event.record = record;
-        event.key = EventKey(identity, record);
-        event.data = ipmi::DecodeEventData(record);
+        event.target = EventTarget(ipmi::DecodeEventData(record));
         if (event.isSensorEvent()) {
-            const auto sensor = sensors.find(event.sensorKey());
-            if (sensor != sensors.end()) event.sensor = sensor->second;
-            if (event.data.sensorNumber) {
-                ipmi::SensorKey failed = event.sensorKey();
-                failed.number = *event.data.sensorNumber;
-                const auto named = sensors.find(failed);
-                if (named != sensors.end() && !named->second->sensor.name.empty()) {
-                    event.data.words.push_back(named->second->sensor.name);
-                }
-            }
+            const auto sensor = sensors_.find(event.sensorKey());
+            if (sensor != sensors_.end()) event.sensor = sensor->second;
         }
-        SetReading(tools.convert, &event);
-        SetSeverity(node.filters, tools.rules, &event);
-        if (IsAboutAPart(record.sensorType)) event.part = tools.parts.OfEvent(event);
+        SetSeverity(node.filters, tools_.rules, &event);
     }
-    SetTimes(node, events);
-    JoinPanics(events);
-    for (Event& event : events) {
-        SetText(&event);
-        SetSentence(&event);
-    }
-    SetStates(events);
-    return events;
+    SetTimes(node, logged_);
+    panicTexts_ = JoinPanics(logged_);
+    SetStates(logged_);
 }
+
+Event Events::WithData(const LoggedEvent& logged) const {
+    Event event(logged);
+    event.data = ipmi::DecodeEventData(event.record);
+    if (event.isSensorEvent() && event.data.sensorNumber) {
+        ipmi::SensorKey failed = event.sensorKey();
+        failed.number = *event.data.sensorNumber;
+        const auto named = sensors_.find(failed);
+        if (named != sensors_.end() && !named->second->sensor.name.empty()) {
+            event.data.words.push_back(named->second->sensor.name);
+        }
+    }
+    return event;
+}
+
+Event Events::WithText(std::size_t place) const {
+    Event event = WithData(logged_[place]);
+    const auto panic = panicTexts_.find(place);
+    if (panic != panicTexts_.end()) event.text = panic->second;
+    SetText(&event);
+    return event;
+}
+
+PartEvidence Events::PartOf(const Event& event) const {
+    return IsAboutAPart(event.record.sensorType) ? tools_.parts.OfEvent(event) : PartEvidence();
+}
+
+Event Events::operator[](std::size_t place) const {
+    Event event = WithText(place);
+    event.key = KeyOf(place);
+    event.part = PartOf(event);
+    SetReading(tools_.convert, &event);
+    SetSentence(&event);
+    return event;
+}
+
+std::string Events::KeyOf(std::size_t place) const {
+    return EventKey(identity_, logged_[place].record);
+}
+
+std::string Events::TextOf(std::size_t place) const { return WithText(place).text; }
+
+PartEvidence Events::PartOf(std::size_t place) const { return PartOf(WithData(logged_[place])); }
 
 }  // namespace standard

@@ -1,5 +1,10 @@
 #pragma once
 
+#include <cstddef>
+#include <cstdint>
+#include <map>
+#include <span>
+#include <string>
 #include <vector>
 
 #include "plugins/standard/event.h"
@@ -17,8 +22,34 @@ struct DerivationTools {
 };
 
 /// The events of a node, one per record in log order, with all that the node's facts tell of them.
-/// They point into `node`, which outlives them. The sensors' present readings are not looked at:
-/// SetPresentStates does that.
-std::vector<Event> DeriveEvents(const NodeFacts& node, const DerivationTools& tools);
+/// What an event can be told from its record alone, words and part among it, is made anew each
+/// time it is looked at: the longest log would take many times its size otherwise. `node` and what
+/// `tools` refer to are borrowed for the life of the object.
+class Events {
+public:
+    /// The sensors' present readings are not looked at: SetPresentStates does that.
+    Events(const NodeFacts& node, DerivationTools tools);
+
+    std::size_t size() const { return logged_.size(); }
+    std::span<LoggedEvent> Logged() { return logged_; }
+    std::span<const LoggedEvent> Logged() const { return logged_; }
+
+    Event operator[](std::size_t place) const;
+    // Of the same event, one thing alone.
+    std::string KeyOf(std::size_t place) const;
+    std::string TextOf(std::size_t place) const;
+    PartEvidence PartOf(std::size_t place) const;
+
+private:
+    Event WithData(const LoggedEvent& logged) const;
+    Event WithText(std::size_t place) const;
+    PartEvidence PartOf(const Event& event) const;
+
+    DerivationTools tools_;
+    std::map<ipmi::SensorKey, const SensorFacts*> sensors_;
+    std::vector<std::uint8_t> identity_;
+    std::vector<LoggedEvent> logged_;
+    std::map<std::size_t, std::string> panicTexts_;
+};
 
 }  // namespace standard

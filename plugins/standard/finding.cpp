@@ -25,7 +25,7 @@ constexpr std::int64_t kRecent = std::int64_t{7} * 24 * 3600;
 constexpr std::size_t kRecentRecords = 64;
 constexpr std::size_t kMaxKinds = 4;  // of events that are summed up among the evidence
 
-bool IsOf(const Event& event, std::uint8_t sensorType, std::uint16_t offsets) {
+bool IsOf(const LoggedEvent& event, std::uint8_t sensorType, std::uint16_t offsets) {
     const ipmi::SelRecord& record = event.record;
     return event.isSensorEvent() && record.eventType == ipmi::kSensorSpecificEvents &&
            record.sensorType == sensorType && (offsets >> record.offset() & 1) != 0;
@@ -33,21 +33,27 @@ bool IsOf(const Event& event, std::uint8_t sensorType, std::uint16_t offsets) {
 
 constexpr std::uint16_t kAnyOffset = 0xFFFF;
 
-bool IsOfMemory(const Event& event) { return IsOf(event, ipmi::sensor_type::kMemory, kAnyOffset); }
-bool IsThermalTrip(const Event& event) {
+bool IsOfMemory(const LoggedEvent& event) {
+    return IsOf(event, ipmi::sensor_type::kMemory, kAnyOffset);
+}
+bool IsThermalTrip(const LoggedEvent& event) {
     return IsOf(event, ipmi::sensor_type::kProcessor, 0b10) ||
            IsOf(event, ipmi::sensor_type::kChipSet, 0b10);
 }
-bool IsSystemStop(const Event& event) {
+bool IsSystemStop(const LoggedEvent& event) {
     return event.record.kind == ipmi::RecordKind::kLinuxPanic ||
            IsOf(event, ipmi::sensor_type::kOsStop, kAnyOffset) ||
            IsOf(event, ipmi::sensor_type::kWatchdog1, kAnyOffset) ||
            IsOf(event, ipmi::sensor_type::kWatchdog2, kAnyOffset) ||
            IsOf(event, ipmi::sensor_type::kBootError, kAnyOffset);
 }
-bool IsOfSlot(const Event& event) { return IsOf(event, ipmi::sensor_type::kSlot, kAnyOffset); }
-bool IsPcieError(const Event& event) { return ipmi::ParsePcieError(event.record).has_value(); }
-bool IsAny(const Event&) { return true; }
+bool IsOfSlot(const LoggedEvent& event) {
+    return IsOf(event, ipmi::sensor_type::kSlot, kAnyOffset);
+}
+bool IsPcieError(const LoggedEvent& event) {
+    return ipmi::ParsePcieError(event.record).has_value();
+}
+bool IsAny(const LoggedEvent&) { return true; }
 
 /// Which events are one finding.
 enum class Scope : std::uint8_t {
@@ -59,7 +65,7 @@ enum class Scope : std::uint8_t {
     kSensor,        ///< of one sensor
 };
 struct Rule {
-    bool (*applies)(const Event&);
+    bool (*applies)(const LoggedEvent&);
     Scope scope;
 };
 // The first rule that applies to an open or momentary fault says with which others it is one
@@ -73,17 +79,18 @@ constexpr std::array kRules = std::to_array<Rule>({
     {IsAny, Scope::kSensor},
 });
 
-std::string SensorId(const Event& event) {
+std::string SensorId(const LoggedEvent& event) {
     return ipmisel::Format("%02x/%d/%02x/%02x", event.sensorKey().owner, event.sensorKey().lun,
                            event.sensorKey().number, event.record.sensorType);
 }
 
-std::string ModuleId(const Event& event) {
-    if (event.part.parts.size() == 1 && event.data.memoryModule) return event.part.parts[0].name;
-    if (event.data.memoryModule) {
-        return ipmisel::Format("%02x module %d", event.sensorKey().owner, *event.data.memoryModule);
-    }
-    return SensorId(event);
+std::string ModuleId(const Events& events, std::size_t place) {
+    const LoggedEvent& event = events.Logged()[place];
+    const auto module = event.target.memoryModule;
+    if (!module) return SensorId(event);
+    const PartEvidence part = events.PartOf(place);
+    if (part.parts.size() == 1) return part.parts[0].name;
+    return ipmisel::Format("%02x module %d", event.sensorKey().owner, *module);
 }
 
 // The numbers of the expansion slots that a machine's slot sensors watch, by their names: "Slot 2".
@@ -105,10 +112,10 @@ public:
         return found == numbers_.end() ? std::nullopt : std::optional(found->second);
     }
     // By the event's own data, else by its sensor.
-    std::optional<unsigned> NumberOf(const Event& event) const {
+    std::optional<unsigned> NumberOf(const LoggedEvent& event) const {
         constexpr auto kTypes = std::to_array<std::uint8_t>(
             {ipmi::kPciSlot, ipmi::kExpansionSlot, ipmi::kPciExpressSlot});
-        const ipmi::EventData& data = event.data;
+        const EventTarget& data = event.target;
         if (!data.slotType && !data.slotNumber) {
             return event.agreeingSensor() ? NumberOf(event.sensorKey()) : std::nullopt;
         }
@@ -134,13 +141,15 @@ private:
 std::string SlotId(unsigned number) { return "slot " + std::to_string(number); }
 
 // What the finding of an event is called among those of the node.
-std::string GroupOf(const Event& event, std::size_t burst, const ExpansionSlots& slots) {
+std::string GroupOf(const Events& events, std::size_t place, std::size_t burst,
+                    const ExpansionSlots& slots) {
+    const LoggedEvent& event = events.Logged()[place];
     const auto* const rule = std::ranges::find_if(
         kRules, [&event](const Rule& candidate) { return candidate.applies(event); });
     const std::string prefix = std::to_string(rule - kRules.begin()) + ' ';
     switch (rule->scope) {
         case Scope::kModule:
-            return prefix + ModuleId(event);
+            return prefix + ModuleId(events, place);
         case Scope::kBurst:
             return prefix + std::to_string(burst);
         case Scope::kDevice: {
@@ -163,13 +172,13 @@ std::string GroupOf(const Event& event, std::size_t burst, const ExpansionSlots&
 // among the last records of the log.
 class Recency {
 public:
-    explicit Recency(std::span<const Event> events) : count_(events.size()) {
-        for (const Event& event : events) {
+    explicit Recency(std::span<const LoggedEvent> events) : count_(events.size()) {
+        for (const LoggedEvent& event : events) {
             if (event.time) newest_ = event.time;
         }
     }
     // A time after that of the newest record is of a clock that was set back since.
-    bool IsRecent(const Event& event, std::size_t at) const {
+    bool IsRecent(const LoggedEvent& event, std::size_t at) const {
         if (event.time && newest_ && *event.time <= *newest_) {
             return *event.time >= *newest_ - kRecent;
         }
@@ -202,14 +211,13 @@ std::string TitleOf(const Event& worst) {
 }
 
 // The events of a finding that are not shown one by one, summed up by what they say.
-std::vector<std::string> OthersText(std::span<const Event> events,
-                                    std::span<const std::size_t> finding,
+std::vector<std::string> OthersText(const Events& events, std::span<const std::size_t> finding,
                                     const std::set<std::size_t>& shown) {
     std::vector<std::pair<std::string, std::size_t>> kinds;  // in the order of the log
     std::size_t rest = finding.size() - shown.size();
     for (const std::size_t i : finding) {
         if (shown.contains(i)) continue;
-        const std::string& text = events[i].text;
+        const std::string text = events.TextOf(i);
         const auto kind = std::ranges::find(kinds, text, &decltype(kinds)::value_type::first);
         if (kind != kinds.end()) {
             ++kind->second;
@@ -246,21 +254,22 @@ void AddOrigin(const Event& event, Finding* finding) {
     }
 }
 
-Finding FindingOf(std::span<const Event> events, std::vector<std::size_t> indices,
+Finding FindingOf(const Events& events, std::vector<std::size_t> indices,
                   const Converter& convert) {
+    const auto logged = events.Logged();
     Finding finding;
     finding.events = std::move(indices);
     // Of equals the last, whose reading is the newest.
     const std::size_t worst =
-        *std::ranges::max_element(finding.events, [&events](std::size_t a, std::size_t b) {
-            return std::pair(*events[a].severity, a) < std::pair(*events[b].severity, b);
+        *std::ranges::max_element(finding.events, [&logged](std::size_t a, std::size_t b) {
+            return std::pair(*logged[a].severity, a) < std::pair(*logged[b].severity, b);
         });
-    const Event& event = events[worst];
+    const Event event = events[worst];
     finding.severity = *event.severity;
     finding.isOpen = event.state == EventState::kOpen;
     finding.part = event.part;
     const auto same = static_cast<std::size_t>(std::ranges::count_if(
-        finding.events, [&](std::size_t i) { return events[i].text == event.text; }));
+        finding.events, [&](std::size_t i) { return events.TextOf(i) == event.text; }));
     finding.title = TitleOf(event) + CountText(same, finding.events.size() - same);
 
     const std::set<std::size_t> shown{finding.events.front(), worst, finding.events.back()};
@@ -269,7 +278,7 @@ Finding FindingOf(std::span<const Event> events, std::vector<std::size_t> indice
         finding.evidence.push_back(std::move(line));
     }
     for (const std::size_t i : finding.events) {
-        if (events[i].stillPresent) finding.stillPresent = events[i].stillPresent;
+        if (logged[i].stillPresent) finding.stillPresent = logged[i].stillPresent;
     }
     if (finding.stillPresent == true && event.sensor != nullptr) {
         std::string present = PresentText(*event.sensor, convert);
@@ -356,12 +365,12 @@ std::optional<Finding> FindingOfSensor(const NodeFacts& node, const SensorFacts&
 
 }  // namespace
 
-std::vector<std::size_t> BurstsOf(std::span<const Event> events) {
+std::vector<std::size_t> BurstsOf(std::span<const LoggedEvent> events) {
     std::vector<std::size_t> bursts;
     bursts.reserve(events.size());
     std::size_t burst = 0;
-    const Event* before = nullptr;  // the last one with a time
-    for (const Event& event : events) {
+    const LoggedEvent* before = nullptr;  // the last one with a time
+    for (const LoggedEvent& event : events) {
         const ipmi::TimeKind kind = event.timeKind();
         if (kind != ipmi::TimeKind::kNone) {
             if (before != nullptr &&
@@ -377,20 +386,21 @@ std::vector<std::size_t> BurstsOf(std::span<const Event> events) {
     return bursts;
 }
 
-std::vector<Finding> DeriveFindings(const NodeFacts& node, std::span<const Event> events,
+std::vector<Finding> DeriveFindings(const NodeFacts& node, const Events& events,
                                     const DerivationTools& tools) {
-    const std::vector<std::size_t> bursts = BurstsOf(events);
-    const Recency recency(events);
+    const auto logged = events.Logged();
+    const std::vector<std::size_t> bursts = BurstsOf(logged);
+    const Recency recency(logged);
     const ExpansionSlots slots(node);
     std::map<std::string, std::vector<std::size_t>> groups;
     std::map<std::size_t, std::size_t> causeOf;  // by burst
     std::set<ipmi::SensorKey> toldBy;
-    for (std::size_t i = 0; i < events.size(); ++i) {
-        const Event& event = events[i];
+    for (std::size_t i = 0; i < logged.size(); ++i) {
+        const LoggedEvent& event = logged[i];
         if (IsLogCleared(event)) {
             // What stood before it is done with; open events are resolved by it anyway.
-            std::erase_if(groups, [&events](const auto& group) {
-                return events[group.second.front()].state != EventState::kOpen;
+            std::erase_if(groups, [&logged](const auto& group) {
+                return logged[group.second.front()].state != EventState::kOpen;
             });
         }
         if (!event.isFault() || event.continuationOf) continue;
@@ -399,14 +409,15 @@ std::vector<Finding> DeriveFindings(const NodeFacts& node, std::span<const Event
         if (!isOpen && !(event.state == EventState::kMomentary && recency.IsRecent(event, i))) {
             continue;
         }
-        groups[(isOpen ? "open " : "momentary ") + GroupOf(event, bursts[i], slots)].push_back(i);
+        groups[(isOpen ? "open " : "momentary ") + GroupOf(events, i, bursts[i], slots)].push_back(
+            i);
         if (isOpen && event.agreeingSensor() != nullptr) toldBy.insert(event.sensorKey());
     }
 
     std::vector<Finding> findings;
     std::map<unsigned, std::size_t> openSlots;  // findings of expansion slots, by their number
     for (auto& [name, indices] : groups) {
-        const Event& first = events[indices.front()];
+        const LoggedEvent& first = logged[indices.front()];
         if (const auto number = slots.NumberOf(first);
             number && IsOfSlot(first) && first.state == EventState::kOpen) {
             openSlots.emplace(*number, findings.size());

@@ -28,12 +28,12 @@ struct Finding {
 
 /// The findings of a node, worst first; those of one severity with the open ones first, then in the
 /// order of the log. `events` are the node's, with their states.
-std::vector<Finding> DeriveFindings(const NodeFacts& node, std::span<const Event> events,
+std::vector<Finding> DeriveFindings(const NodeFacts& node, const Events& events,
                                     const DerivationTools& tools);
 
 /// The burst that each record of the log belongs to, numbered from 0: records of a burst are within
 /// 300 s of the one before; a set clock or a cleared log begins another. A record without a time
 /// belongs to the burst of the record before.
-std::vector<std::size_t> BurstsOf(std::span<const Event> events);
+std::vector<std::size_t> BurstsOf(std::span<const LoggedEvent> events);
 
 }  // namespace standard

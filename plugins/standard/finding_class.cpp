@@ -29,7 +29,7 @@ constexpr fdrPropertyInfo kProperties[] = {
 };
 
 void WriteFindings(NodePass& pass, Output& output) {
-    const std::vector<Event>& events = pass.Events();
+    const Events& events = pass.GetEvents();
     for (const Finding& finding : pass.Findings()) {
         output.Begin(kFindingClass.info.name);
         output.Integer("Node", pass.node().number());
@@ -42,16 +42,17 @@ void WriteFindings(NodePass& pass, Output& output) {
         std::optional<std::int64_t> first;
         std::optional<std::int64_t> last;  // of those that have a time
         for (const std::size_t i : finding.events) {
-            keys.push_back(events[i].key);
-            if (!events[i].time) continue;
-            if (!first) first = events[i].time;
-            last = events[i].time;
+            keys.push_back(events.KeyOf(i));
+            const auto time = events.Logged()[i].time;
+            if (!time) continue;
+            if (!first) first = time;
+            last = time;
         }
         output.Time("FirstTime", first);
         output.Time("LastTime", last);
         output.Integer("Count", static_cast<std::int64_t>(finding.events.size()));
         output.Texts("Events", keys);
-        if (finding.firstCause) output.Text("FirstCause", events[*finding.firstCause].key);
+        if (finding.firstCause) output.Text("FirstCause", events.KeyOf(*finding.firstCause));
         output.Texts("Evidence", finding.evidence);
         output.Boolean("StillPresent", finding.stillPresent);
         output.End();

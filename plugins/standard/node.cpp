@@ -95,10 +95,6 @@ const std::optional<ipmi::SelAllocation>& Node::LogAllocation() {
     });
 }
 
-const std::vector<ipmi::SelRecord>& Node::Log() {
-    return Once(&log_, [&] { return ReadLog(); });
-}
-
 const std::vector<ipmi::EventFilter>& Node::Filters() {
     return Once(&filters_, [&] { return ReadFilters(); });
 }
@@ -216,7 +212,10 @@ Clock Node::ReadClock() {
 
 std::vector<ipmi::SelRecord> Node::ReadLog() {
     std::vector<ipmi::SelRecord> records;
-    if (LogInfo() && LogInfo()->records == 0) return records;
+    if (LogInfo()) {
+        if (LogInfo()->records == 0) return records;
+        records.reserve(LogInfo()->records);
+    }
     Walk([&](std::uint16_t id) -> std::optional<Link> {
         const auto entry = Ask(controller_, ipmi::GetSelEntry(id), ipmi::ParseSelEntry);
         if (!entry) return std::nullopt;

@@ -57,8 +57,9 @@ public:
 
     const std::optional<ipmi::SelInfo>& LogInfo();
     const std::optional<ipmi::SelAllocation>& LogAllocation();
-    /// The event log in its order, up to the first record that could not be read.
-    const std::vector<ipmi::SelRecord>& Log();
+    /// The event log in its order, up to the first record that could not be read. It is long: the
+    /// caller keeps it, and reads it once.
+    std::vector<ipmi::SelRecord> ReadLog();
     /// The controller's event filters, in the order in which it tries them.
     const std::vector<ipmi::EventFilter>& Filters();
 
@@ -77,7 +78,6 @@ public:
 
 private:
     Clock ReadClock();
-    std::vector<ipmi::SelRecord> ReadLog();
     std::vector<ipmi::EventFilter> ReadFilters();
     std::vector<ipmi::SdrRecord> ReadRepository();
     SensorState ReadState(const ipmi::Sensor& sensor);
@@ -94,7 +94,6 @@ private:
     std::optional<Clock> clock_;
     std::optional<std::optional<ipmi::SelInfo>> logInfo_;
     std::optional<std::optional<ipmi::SelAllocation>> allocation_;
-    std::optional<std::vector<ipmi::SelRecord>> log_;
     std::optional<std::vector<ipmi::EventFilter>> filters_;
     std::optional<std::vector<ipmi::SdrRecord>> repository_;
     std::optional<std::vector<ipmi::Sensor>> sensors_;

@@ -50,11 +50,11 @@ Parts NodePass::MakeParts() {
     return {std::move(facts), facts_};
 }
 
-const std::vector<Event>& NodePass::Events() {
+const Events& NodePass::GetEvents() {
     if (events_) return *events_;
     facts_.number = node_.number();
     facts_.systemName = systemName_;
-    facts_.log = node_.Log();
+    facts_.log = node_.ReadLog();
     facts_.guid = node_.Guid();
     const Clock& clock = node_.GetClock();
     facts_.utcOffsetMinutes = clock.utcOffsetMinutes;
@@ -67,9 +67,9 @@ const std::vector<Event>& NodePass::Events() {
     // What events are known by where there is no GUID.
     if (!facts_.guid) facts_.serialNumber = Identity().serialNumber;
 
-    events_ = DeriveEvents(facts_, Tools());
+    events_.emplace(facts_, Tools());
     std::set<ipmi::SensorKey> open;
-    for (const Event& event : *events_) {
+    for (const LoggedEvent& event : events_->Logged()) {
         if (event.state == EventState::kOpen && event.sensor != nullptr) {
             open.insert(event.sensor->sensor.key);
         }
@@ -77,13 +77,13 @@ const std::vector<Event>& NodePass::Events() {
     for (SensorFacts& facts : facts_.sensors) {
         if (open.contains(facts.sensor.key)) ReadSensorOf(&facts);
     }
-    SetPresentStates(*events_);
+    SetPresentStates(events_->Logged());
     return *events_;
 }
 
 const std::vector<Finding>& NodePass::Findings() {
     if (findings_) return *findings_;
-    const std::vector<Event>& events = Events();
+    const Events& events = GetEvents();
     for (SensorFacts& facts : facts_.sensors) ReadSensorOf(&facts);
     findings_ = DeriveFindings(facts_, events, Tools());
     return *findings_;

@@ -33,7 +33,7 @@ public:
     /// The part of a sensor.
     PartEvidence PartOf(const ipmi::Sensor& sensor);
     /// The events, with the present readings of the sensors that have open ones.
-    const std::vector<Event>& Events();
+    const Events& GetEvents();
     /// From the events and the present readings of all sensors.
     const std::vector<Finding>& Findings();
 
@@ -54,7 +54,7 @@ private:
     NodeFacts facts_;
     std::optional<Parts> sensorParts_;  // without the log
     std::optional<Parts> parts_;
-    std::optional<std::vector<Event>> events_;  // point into facts_
+    std::optional<Events> events_;  // points into facts_ and parts_
     std::optional<std::vector<Finding>> findings_;
 };
 

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <chrono>
+#include <numeric>
 #include <set>
 #include <string>
 #include <string_view>
@@ -155,8 +156,12 @@ bool MadeAfter(const std::optional<std::int64_t>& made, const ipmi::SelRecord& r
 
 Parts::Parts(PartFacts facts, const NodeFacts& node) : facts_(std::move(facts)), node_(&node) {
     for (std::size_t i = 0; i < node.log.size(); ++i) {
-        placeOf_.emplace(node.log[i].bytes, i);
         if (TellsOfRemoval(node.log[i])) removals_.push_back(i);
+    }
+    if (!removals_.empty()) {
+        byBytes_.resize(node.log.size());
+        std::iota(byBytes_.begin(), byBytes_.end(), 0U);
+        std::ranges::stable_sort(byBytes_, {}, [&](std::uint32_t i) { return node.log[i].bytes; });
     }
     // A module that the firmware lists twice, all alike, is one.
     auto& modules = facts_.smbios.memoryDevices;
@@ -374,10 +379,12 @@ std::optional<Parts::Found> Parts::ByEventData(const Event& event) const {
 
 bool Parts::IsGoneSince(const Event& event, const Candidate& candidate) const {
     if (MadeAfter(candidate.made, event.record)) return true;
-    const auto place = placeOf_.find(event.record.bytes);
-    if (place == placeOf_.end()) return false;
+    // Of equal records the first.
+    const auto place = std::ranges::lower_bound(
+        byBytes_, event.record.bytes, {}, [&](std::uint32_t i) { return node_->log[i].bytes; });
+    if (place == byBytes_.end() || node_->log[*place] != event.record) return false;
     // The removal itself is about the part that went, too.
-    const auto later = std::lower_bound(removals_.begin(), removals_.end(), place->second);
+    const auto later = std::lower_bound(removals_.begin(), removals_.end(), *place);
     return std::any_of(later, removals_.end(),
                        [&](std::size_t at) { return Removes(node_->log[at], event, candidate); });
 }

@@ -61,9 +61,9 @@ private:
 
     PartFacts facts_;
     const NodeFacts* node_;
-    std::map<ipmi::SelBytes, std::size_t>
-        placeOf_;                        ///< of each record in the log; equals: the first
     std::vector<std::size_t> removals_;  ///< places of records that tell of a removal
+    /// Where there are removals, the places of all records in the order of their bytes.
+    std::vector<std::uint32_t> byBytes_;
 };
 
 }  // namespace standard

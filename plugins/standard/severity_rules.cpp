@@ -133,7 +133,7 @@ std::optional<SeverityRules::Problem> SeverityRules::Parse(std::string_view text
     return std::nullopt;
 }
 
-const SeverityRules::Rule* SeverityRules::Match(const Event& event) const {
+const SeverityRules::Rule* SeverityRules::Match(const LoggedEvent& event) const {
     if (!event.isSensorEvent()) return nullptr;
     const ipmi::SelRecord& record = event.record;
     const auto found = std::ranges::find_if(rules_, [&](const Rule& rule) {

@@ -30,7 +30,7 @@ public:
     static std::optional<Problem> Parse(std::string_view text, SeverityRules* rules);
 
     /// The first rule that matches a sensor event; null when none does.
-    const Rule* Match(const Event& event) const;
+    const Rule* Match(const LoggedEvent& event) const;
     bool empty() const { return rules_.empty(); }
 
 private:

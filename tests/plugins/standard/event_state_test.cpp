@@ -12,7 +12,8 @@ using testing::ElementsAre;
 // "open", "resolved by 2", "resolved", "momentary", "-".
 std::vector<std::string> States(const LogBuilder& log) {
     std::vector<std::string> states;
-    for (const Event& event : log.Derive()) {
+    const Events events = log.Derive();
+    for (const LoggedEvent& event : events.Logged()) {
         std::string text = event.state ? std::string(EventStateName(*event.state)) : "-";
         if (event.resolvedBy) text += " by " + std::to_string(*event.resolvedBy);
         states.push_back(text);

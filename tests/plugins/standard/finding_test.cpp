@@ -236,7 +236,7 @@ TEST(Burst, EndsWithAGapASetClockAnotherKindOfTimeAndAClearedLog) {
     press(kNoon + 500);  // the clock went back
     log.Cleared();
     press(kNoon + 500);
-    EXPECT_THAT(BurstsOf(log.Derive()), ElementsAre(0, 1, 1, 1, 2, 3, 4, 4));
+    EXPECT_THAT(BurstsOf(log.Derive().Logged()), ElementsAre(0, 1, 1, 1, 2, 3, 4, 4));
 }
 
 }  // namespace standard

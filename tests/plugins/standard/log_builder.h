@@ -67,9 +67,9 @@ public:
     }
 
     /// The events, with the sensors' present readings.
-    std::vector<standard::Event> Derive() const {
-        std::vector<standard::Event> events = DeriveEvents(node, tools);
-        SetPresentStates(events);
+    Events Derive() const {
+        Events events(node, tools);
+        SetPresentStates(events.Logged());
         return events;
     }
 
