@@ -11,6 +11,7 @@
 #include <utility>
 #include <vector>
 
+#include "program/commands/check.h"
 #include "program/commands/classes.h"
 #include "program/commands/collect.h"
 #include "program/commands/command.h"
@@ -24,8 +25,9 @@ namespace ipmisel {
 namespace {
 
 /// In the order of the help.
-constexpr Command (*kCommands[])(CLI::App* program) = {
-    AddCollectCommand, AddReportCommand, AddDiffCommand, AddClassesCommand, AddWorkerCommand};
+constexpr Command (*kCommands[])(CLI::App* program) = {AddCollectCommand, AddReportCommand,
+                                                       AddDiffCommand,    AddCheckCommand,
+                                                       AddClassesCommand, AddWorkerCommand};
 
 /// Letters to put in, take out or change to make one word the other.
 std::size_t Distance(std::string_view a, std::string_view b) {
@@ -60,6 +62,13 @@ void RefuseUnknownCommand(const std::vector<Command>& commands, int argc, char**
                                   "There are " + known);
 }
 
+std::string OwnError(const std::exception& error) {
+    if (dynamic_cast<const std::bad_alloc*>(&error) != nullptr) {
+        return "out of memory; give the program more, or collect fewer classes at a time";
+    }
+    return std::string("ended by an error of its own: ") + error.what();
+}
+
 int Run(int argc, char** argv) {
     CLI::App app("Reads what a server's management controller (BMC) knows.", "ipmisel");
     app.set_version_flag("--version", "ipmisel " IPMISEL_VERSION);
@@ -77,12 +86,22 @@ int Run(int argc, char** argv) {
         return app.exit(wanted);
     } catch (const CLI::ParseError& error) {
         const auto command = named();
-        throw Failure(kExitUsage,
-                      std::string(error.what()) + "; see ipmisel " +
-                          (command == commands.end() ? "" : command->arguments->get_name() + " ") +
-                          "--help");
+        const Failure failure(
+            kExitUsage,
+            std::string(error.what()) + "; see ipmisel " +
+                (command == commands.end() ? "" : command->arguments->get_name() + " ") + "--help");
+        if (command == commands.end() || !command->fail) throw failure;
+        return command->fail(failure);
     }
-    return named()->run();
+    const Command& command = *named();
+    if (!command.fail) return command.run();
+    try {
+        return command.run();
+    } catch (const Failure& failure) {
+        return command.fail(failure);
+    } catch (const std::exception& error) {
+        return command.fail({kExitPassFailed, OwnError(error)});
+    }
 }
 
 }  // namespace
@@ -94,11 +113,8 @@ int RunProgram(int argc, char** argv) {
     } catch (const Failure& failure) {
         Say(failure.what());
         return failure.exitStatus;
-    } catch (const std::bad_alloc&) {
-        Say("out of memory; give the program more, or collect fewer classes at a time");
-        return kExitPassFailed;
     } catch (const std::exception& error) {
-        Say(std::string("ended by an error of its own: ") + error.what());
+        Say(OwnError(error));
         return kExitPassFailed;
     }
 }

@@ -297,6 +297,21 @@ int Collect(const CollectOptions& options) {
     return outcome.exitStatus;
 }
 
+void AddDeadlineOption(CLI::App* command, std::optional<double>* seconds) {
+    command
+        ->add_option("--deadline", *seconds,
+                     "Seconds that the whole collection may take; that of each controller with "
+                     "--hosts")
+        ->type_name("SECONDS")
+        ->check(Seconds(365 * kSecondsPerDay));
+}
+
+void AddSeveritiesOption(CLI::App* command, std::optional<std::string>* file) {
+    command->add_option("--severities", *file, "File with severities of your own")
+        ->type_name("FILE")
+        ->check(FileName());
+}
+
 Command AddCollectCommand(CLI::App* program) {
     CLI::App* const command = program->add_subcommand("collect", "Collect and write a report");
     const auto options = std::make_shared<CollectOptions>();
@@ -307,20 +322,14 @@ Command AddCollectCommand(CLI::App* program) {
     AddLogOptions(command, &options->log);
     AddPluginOption(command, &options->plugins);
     AddAccessOptions(command, &options->access);
-    command
-        ->add_option("--deadline", options->deadlineSeconds,
-                     "Seconds that the whole collection may take")
-        ->type_name("SECONDS")
-        ->check(Seconds(365 * kSecondsPerDay));
+    AddDeadlineOption(command, &options->deadlineSeconds);
     command
         ->add_option("--name", options->names,
                      "Name of the system in reports; the host of the source when left out")
         ->type_name("NAME")
         ->allow_extra_args(false)
         ->check(NotEmpty("the name is empty; name the system"));
-    command->add_option("--severities", options->severities, "File with severities of your own")
-        ->type_name("FILE")
-        ->check(FileName());
+    AddSeveritiesOption(command, &options->severities);
     const auto hosts = std::make_shared<HostsOptions>();
     AddHostsOptions(command, hosts.get());
     command->footer(FormatHelp() + WorkaroundHelp() + kExitStatusHelp);

@@ -30,6 +30,10 @@ Outcome CollectOutcome(const CollectOptions& options);
 /// The same, told; the exit status.
 int Collect(const CollectOptions& options);
 
+// Options that other commands have too.
+void AddDeadlineOption(CLI::App* command, std::optional<double>* seconds);
+void AddSeveritiesOption(CLI::App* command, std::optional<std::string>* file);
+
 /// `ipmisel collect`.
 Command AddCollectCommand(CLI::App* program);
 

@@ -52,7 +52,7 @@ private:
 
 }  // namespace
 
-void AddLogOptions(CLI::App* command, LogOptions* options) {
+void AddLogLevelOption(CLI::App* command, LogOptions* options) {
     command
         ->add_option_function<std::string>(
             "--log-level",
@@ -66,6 +66,10 @@ void AddLogOptions(CLI::App* command, LogOptions* options) {
         ->type_name("LEVEL")
         ->default_str(kSeverityNames[options->level])
         ->check(OneOf({std::begin(kSeverityNames), std::end(kSeverityNames)}));
+}
+
+void AddLogOptions(CLI::App* command, LogOptions* options) {
+    AddLogLevelOption(command, options);
     command->add_option("--log-file", options->file, "Every log line as a JSON object a line")
         ->type_name("FILE")
         ->check(FileName());

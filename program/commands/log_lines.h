@@ -17,7 +17,9 @@ struct LogOptions {
         NQORTQR20::ILogger::kWarning;  ///< on standard error
     std::optional<std::string> file;
 };
-/// Adds --log-level and --log-file to a command.
+/// Adds --log-level to a command.
+void AddLogLevelOption(CLI::App* command, LogOptions* options);
+/// Adds it and --log-file.
 void AddLogOptions(CLI::App* command, LogOptions* options);
 
 /// Where the log goes while it lives: lines up to a severity to standard error, every line to a

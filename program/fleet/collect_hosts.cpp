@@ -80,14 +80,13 @@ void RaiseFileLimit() {
 
 class Collection {
 public:
-    Collection(const CollectOptions& options, std::size_t jobs, FleetReport& report)
-        : options_(options), report_(report), pool_(jobs, [](std::string_view line) {
+    Collection(const CollectOptions& common, std::size_t jobs, FleetReport& report)
+        : report_(report), pool_(jobs, [](std::string_view line) {
               HideProgress();
               std::fprintf(stderr, "%.*s\n", static_cast<int>(line.size()), line.data());
-          }) {}
-
-    /// Says on the terminal how far it is.
-    void BeginProgress() { progress_.emplace(); }
+          }) {
+        if (common.progress) progress_.emplace();
+    }
 
     Outcome Run(const std::vector<HostEntry>& hosts, HostOptions* own) {
         const SignalsHeld held;
@@ -110,9 +109,7 @@ public:
     }
 
 private:
-    void Start(std::size_t index, CollectOptions options) {
-        options.report.format = WorkerFormat(options_.report.format);
-        options.report.classes = options_.report.classes;
+    void Start(std::size_t index, const CollectOptions& options) {
         const std::chrono::duration<double> deadline(*options.deadlineSeconds);
         const auto limit =
             Clock::now() + std::chrono::duration_cast<Clock::duration>(deadline) + kTimeToEnd;
@@ -152,7 +149,6 @@ private:
                          .note = note});
     }
 
-    const CollectOptions& options_;
     FleetReport& report_;
     FleetOutcome outcome_;
     std::optional<ProgressLine> progress_;
@@ -161,6 +157,20 @@ private:
     std::vector<std::pair<std::string, std::string>> names_;  ///< source and name, by index
     WorkerPool pool_;
 };
+
+/// Collects from the controllers that are meant, as `common` says, into a report.
+Outcome CollectInto(FleetReport& report, const CollectOptions& common, const HostsOptions& hosts) {
+    std::vector<HostEntry> list = HostsOf(common, hosts);
+    HostOptions own(common, list);
+    if (hosts.shard) {
+        std::erase_if(list, [shard = *ParseShard(*hosts.shard)](const HostEntry& host) {
+            return !shard.Has(host.source);
+        });
+    }
+    RaiseFileLimit();
+    const StopSignals signals;
+    return Collection(common, hosts.jobs, report).Run(list, &own);
+}
 
 }  // namespace
 
@@ -190,7 +200,6 @@ void AddHostsOptions(CLI::App* command, HostsOptions* options) {
 
 int CollectHosts(const CollectOptions& options, const HostsOptions& hosts) {
     RefuseOptions(options);
-    std::vector<HostEntry> list = HostsOf(options, hosts);
     const FormatInfo& format = *FindFormat(options.report.format);
     CollectOptions common = options;
     ReportHead head{.source = AsNamed(options, hosts),
@@ -206,25 +215,17 @@ int CollectHosts(const CollectOptions& options, const HostsOptions& hosts) {
         head.wanted = ClassesToCollect(options.report.classes, format.classes, *plugins);
         head.named = !options.report.classes.empty();
     }
+    common.report.format = WorkerFormat(format.name);
+    const bool lines = common.report.format == format.name && format.name != "json";
     // What a worker makes of its own is for another format than this one.
-    if (WorkerFormat(format.name) != format.name) common.report.classes = head.wanted;
-    HostOptions own(common, list);
-    if (hosts.shard) {
-        std::erase_if(list, [shard = *ParseShard(*hosts.shard)](const HostEntry& host) {
-            return !shard.Has(host.source);
-        });
-    }
-    RaiseFileLimit();
-    const StopSignals signals;
-    OutputFile out(options.report.output);
+    if (common.report.format != format.name) common.report.classes = head.wanted;
     const bool toFile = options.report.output.has_value() && *options.report.output != "-";
+    // Lines on a terminal show for themselves how far it is.
+    if (lines && !toFile && isatty(STDOUT_FILENO) == 1) common.progress = false;
+    OutputFile out(options.report.output);
     const auto report =
         MakeFleetReport(format, out, head, LookOfOutput(options.report.colour, toFile));
-    Collection collection(common, hosts.jobs, *report);
-    const bool linesToTerminal =
-        WorkerFormat(format.name) == format.name && !toFile && isatty(STDOUT_FILENO) == 1;
-    if (options.progress && !linesToTerminal) collection.BeginProgress();
-    const Outcome outcome = collection.Run(list, &own);
+    const Outcome outcome = CollectInto(*report, common, hosts);
     Pager pager;
     if (format.name == "table" && options.report.pager && !toFile) pager.Start();
     report->Finish(outcome);
@@ -232,6 +233,16 @@ int CollectHosts(const CollectOptions& options, const HostsOptions& hosts) {
     pager.Wait();
     if (outcome.exitStatus != kExitCollected) Say(outcome.problem + "; " + outcome.advice);
     return outcome.exitStatus;
+}
+
+std::vector<SystemSummary> SummarizeHosts(const CollectOptions& options,
+                                          const HostsOptions& hosts) {
+    CollectOptions common = options;
+    common.report.format = WorkerFormat("table");
+    std::vector<SystemSummary> systems;
+    const auto summaries = MakeSummaries(&systems);
+    summaries->Finish(CollectInto(*summaries, common, hosts));
+    return systems;
 }
 
 }  // namespace ipmisel

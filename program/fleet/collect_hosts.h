@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "program/commands/collect.h"
+#include "program/fleet/fleet_summary.h"
 
 namespace ipmisel {
 
@@ -21,5 +22,7 @@ void AddHostsOptions(CLI::App* command, HostsOptions* options);
 /// Collects from each controller in a process of its own, and writes the report of all; the exit
 /// status. Throws Failure.
 int CollectHosts(const CollectOptions& options, const HostsOptions& hosts);
+/// What is wrong with each of them instead, the worst first; `options` name the classes for it.
+std::vector<SystemSummary> SummarizeHosts(const CollectOptions& options, const HostsOptions& hosts);
 
 }  // namespace ipmisel

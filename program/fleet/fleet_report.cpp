@@ -15,7 +15,6 @@
 #include <vector>
 
 #include "program/commands/failure.h"
-#include "program/fleet/fleet_summary.h"
 #include "program/reports/saved_report.h"
 #include "program/reports/spool.h"
 
@@ -230,22 +229,32 @@ private:
     std::vector<Controller> controllers_;
 };
 
-/// What is wrong with each of them, on one page.
-class Overview : public FleetReport {
+class Summaries : public FleetReport {
 public:
-    Overview(OutputFile& out, const ReportHead& head, const ReportLook& look, bool html)
-        : out_(out), head_(head), look_(look), html_(html) {}
+    explicit Summaries(std::vector<SystemSummary>* systems) : systems_(*systems) {}
 
     void Add(const ControllerEnd& end) override {
-        SystemSummary summary;
+        SystemSummary& summary = systems_.emplace_back();
         summary.index = end.index;
         summary.name = end.name;
         summary.outcome = end.result.outcome;
         if (end.result.reported) Summarize(ReadReport(end.source, end.report.get()), &summary);
-        systems_.push_back(std::move(summary));
     }
+    void Finish(const Outcome&) override { SortWorstFirst(&systems_); }
+
+private:
+    std::vector<SystemSummary>& systems_;
+};
+
+/// What is wrong with each of them, on one page.
+class Overview : public FleetReport {
+public:
+    Overview(OutputFile& out, const ReportHead& head, const ReportLook& look, bool html)
+        : out_(out), head_(head), look_(look), html_(html), summaries_(&systems_) {}
+
+    void Add(const ControllerEnd& end) override { summaries_.Add(end); }
     void Finish(const Outcome& outcome) override {
-        SortWorstFirst(&systems_);
+        summaries_.Finish(outcome);
         if (html_) {
             WriteHtmlOverview(systems_, outcome, head_, out_);
         } else {
@@ -259,6 +268,7 @@ private:
     ReportLook look_;
     bool html_;
     std::vector<SystemSummary> systems_;
+    Summaries summaries_;
 };
 
 bool IsOfLines(std::string_view format) {
@@ -278,6 +288,10 @@ std::unique_ptr<FleetReport> MakeFleetReport(const FormatInfo& format, OutputFil
         return std::make_unique<Overview>(out, head, look, format.name == "html");
     }
     return std::make_unique<WholeReport>(format, out, head, look);
+}
+
+std::unique_ptr<FleetReport> MakeSummaries(std::vector<SystemSummary>* systems) {
+    return std::make_unique<Summaries>(systems);
 }
 
 void FleetOutcome::Add(const Outcome& outcome) {

@@ -4,8 +4,10 @@
 #include <memory>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "program/fleet/file_descriptor.h"
+#include "program/fleet/fleet_summary.h"
 #include "program/fleet/worker.h"
 #include "program/reports/output_file.h"
 #include "program/reports/report.h"
@@ -36,6 +38,9 @@ std::string_view WorkerFormat(std::string_view format);
 /// worst first.
 std::unique_ptr<FleetReport> MakeFleetReport(const FormatInfo& format, OutputFile& out,
                                              const ReportHead& head, const ReportLook& look);
+
+/// Takes reports in JSON into summaries, and in the end sorts them, the worst first.
+std::unique_ptr<FleetReport> MakeSummaries(std::vector<SystemSummary>* systems);
 
 /// What all of them make together: the status that all have, else collected in part.
 class FleetOutcome {

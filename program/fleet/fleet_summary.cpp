@@ -88,11 +88,16 @@ std::optional<Severity> SystemSummary::Worst() const {
 void Summarize(const SavedReport& report, SystemSummary* summary) {
     if (!report.Head().systems.empty()) summary->system = report.Head().systems.front();
     report.ForEach([summary](const NQORTQR20::Instance& instance) {
-        if (instance.className != kFindingClass) return;
-        ++summary->problems;
-        if (summary->findings.size() < kMaxFindings) {
-            summary->findings.push_back(FindingOf(instance));
+        if (instance.className == kEventLogClass) {
+            const EventLog log = EventLogOf(instance);
+            summary->records += log.records.value_or(0);
+            summary->logUsedPercent = std::max(summary->logUsedPercent, log.usedPercent);
         }
+        if (instance.className != kFindingClass) return;
+        const Finding finding = FindingOf(instance);
+        ++summary->problems;
+        if (finding.severity >= Severity::kCritical) ++summary->critical;
+        if (summary->findings.size() < kMaxFindings) summary->findings.push_back(finding);
     });
     // The worst first, of every node of the system.
     std::stable_sort(summary->findings.begin(), summary->findings.end(),

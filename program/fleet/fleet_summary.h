@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
@@ -18,8 +19,11 @@ struct SystemSummary {
     std::string name;
     SystemInfo system{};  ///< what it said of itself
     Outcome outcome{};
-    std::vector<Finding> findings{};  ///< the worst first, no more than are shown
-    std::size_t problems = 0;         ///< all of them
+    std::vector<Finding> findings{};         ///< the worst first, no more than are shown
+    std::size_t problems = 0;                ///< all of them
+    std::size_t critical = 0;                ///< that are critical or fatal
+    std::int64_t records = 0;                ///< in the event logs
+    std::optional<double> logUsedPercent{};  ///< of the fullest log
 
     std::optional<Severity> Worst() const;
 };

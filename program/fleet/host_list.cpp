@@ -183,6 +183,7 @@ private:
             Refuse(entry.origin, Quoted(range) + " in " + Quoted(entry.source) +
                                      " is no range; write it as [1-8] or [001-128,200]");
         }
+        if (*last - *first >= kMaxHosts) RefuseNumber(entry);
         // A leading zero tells that all are as long as the first.
         const int width = low.front() == '0' ? static_cast<int>(low.size()) : 1;
         for (std::size_t i = *first; i <= *last; ++i) {
@@ -190,11 +191,13 @@ private:
         }
     }
 
+    [[noreturn]] static void RefuseNumber(const HostEntry& entry) {
+        Refuse(entry.origin,
+               "more than " + std::to_string(kMaxHosts) + " hosts; give each run a part of them");
+    }
+
     void Add(const HostEntry& entry, const std::string& host) {
-        if (hosts_.size() == kMaxHosts) {
-            Refuse(entry.origin, "more than " + std::to_string(kMaxHosts) +
-                                     " hosts; give each run a part of them");
-        }
+        if (hosts_.size() == kMaxHosts) RefuseNumber(entry);
         const std::string source = std::string(kLan) + host;
         const auto [place, isNew] = index_.try_emplace(source, hosts_.size());
         if (isNew) {

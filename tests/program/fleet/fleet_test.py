@@ -249,6 +249,31 @@ class Fleet(unittest.TestCase):
             systems = [system["name"] for system in json.loads(ended.stdout)["systems"]]
             self.assertEqual(systems, ["rack-server", "127.0.0.1"])
 
+    def check(self, *options):
+        return subprocess.run([IPMISEL, "check", *options], capture_output=True, text=True, timeout=120,
+                              env=self.environment)
+
+    def test_a_check_tells_of_live_controllers_and_saved_reports_alike(self):
+        rack = f"sim:{TREE}/examples/rack-server.json"
+        live = self.check("--from", rack)
+        self.assertEqual(live.returncode, 2, live.stderr)
+        self.assertRegex(live.stdout, r"\AIPMI CRITICAL - [^|\n]+ \| critical=\d+;;0;0 warning=\d+;0;;0 [^|\n]+\n\Z")
+        saved = pathlib.Path(self.folder.name, "saved.json")
+        subprocess.run([IPMISEL, "collect", "--from", rack, "--format", "json", "--output", saved], check=True)
+        self.assertEqual(self.check(saved).stdout, live.stdout)
+        both = self.check("--from", rack, "--from", f"sim:{TREE}/examples/broken-bmc.json")
+        self.assertEqual(both.returncode, 2)
+        self.assertIn(" systems=2 not_whole=1;", both.stdout)
+
+    def test_a_check_that_fails_is_unknown_whatever_the_reason(self):
+        with Controllers(1, "--silent", "1") as silent:
+            for options in (("--from", "sim:/no/such/file"), ("/no/such/file",), ("--no-such-option",),
+                            ("--from", "sim:x", "/no/such/file"), ("--hosts", "n[2-1]"),
+                            ("--from", silent.sources[0], "--timeout", "1", "--password-file", self.password)):
+                ended = self.check(*options)
+                self.assertEqual(ended.returncode, 3, options)
+                self.assertRegex(ended.stdout, r"\AIPMI UNKNOWN - [^\n]+\n\Z", options)
+
     def test_what_does_not_go_with_many_is_refused(self):
         for options in (("--record", "x"), ("--name", "x"), ("--log-file", "x"), ("--jobs", "0"), ("--shard", "9/8"),
                         ("--last", "3"), ("--format", "csv", "--class", "IPMI_Event", "--class", "IPMI_FRU")):
