@@ -15,6 +15,7 @@
 #include "program/commands/classes.h"
 #include "program/commands/collect.h"
 #include "program/commands/command.h"
+#include "program/commands/configuration.h"
 #include "program/commands/diff.h"
 #include "program/commands/failure.h"
 #include "program/commands/report.h"
@@ -75,6 +76,15 @@ int Run(int argc, char** argv) {
     app.require_subcommand(1);
     std::vector<Command> commands;
     for (const auto add : kCommands) commands.push_back(add(&app));
+    std::vector<Command> configurable;
+    for (const Command& command : commands) {
+        if (command.arguments->get_group().empty()) continue;  // not for users
+        command.arguments->add_flag("--no-config")
+            ->description("Take no option from files or the environment");
+        configurable.push_back(command);
+    }
+    commands.push_back(AddConfigCommand(
+        &app, [&configurable] { return Configuration(ConfigurationFiles(), configurable); }));
     const auto named = [&] {
         return std::find_if(commands.begin(), commands.end(),
                             [](const Command& command) { return command.arguments->parsed(); });
@@ -94,9 +104,16 @@ int Run(int argc, char** argv) {
         return command->fail(failure);
     }
     const Command& command = *named();
-    if (!command.fail) return command.run();
-    try {
+    const auto run = [&] {
+        const CLI::Option* const alone = command.arguments->get_option_no_throw("--no-config");
+        if (alone != nullptr && alone->empty()) {
+            UseConfiguration({ConfigurationFiles(), configurable}, command.arguments);
+        }
         return command.run();
+    };
+    if (!command.fail) return run();
+    try {
+        return run();
     } catch (const Failure& failure) {
         return command.fail(failure);
     } catch (const std::exception& error) {

@@ -16,6 +16,7 @@ DOCS = pathlib.Path(__file__).resolve().parents[2] / "docs"
 DOCUMENTS = (
     ("manual.md", "ipmisel", 1, "reads what a server's management controller (BMC) knows"),
     ("simulated-server.md", "ipmisel-simulated-server", 5, "the file of a simulated server"),
+    ("configuration.md", "ipmisel.conf", 5, "options and groups of hosts in a file"),
     ("severity-rules.md", "ipmisel-severity-rules", 5, "the file of the user's own severities"),
     ("capture.md", "ipmisel-capture", 5, "a capture of every exchange with a BMC"),
 )

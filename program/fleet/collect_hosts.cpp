@@ -11,6 +11,7 @@
 
 #include "host/spdriver/stop.h"
 #include "program/commands/arguments.h"
+#include "program/commands/configuration.h"
 #include "program/commands/failure.h"
 #include "program/commands/plugins.h"
 #include "program/commands/stop_signals.h"
@@ -52,8 +53,7 @@ void RefuseOptions(const CollectOptions& options) {
 std::vector<HostEntry> HostsOf(const CollectOptions& options, const HostsOptions& hosts) {
     std::vector<HostEntry> all;
     for (const std::string& source : options.access.sources) all.push_back({source});
-    // The configuration has no groups yet.
-    for (HostEntry& host : ParseHostLists(hosts.lists, nullptr)) {
+    for (HostEntry& host : ParseHostLists(hosts.lists, FindConfiguredGroup)) {
         const bool isNew = std::none_of(
             all.begin(), all.begin() + static_cast<std::ptrdiff_t>(options.access.sources.size()),
             [&](const HostEntry& before) { return before.source == host.source; });

@@ -67,48 +67,68 @@ std::optional<std::size_t> ParseNumber(std::string_view text) {
     return number;
 }
 
+using Options = std::vector<std::pair<std::string, std::string>>;
+
+/// The common options but for those that the own ones have, then the own ones.
+Options Over(const Options& common, const Options& own) {
+    Options options;
+    for (const auto& option : common) {
+        const bool isOwn = std::any_of(own.begin(), own.end(), [&](const auto& other) {
+            return other.first == option.first;
+        });
+        if (!isOwn) options.push_back(option);
+    }
+    options.insert(options.end(), own.begin(), own.end());
+    return options;
+}
+
 /// Builds the controllers of one command line.
 class Builder {
 public:
     explicit Builder(const FindGroup& findGroup) : findGroup_(findGroup) {}
 
-    void AddList(std::string_view list, const std::string& origin, int depth) {
+    /// `common` is what the hosts have as members of groups.
+    void AddList(std::string_view list, const std::string& origin, int depth,
+                 const Options& common = {}) {
         for (;;) {
             const std::string_view item = TakeItem(&list);
             if (item.empty()) return;
             if (item.front() == '@') {
-                AddFile(std::string(item.substr(1)), origin);
+                AddFile(std::string(item.substr(1)), origin, common);
             } else if (item.front() == '%') {
-                AddGroup(std::string(item.substr(1)), origin, depth);
+                AddGroup(std::string(item.substr(1)), origin, depth, common);
             } else {
-                AddHosts({std::string(item), {}, origin});
+                AddHosts({std::string(item), common, origin});
             }
         }
     }
     std::vector<HostEntry> Take() { return std::move(hosts_); }
 
 private:
-    void AddGroup(const std::string& name, const std::string& origin, int depth) {
+    void AddGroup(const std::string& name, const std::string& origin, int depth,
+                  const Options& common) {
         if (depth == kMaxGroupDepth) Refuse(origin, "the group %" + name + " leads in a circle");
-        const auto list = findGroup_ ? findGroup_(name) : std::nullopt;
-        if (!list) {
-            Refuse(origin, "there is no group %" + name + "; give it a line in the configuration");
+        const auto group = findGroup_ ? findGroup_(name) : std::nullopt;
+        if (!group) {
+            Refuse(origin, "there is no group %" + name +
+                               "; give the configuration a section [group." + name + "]");
         }
-        AddList(*list, "group %" + name, depth + 1);
+        AddList(group->hosts, "group %" + name, depth + 1, Over(common, group->options));
     }
 
-    void AddFile(const std::string& name, const std::string& origin) {
+    void AddFile(const std::string& name, const std::string& origin, const Options& common) {
         if (name.empty()) Refuse(origin, "@ names no file; write it as @FILE");
         const std::string text = ReadTextFile(name, "--hosts @FILE", kMaxFile);
         std::string_view rest = text;
         for (std::size_t number = 1; !rest.empty(); ++number) {
             const auto end = std::min(rest.find('\n'), rest.size());
-            AddLine(rest.substr(0, end), name, number);
+            AddLine(rest.substr(0, end), name, number, common);
             rest.remove_prefix(std::min(end + 1, rest.size()));
         }
     }
 
-    void AddLine(std::string_view line, const std::string& file, std::size_t number) {
+    void AddLine(std::string_view line, const std::string& file, std::size_t number,
+                 const Options& common) {
         HostEntry entry{"", {}, file + ", line " + std::to_string(number)};
         for (std::string_view word = TakeWord(&line); !word.empty() && word[0] != '#';
              word = TakeWord(&line)) {
@@ -126,6 +146,7 @@ private:
             entry.options.emplace_back(word.substr(0, equals), word.substr(equals + 1));
         }
         if (entry.source.empty()) return;
+        entry.options = Over(common, entry.options);
         if (entry.source.front() == '@' || entry.source.front() == '%') {
             Refuse(entry.origin, "a line begins with a host, not with a further list");
         }

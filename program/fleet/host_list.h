@@ -26,8 +26,13 @@ struct HostEntry {
     bool operator==(const HostEntry&) const = default;
 };
 
-/// The list of a group; empty when there is none of this name.
-using FindGroup = std::function<std::optional<std::string>(const std::string& name)>;
+/// A list with a name, and what its hosts have in common.
+struct HostGroup {
+    std::string hosts;
+    std::vector<std::pair<std::string, std::string>> options{};
+};
+/// A group; empty when there is none of this name.
+using FindGroup = std::function<std::optional<HostGroup>(const std::string& name)>;
 
 /// The controllers of some lists, in their order, each once. One that comes again with options of
 /// its own gets these; with two different sets it is refused. Throws Failure.

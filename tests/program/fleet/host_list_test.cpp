@@ -93,13 +93,17 @@ TEST(HostList, AFileWithPasswordsIsForNobodyElse) {
 }
 
 TEST(HostList, AGroupIsAListByName) {
-    const FindGroup find = [](const std::string& name) -> std::optional<std::string> {
-        if (name == "all") return "%rack,x";
-        if (name == "rack") return "n[1-2]";
-        if (name == "circle") return "a,%circle";
+    const FindGroup find = [](const std::string& name) -> std::optional<HostGroup> {
+        if (name == "all") return HostGroup{"%rack,x", {{"user", "all"}, {"window", "4"}}};
+        if (name == "rack") return HostGroup{"n[1-2]", {{"user", "rack"}}};
+        if (name == "circle") return HostGroup{"a,%circle"};
         return std::nullopt;
     };
-    EXPECT_EQ(Sources(ParseHostLists({"%all"}, find)), (Names{"lan:n1", "lan:n2", "lan:x"}));
+    const auto hosts = ParseHostLists({"%all"}, find);
+    EXPECT_EQ(Sources(hosts), (Names{"lan:n1", "lan:n2", "lan:x"}));
+    using Options = decltype(HostEntry::options);
+    EXPECT_EQ(hosts[0].options, (Options{{"window", "4"}, {"user", "rack"}})) << "the inner group's";
+    EXPECT_EQ(hosts[2].options, (Options{{"user", "all"}, {"window", "4"}}));
     EXPECT_THAT(Refusal({"%none"}, find), HasSubstr("no group %none"));
     EXPECT_THAT(Refusal({"%circle"}, find), HasSubstr("circle"));
 }
