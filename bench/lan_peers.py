@@ -42,7 +42,7 @@ def wait_for_bmc(port, process):
     request = bytes.fromhex("0600ff07 000000000000000000 09 2018c881 00388e04b5")
     with socket.socket(socket.AF_INET, socket.SOCK_DGRAM) as client:
         client.settimeout(0.2)
-        for _ in range(50):
+        for _ in range(400):  # it takes half a minute to take 10,000 records in
             if process.poll() is not None:
                 sys.exit("ipmi_sim ended at once")
             try:
