@@ -1,7 +1,7 @@
 #include <algorithm>
 #include <map>
 #include <memory>
-#include <unordered_set>
+#include <unordered_map>
 
 #include "base/text.h"
 #include "program/reports/digest.h"
@@ -198,18 +198,23 @@ private:
     }
 
     /// Equal records are one event; only the first of them can be the target of a link.
-    std::string RowIdOf(const std::string& key) {
-        if (key.size() < kRowIdDigits || !keys_.insert(key).second) return "";
+    std::string RowIdOf(const Event& event) {
+        const std::string& key = event.key;
+        if (key.size() < kRowIdDigits || !records_.emplace(key, event.recordId).second) return "";
         return "e-" + HtmlText(key.substr(0, kRowIdDigits));
     }
-    std::string LinkTo(const std::string& key, const std::string& text) const {
-        if (!keys_.contains(key)) return "";
-        return Element("a", text, "href=\"#e-" + HtmlText(key.substr(0, kRowIdDigits)) + "\"");
+    /// "record 41", leading to its row; empty for an event that has none.
+    std::string LinkTo(const std::string& key) const {
+        const auto record = records_.find(key);
+        if (record == records_.end()) return "";
+        return Element("a",
+                       record->second ? "record " + std::to_string(*record->second) : "the event",
+                       "href=\"#e-" + HtmlText(key.substr(0, kRowIdDigits)) + "\"");
     }
 
     void AddEvent(const Event& event) {
         Log& log = logs_[IndexOf(event.node)];
-        const std::string row = RowIdOf(event.key);
+        const std::string row = RowIdOf(event);
         log.timeline.Add(event, row);
         log.rows.Append(EventRow(event, row));
         ++log.count;
@@ -332,12 +337,13 @@ private:
             std::string events;
             unsigned linked = 0;
             for (const std::string& key : f.events) {
-                const std::string name =
-                    f.events.size() == 1 ? "see it" : "no. " + std::to_string(linked + 1);
-                const std::string link = LinkTo(key, name);
+                const std::string link = LinkTo(key);
                 if (!link.empty()) events += (events.empty() ? "" : ", ") + link;
                 ++linked;
                 if (linked == kMaxLinks) break;  // the others stand near
+            }
+            if (f.events.size() > kMaxLinks) {
+                events += " and " + std::to_string(f.events.size() - kMaxLinks) + " more";
             }
             Definitions d;
             d.Add("Part", PartText(f.part, f.partCandidates))
@@ -350,7 +356,10 @@ private:
                 .Add("Now",
                      f.stillPresent ? (*f.stillPresent ? "still present" : "no longer seen") : "");
             if (std::find(f.events.begin(), f.events.end(), f.firstCause) == f.events.end()) {
-                d.AddHtml("Began with", LinkTo(f.firstCause, "the first event of this burst"));
+                const std::string first = LinkTo(f.firstCause);
+                if (!first.empty()) {
+                    d.AddHtml("Came after", first + ", the first fault at about that time");
+                }
             }
             std::string evidence;
             for (const std::string& line : f.evidence) evidence += Element("li", HtmlText(line));
@@ -379,27 +388,69 @@ private:
         Section("problems", Verdict(), content, "verdict " + worst);
     }
 
+    /// A part as it is ordered, and the worst that is wrong with it.
+    struct PartRow {
+        std::size_t system;
+        std::string name, manufacturer, product, partNumber, serialNumber;
+        std::optional<Severity> worst;
+        bool Is(const Finding& finding) const {
+            return serialNumber.empty() || finding.serialNumber.empty()
+                       ? name == finding.part
+                       : serialNumber == finding.serialNumber;
+        }
+    };
+    /// Those of the inventory, and those that only a finding names; the ones with problems first.
+    std::vector<PartRow> PartRows() const {
+        std::vector<PartRow> rows;
+        const auto orElse = [](const std::string& text, const std::string& other) {
+            return text.empty() ? other : text;
+        };
+        for (const Fru& f : machine_.frus) {
+            rows.push_back({IndexOf(f.node),
+                            FruName(f),
+                            orElse(f.manufacturer, f.moduleManufacturer),
+                            f.product,
+                            orElse(f.partNumber, f.modulePartNumber),
+                            orElse(f.serialNumber, f.moduleSerialNumber),
+                            {}});
+        }
+        for (const Finding& finding : machine_.findings) {
+            if (finding.part.empty()) continue;
+            const std::size_t system = IndexOf(finding.node);
+            auto row = std::find_if(rows.begin(), rows.end(), [&](const PartRow& r) {
+                return r.system == system && r.Is(finding);
+            });
+            if (row == rows.end()) {
+                rows.push_back(
+                    {system, finding.part, {}, {}, finding.partNumber, finding.serialNumber, {}});
+                row = rows.end() - 1;
+            }
+            row->worst = std::max(row->worst, finding.severity);
+        }
+        // What is neither broken nor known by anything but its place is no help here.
+        std::erase_if(rows, [](const PartRow& r) {
+            return !r.worst && (r.manufacturer + r.product + r.partNumber + r.serialNumber).empty();
+        });
+        std::stable_sort(rows.begin(), rows.end(),
+                         [](const PartRow& a, const PartRow& b) { return a.worst > b.worst; });
+        return rows;
+    }
+
     void WriteParts() {
         std::string rows;
-        for (const Fru& f : machine_.frus) {
-            const std::string part = f.partNumber.empty() ? f.modulePartNumber : f.partNumber;
-            const std::string serial =
-                f.serialNumber.empty() ? f.moduleSerialNumber : f.serialNumber;
-            const std::string maker =
-                f.manufacturer.empty() ? f.moduleManufacturer : f.manufacturer;
-            const bool wrong = std::any_of(
-                machine_.findings.begin(), machine_.findings.end(), [&](const Finding& finding) {
-                    return !serial.empty() && finding.serialNumber == serial;
-                });
+        for (const PartRow& part : PartRows()) {
             rows += Row(
-                {{HtmlText(Several() ? NameOf(IndexOf(f.node)) + ": " + FruName(f) : FruName(f))},
-                 {wrong ? Element("span", "has a problem", "class=\"badge critical\"") : ""},
-                 {HtmlText(maker)},
-                 {HtmlText(f.product), "class=\"wide\""},
-                 {HtmlText(part), "class=\"order\" data-label=\"Part number\""},
-                 {HtmlText(serial), "class=\"order\" data-label=\"Serial number\""}});
+                {{HtmlText(Several() ? NameOf(part.system) + ": " + part.name : part.name)},
+                 {part.worst
+                      ? Element("span", SeverityName(part.worst) + " problem", "class=\"badge\"")
+                      : ""},
+                 {HtmlText(part.manufacturer)},
+                 {HtmlText(part.product), "class=\"wide\""},
+                 {HtmlText(part.partNumber), "class=\"order\" data-label=\"Part number\""},
+                 {HtmlText(part.serialNumber), "class=\"order\" data-label=\"Serial number\""}},
+                part.worst ? "class=\"" + SeverityName(part.worst) + "\"" : "");
         }
-        Section("parts", "Parts, to order by",
+        Section("parts", "Parts and their order numbers",
                 rows.empty() ? "<p class=\"soft\">The controller told of none.</p>\n"
                              : TableHead({"Part", "State", "Manufacturer", "Product", "Part number",
                                           "Serial number"},
@@ -423,8 +474,7 @@ private:
             content +=
                 "<p class=\"soft\">Left to right in the order of the log; long pauses are drawn "
                 "short, as grey fields. A dashed line is a clock that went back. Each mark leads "
-                "to "
-                "its event; a larger one stands for several.</p>\n";
+                "to its event; a larger one stands for several.</p>\n";
         }
         Section("timeline", "Timeline",
                 content.empty() ? "<p class=\"soft\">No events.</p>\n" : content);
@@ -626,7 +676,7 @@ private:
     Systems systems_;
     MachineState machine_;
     std::vector<Log> logs_;
-    std::unordered_set<std::string> keys_;
+    std::unordered_map<std::string, Integer> records_;  ///< IDs by the keys of their events
     Outcome outcome_{};
     bool zoneUnknown_ = false;
 };

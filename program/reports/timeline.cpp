@@ -129,7 +129,7 @@ std::string Timeline::Svg() const {
         double x = 0;
     };
     std::map<std::pair<std::size_t, std::size_t>, Mark> bins;
-    double lastLabel = 0;
+    double lastLabel = -kWidth;
     MaybeTime last;
     for (std::size_t i = 0; i < points_.size(); ++i) {
         const Point& point = points_[i];
@@ -164,6 +164,9 @@ std::string Timeline::Svg() const {
             lastLabel = x[i];
         }
         last = point.time;
+    }
+    if (last && x.back() - lastLabel > 240) {
+        label(x.back(), height - 3, "end", DateAndTime(*last).substr(0, 16));
     }
     for (const auto& [key, mark] : bins) {
         const auto& [index, bin] = key;

@@ -52,6 +52,20 @@ class Commands(unittest.TestCase):
     def test_readme(self):
         self.assertGreaterEqual(self.collect("README.md", "build/release/bin/ipmisel"), 6)
 
+    def test_samples_after_commands_in_readme_are_what_these_write(self):
+        """The lines of code right after a command: stretches of its output, in order, "..." for what is left out."""
+        blocks = re.findall(r"^    (build/release/bin/ipmisel .*)\n((?:    (?!build/).+\n)+)",
+                            (ROOT / "README.md").read_text(), re.MULTILINE)
+        self.assertGreaterEqual(len(blocks), 5)
+        for command, sample in blocks:
+            ended = subprocess.run([PROGRAM, *shlex.split(command)[1:]], cwd=ROOT, capture_output=True, text=True)
+            at = 0
+            for piece in re.split(r" ?\.\.\.\s*|\n", sample.replace("\n    ", "\n")):
+                found = ended.stdout.find(piece.strip(), at)
+                with self.subTest(command=command, piece=piece):
+                    self.assertGreaterEqual(found, 0)
+                at = max(at, found)
+
     def test_manual(self):
         self.assertGreaterEqual(self.collect("docs/manual.md", "ipmisel"), 3)
 

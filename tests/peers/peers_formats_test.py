@@ -1,0 +1,288 @@
+"""The formats for programs, taken by the programs that they are for; the page, by a browser.
+
+usage: peers_formats_test.py PROGRAM TREE
+
+jq, sqlite3, promtool, a node exporter, rsyslog and the journal are run on loopback or on files of their
+own. What is not installed is skipped, and said.
+"""
+import http.client
+import json
+import math
+import os
+import pathlib
+import re
+import shutil
+import socket
+import sqlite3
+import subprocess
+import sys
+import tempfile
+import time
+import unittest
+import uuid
+
+PROGRAM, TREE = sys.argv[1], pathlib.Path(sys.argv[2])
+sys.path.insert(0, str(TREE / "tests/program/reports"))
+from formats_support import EXAMPLES, Page, collect, hostile_report, run, set_program, tool  # noqa: E402
+
+set_program(PROGRAM)
+
+
+def events_of(text):
+    """Every event of a report in lines, as json has it."""
+    return [line for line in map(json.loads, text.splitlines()) if "summary" not in line]
+
+
+def free_port(kind=socket.SOCK_STREAM):
+    with socket.socket(socket.AF_INET, kind) as free:
+        free.bind(("127.0.0.1", 0))
+        return free.getsockname()[1]
+
+
+def wait_until(condition, seconds=20):
+    end = time.monotonic() + seconds
+    while not condition():
+        if time.monotonic() > end:
+            return False
+        time.sleep(0.1)
+    return True
+
+
+class Folder(unittest.TestCase):
+    def setUp(self):
+        folder = tempfile.TemporaryDirectory()
+        self.addCleanup(folder.cleanup)
+        self.folder = pathlib.Path(folder.name)
+        self.hostile = self.folder / "hostile.json"
+        self.hostile.write_text(json.dumps(hostile_report()))
+
+    def start(self, *arguments, **settings):
+        process = subprocess.Popen([str(a) for a in arguments], **settings)
+
+        def end():
+            process.terminate()
+            process.wait(20)
+        self.addCleanup(end)
+        return process
+
+
+class TakenByPrograms(Folder):
+    def test_jq_reads_events(self):
+        jq = tool("jq")
+        for source in (*(f"sim:examples/{e}.json" for e in EXAMPLES), self.hostile):
+            command = ("report", source) if source == self.hostile else ("collect", "--from", source)
+            text = run(*command, "--format", "events")
+            done = subprocess.run([jq, "-c", "select(.Key)"], input=text, text=True, capture_output=True)
+            with self.subTest(source=source):
+                self.assertEqual((done.returncode, done.stderr), (0, ""))
+                self.assertEqual(events_of(done.stdout), events_of(text))
+
+    def test_sqlite_imports_csv_and_reads_events(self):
+        sqlite = tool("sqlite3")
+        for source in ("rack-server", "hostile"):
+            made = (lambda form: run("report", self.hostile, "--format", form)) if source == "hostile" else (
+                lambda form: collect(source, form))
+            (self.folder / "events.csv").write_bytes(made("csv").encode())
+            (self.folder / "events.json").write_text(made("events"))
+            events = events_of((self.folder / "events.json").read_text())
+            script = (".mode json\n.import --csv events.csv imported\n"
+                      "select Key, Severity, Reading, Text from imported;\n")
+            done = subprocess.run([sqlite, ":memory:"], input=script, text=True, capture_output=True, cwd=self.folder)
+            self.assertEqual((done.returncode, done.stderr), (0, ""))
+            rows = json.loads(done.stdout)
+            with self.subTest(source=source):
+                self.assertEqual([row["Key"] for row in rows], [event["Key"] for event in events])
+                for row, event in zip(rows, events):
+                    self.assertEqual(row["Severity"], event.get("Severity", ""))
+                    self.assertEqual(row["Reading"] and float(row["Reading"]), event.get("Reading", ""))
+                    if source != "hostile":
+                        self.assertEqual(row["Text"], event["Text"])
+                lines = (self.folder / "events.json").read_text().splitlines()
+                database = sqlite3.connect(":memory:")
+                for line, event in zip(lines, events):
+                    self.assertEqual(database.execute("select json_extract(?, '$.Sentence')", (line,)).fetchone()[0],
+                                     event["Sentence"])
+
+    def test_promtool_takes_metrics_and_rules(self):
+        promtool = tool("promtool")
+        texts = [collect(example, "prometheus") for example in EXAMPLES]
+        for text in (*texts, run("report", self.hostile, "--format", "prometheus")):
+            done = subprocess.run([promtool, "check", "metrics"], input=text, text=True, capture_output=True)
+            self.assertEqual((done.returncode, done.stderr), (0, ""), text)
+        rules = TREE / "examples/prometheus/ipmisel.test.yml"
+        done = subprocess.run([promtool, "test", "rules", rules.name], cwd=rules.parent, capture_output=True)
+        self.assertEqual(done.returncode, 0, done.stdout + done.stderr)
+
+    def test_a_node_exporter_serves_the_metrics(self):
+        exporter, port = tool("prometheus-node-exporter"), free_port()
+        for source, name in (("collect --from sim:examples/rack-server.json", "rack"), (f"report {self.hostile}", "bad")):
+            run(*source.split(), "--format", "prometheus", "--output", self.folder / f"{name}.prom")
+        self.start(exporter, "--collector.disable-defaults", "--collector.textfile",
+                   f"--collector.textfile.directory={self.folder}", f"--web.listen-address=127.0.0.1:{port}",
+                   stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
+
+        def fetch():
+            try:
+                connection = http.client.HTTPConnection("127.0.0.1", port, timeout=10)
+                connection.request("GET", "/metrics")
+                return connection.getresponse().read().decode()
+            except OSError:
+                return ""
+        self.assertTrue(wait_until(fetch))
+        served = fetch()
+        self.assertIn("node_textfile_scrape_error 0", served)
+
+        def samples(text):
+            """Name and labels of a sample, and its value."""
+            found = {}
+            for line in re.findall(r"(?m)^ipmisel_.*$", text):
+                series, value = line.rsplit(" ", 1)
+                name, _, labels = series.partition("{")
+                found[name, frozenset(re.findall(r'(\w+)="((?:[^"\\]|\\.)*)"', labels))] = float(value)
+            return found
+        written = samples("".join((self.folder / f"{name}.prom").read_text() for name in ("rack", "bad")))
+        self.assertGreater(len(written), 20)
+        self.assertEqual(samples(served), written)
+
+    def test_rsyslog_keeps_every_field_of_an_event(self):
+        rsyslogd, port = tool("rsyslogd"), free_port()
+        conf = (TREE / "examples/rsyslog/ipmisel.conf").read_text()
+        output, spool = self.folder / "kept.json", self.folder / "spool"
+        spool.mkdir()
+        conf = conf.replace("/var/log/ipmisel.json", str(output)).replace("/var/spool/ipmisel", str(spool))
+        # The same rules behind a port of loopback too.
+        conf += ('module(load="imptcp")\n'
+                 f'input(type="imptcp" address="127.0.0.1" port="{port}" ruleset="ipmisel")\n')
+        conf = conf.replace("global(", f'global(workDirectory="{self.folder}" ', 1)
+        (self.folder / "rsyslog.conf").write_text(conf)
+        checked = subprocess.run([rsyslogd, "-N1", "-f", self.folder / "rsyslog.conf"], capture_output=True, text=True)
+        self.assertEqual(checked.returncode, 0, checked.stderr)
+        daemon = self.start(rsyslogd, "-n", "-f", self.folder / "rsyslog.conf", "-i", self.folder / "pid",
+                            stderr=subprocess.DEVNULL)
+        text = collect("rack-server", "events") + run("report", self.hostile, "--format", "events")
+        wanted = [json.loads(line) for line in text.splitlines()]
+        (spool / "first.events").write_text(text)
+
+        def kept():
+            return output.read_text().splitlines() if output.exists() else []
+        self.assertTrue(wait_until(lambda: len(kept()) >= len(wanted) or daemon.poll() is not None, 40))
+        self.assertEqual([json.loads(line) for line in kept()], wanted)
+        with socket.create_connection(("127.0.0.1", port), timeout=10) as line:
+            for event in wanted:  # RFC 5424 in the frames of RFC 6587
+                message = "<133>1 - - ipmisel - - - " + json.dumps(event)
+                line.sendall(f"{len(message)} {message}".encode())
+        self.assertTrue(wait_until(lambda: len(kept()) >= 2 * len(wanted), 40), len(kept()))
+        self.assertEqual([json.loads(line) for line in kept()[len(wanted):]], wanted)
+
+    def test_the_journal_keeps_the_lines(self):
+        cat, journalctl = tool("systemd-cat"), tool("journalctl")
+        tag = f"ipmisel-{uuid.uuid4()}"
+        text = collect("memory-failure", "events")
+        done = subprocess.run([cat, "-t", tag], input=text, text=True, capture_output=True)
+        if done.returncode != 0:
+            raise unittest.SkipTest("SKIPPED: no journal runs here: " + done.stderr.strip())
+
+        def kept():
+            out = subprocess.run([journalctl, "-o", "json", "-t", tag], capture_output=True, text=True).stdout
+            return [json.loads(json.loads(line)["MESSAGE"]) for line in out.splitlines()]
+        wanted = [json.loads(line) for line in text.splitlines()]
+        self.assertTrue(wait_until(lambda: len(kept()) >= len(wanted)))
+        self.assertEqual(kept(), wanted)
+
+
+class ReadInABrowser(Folder):
+    def dom(self, page, *options, script=True):
+        """The page as the browser has it, without any network, and what it complained of."""
+        alone = ["unshare", "--net"] if os.geteuid() == 0 and shutil.which("unshare") else []
+        done = subprocess.run(
+            [*alone, tool("chromium"), "--headless=new", "--no-sandbox", "--disable-gpu", "--no-first-run",
+             f"--user-data-dir={self.folder}/profile", "--enable-logging=stderr", "--dump-dom",
+             "--host-resolver-rules=MAP * ~NOTFOUND", *options,
+             *([] if script else ["--blink-settings=scriptEnabled=false"]), f"file://{page}"],
+            capture_output=True, text=True, timeout=180)
+        self.assertNotIn("Content Security Policy", done.stderr)
+        self.assertNotRegex(done.stderr, "CONSOLE.*Error")
+        return done.stdout
+
+    def page(self, text):
+        page = self.folder / "page.html"
+        page.write_text(text)
+        return page
+
+    def test_the_page_works_with_its_script_and_is_whole_without(self):
+        tool("chromium")
+        events = events_of(collect("rack-server", "events"))
+        page = self.page(collect("rack-server", "html"))
+        alive = self.dom(page)
+        self.assertIn(f"{len(events)} events</output>", alive)
+        self.assertNotRegex(alive, r'<form[^>]* hidden=')
+        self.assertGreater(alive.count("<option"), 20)
+        still = self.dom(page, script=False)
+        self.assertRegex(still, r'<form[^>]* hidden=')
+        for dom in (alive, still):
+            found = Page(dom)
+            self.assertEqual(found.tags.count("tr"), Page(page.read_text()).tags.count("tr"))
+            for event in events:
+                self.assertIn(event["Text"], found.text)
+
+    def test_what_a_controller_says_stays_text(self):
+        tool("chromium")
+        page = self.page(run("report", self.hostile, "--format", "html"))
+        dom = self.dom(page)
+        self.assertEqual(Page(dom).tags.count("script"), 1)
+        self.assertIn("&lt;script&gt;alert(1)&lt;/script&gt;", dom)
+
+    def test_tidy_finds_no_error(self):
+        tidy = tool("tidy")
+        for text in (*(collect(e, "html") for e in EXAMPLES), run("report", self.hostile, "--format", "html")):
+            done = subprocess.run([tidy, "-q", "-e"], input=text, text=True, capture_output=True)
+            self.assertNotIn("Error", done.stderr)
+
+    def test_a_thousand_events_take_a_second_and_a_megabyte(self):
+        file = self.folder / "thousand.json"
+        file.write_text(json.dumps(hostile_report(count=1000)))
+        times = []
+        for _ in range(3):
+            began = time.monotonic()
+            text = run("report", file, "--format", "html")
+            times.append(time.monotonic() - began)
+        self.assertLess(len(text), 1_000_000)
+        self.assertLess(min(times), 1)
+
+
+class LongestLog(Folder):
+    def test_is_written_in_little_memory(self):
+        file = self.folder / "long.json"
+        file.write_text(json.dumps(hostile_report(count=65535)))
+        server = self.folder / "server.json"
+        subprocess.run([sys.executable, TREE / "bench/make_log.py", "sim", "65279", "255", server], check=True)
+        capture = self.folder / "capture"
+        run("collect", "--from", f"sim:{server}", "--format", "events", "--output", self.folder / "out",
+            "--record", capture)
+        for source, forms in ((("report", file), ("ndjson", "events", "csv", "redfish", "otlp", "json")),
+                              (("collect", "--from", f"sim:{server}"), ("ndjson", "events", "csv", "otlp", "json")),
+                              (("collect", "--from", f"replay:{capture}"), ("events", "csv", "otlp"))):
+            for form in forms:
+                done = subprocess.run(
+                    [sys.executable, "-c", "import resource,subprocess,sys\n"
+                     "subprocess.run(sys.argv[1:])\n"
+                     "print(resource.getrusage(resource.RUSAGE_CHILDREN).ru_maxrss)",
+                     PROGRAM, *source, "--format", form, "--output", self.folder / "out"],
+                    capture_output=True, text=True, cwd=TREE)
+                kib = int(done.stdout.split()[-1])
+                print(f"{source[0]} {pathlib.Path(source[-1]).name}, {form}: {kib / 1024:.1f} MiB")
+                with self.subTest(source=source, form=form):
+                    self.assertGreater((self.folder / "out").stat().st_size, 10_000_000)
+                    self.assertLess(kib, 32 << 10)
+
+    def test_stays_readable(self):
+        file = self.folder / "long.json"
+        file.write_text(json.dumps(hostile_report(count=65535)))
+        text = run("report", file, "--format", "html")
+        self.assertIn("65535 events, folded", text)
+        self.assertEqual(len(re.findall("<details class=\"fold\"", text)), math.ceil(65535 / 1000))
+        self.assertEqual(text.count("<details class=\"fold\" open>"), 1)
+
+
+if __name__ == "__main__":
+    unittest.main(argv=sys.argv[:1], verbosity=2)
