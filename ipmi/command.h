@@ -131,6 +131,7 @@ Command ReadFruData(std::uint8_t device, std::uint16_t offset, std::uint8_t coun
 
 /// Completion codes, table 5-2.
 constexpr std::uint8_t kCompleted = 0x00;
+constexpr std::uint8_t kFruDeviceBusy = 0x81;  ///< of the FRU commands (34.2)
 constexpr std::uint8_t kNodeBusy = 0xC0;
 constexpr std::uint8_t kInvalidCommand = 0xC1;
 constexpr std::uint8_t kInvalidForLun = 0xC2;

@@ -238,26 +238,30 @@ private:
     void Say(std::string_view label, std::string_view words) {
         if (!words.empty()) out_.words.push_back(std::string(label) + std::string(words));
     }
+    static std::string CodeText(std::uint8_t code) { return "code " + ipmisel::HexByte(code); }
     // A code that the standard reserves is still told, as a number.
     void SayCode(Words words, std::uint8_t code) {
-        if (code < words.size()) {
-            Say(words[code]);
-        } else {
-            Say("code " + ipmisel::HexByte(code));
-        }
+        Say(code < words.size() ? std::string(words[code]) : CodeText(code));
     }
     void SayNumber(std::string_view label, unsigned number) {
         out_.words.push_back(std::string(label) + std::to_string(number));
+    }
+
+    // An offset without words is told as a number.
+    void SayOffset(std::string_view label, std::uint8_t eventType, std::uint8_t sensorType,
+                   std::uint8_t offset) {
+        const std::string_view words = EventOffsetText(eventType, sensorType, offset);
+        Say(label, words.empty() ? "offset " + std::to_string(offset) : std::string(words));
     }
 
     // Bits 7..4 are an offset of type 07h, bits 3..0 one of the event's own type; Fh is none.
     void SeverityAndPreviousState() {
         const std::uint8_t byte = Data2();
         if (High(byte) != kUnspecifiedNibble) {
-            Say("severity by the sensor: ", EventOffsetText(kSeverityEvents, 0, High(byte)));
+            SayOffset("severity by the sensor: ", kSeverityEvents, record_.sensorType, High(byte));
         }
         if (Low(byte) != kUnspecifiedNibble) {
-            Say("previously: ", EventOffsetText(record_.eventType, record_.sensorType, Low(byte)));
+            SayOffset("previously: ", record_.eventType, record_.sensorType, Low(byte));
         }
     }
 
@@ -277,7 +281,7 @@ private:
             case 5:
                 if (Extends3()) {
                     const std::uint8_t percent = Data3();
-                    if (percent <= 100) Say(std::to_string(percent) + "% full");
+                    Say(percent <= 100 ? std::to_string(percent) + "% full" : CodeText(percent));
                 }
                 break;
             case 6:
@@ -318,8 +322,8 @@ private:
             case 3: {
                 if (!Extends2()) break;
                 const std::uint8_t byte = Data2();
-                Say(At(kAuxiliaryLogs, Low(byte)));
-                Say(At(kAuxiliaryLogActions, High(byte)));
+                SayCode(kAuxiliaryLogs, Low(byte));
+                SayCode(kAuxiliaryLogActions, High(byte));
                 break;
             }
             case 4: {
@@ -327,6 +331,9 @@ private:
                 const std::uint8_t actions = Data2();
                 for (std::size_t bit = 0; bit < kPefActions.size(); ++bit) {
                     if ((actions >> bit & 1) != 0) Say(kPefActions[bit]);
+                }
+                if (const std::uint8_t reserved = actions & 0xC0; reserved != 0) {
+                    Say(CodeText(reserved));
                 }
                 break;
             }
@@ -355,6 +362,7 @@ private:
             out_.slotNumber = Data3();
         }
         std::string words(out_.slotType ? At(kSlotTypes, *out_.slotType) : std::string_view());
+        if (out_.slotType && words.empty()) Say("slot type " + ipmisel::HexByte(*out_.slotType));
         if (out_.slotNumber) {
             const std::string number = ' ' + std::to_string(*out_.slotNumber);
             if (words.empty()) words = "slot";
@@ -374,7 +382,11 @@ private:
             out_.sensorNumber = number;
             Say("sensor " + ipmisel::HexByte(number));
         }
-        if (offset != kFruFailed || !Extends2()) return;
+        if (offset != kFruFailed) return;
+        if (!Extends2()) {
+            if (Extends3()) Say("FRU device ID or address " + ipmisel::HexByte(Data3()));
+            return;
+        }
         const std::uint8_t access = Data2();
         const bool logical = (access & 0x80) != 0;
         if (!logical) SayNumber("private bus ", access & 0x07);
@@ -405,10 +417,14 @@ private:
     void FruState() {
         if (!Extends2()) return;
         const std::uint8_t byte = Data2();
-        Say(High(byte) == kUnspecifiedNibble ? "cause unknown" : At(kFruStateCauses, High(byte)));
+        if (High(byte) == kUnspecifiedNibble) {
+            Say("cause unknown");
+        } else {
+            SayCode(kFruStateCauses, High(byte));
+        }
         // The present state stands for a previous one that is not known.
         if (Low(byte) != record_.offset()) {
-            Say("previously: ", EventOffsetText(record_.eventType, record_.sensorType, Low(byte)));
+            SayOffset("previously: ", record_.eventType, record_.sensorType, Low(byte));
         }
     }
 
@@ -419,7 +435,7 @@ private:
                 if (offset == 4 && Extends2()) SayNumber("network controller ", Data2());
                 break;
             case sensor_type::kPowerSupply:
-                if (offset == 6 && Extends3()) Say(At(kSupplyConfigurationErrors, Low(Data3())));
+                if (offset == 6 && Extends3()) SayCode(kSupplyConfigurationErrors, Low(Data3()));
                 break;
             case sensor_type::kMemory:
                 if (Extends3()) MemoryModule(Data3());
@@ -435,14 +451,13 @@ private:
                 SystemEvent();
                 break;
             case sensor_type::kChipSet:
-                // The states are offsets of the ACPI power state sensor.
                 if (offset != 0) break;
-                if (Extends2()) PowerState("requested: ", Data2());
-                if (Extends3()) PowerState("state at the request: ", Data3());
+                if (Extends2()) PowerState("requested: ", Data2(), false);
+                if (Extends3()) PowerState("state at the request: ", Data3(), true);
                 break;
             case sensor_type::kSystemBoot:
                 if (offset != 7) break;
-                if (Extends2()) Say(At(kRestartCauses, Low(Data2())));
+                if (Extends2()) SayCode(kRestartCauses, Low(Data2()));
                 if (Extends3()) SayNumber("channel ", Low(Data3()));
                 break;
             case sensor_type::kSlot:
@@ -451,7 +466,7 @@ private:
             case sensor_type::kWatchdog2:
                 if (Extends2()) {
                     const std::uint8_t byte = Data2();
-                    Say(At(kWatchdogInterrupts, High(byte)));
+                    if (High(byte) != kUnspecifiedNibble) SayCode(kWatchdogInterrupts, High(byte));
                     Say("timer use ", At(kTimerUses, Low(byte)));
                 }
                 break;
@@ -472,8 +487,15 @@ private:
         }
     }
 
-    void PowerState(std::string_view label, std::uint8_t state) {
-        Say(label, EventOffsetText(kSensorSpecificEvents, sensor_type::kAcpiPowerState, state));
+    // The first thirteen are offsets of the ACPI power state sensor; of the state at the request
+    // the one after them is "unknown".
+    void PowerState(std::string_view label, std::uint8_t state, bool hasUnknown) {
+        constexpr std::uint8_t kLegacyOff = 0x0C;
+        if (state <= kLegacyOff) {
+            SayOffset(label, kSensorSpecificEvents, sensor_type::kAcpiPowerState, state);
+        } else {
+            Say(label, hasUnknown && state == kLegacyOff + 1 ? "unknown" : CodeText(state));
+        }
     }
 
     void Vendors() {

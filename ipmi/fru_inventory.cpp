@@ -311,6 +311,7 @@ private:
     bool ReadMultiRecord(unsigned number, std::size_t* at) {
         constexpr std::size_t kRecordHeader = 5;
         constexpr std::uint8_t kLast = 0x80;
+        constexpr std::uint8_t kRecordFormat = 2;
         const std::string name = Format("multi-record %u", number);
         if (bytes_.size() - *at < kRecordHeader) {
             Problem(name, "the device ends before the last record");
@@ -319,6 +320,11 @@ private:
         const Bytes header = bytes_.subspan(*at, kRecordHeader);
         if (!AddsUpToZero(header)) {
             Problem(name, "checksum of the header is wrong; what follows is not read");
+            return false;
+        }
+        // Zeros, too, have a right checksum.
+        if (const unsigned format = header[1] & kFormatVersionBits; format != kRecordFormat) {
+            Problem(name, Format("format version is %u, not 2; what follows is not read", format));
             return false;
         }
         Bytes data = bytes_.subspan(*at + kRecordHeader);

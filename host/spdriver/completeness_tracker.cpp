@@ -239,16 +239,28 @@ void CompletenessTracker::NoteFru(const RequestFrame& request,
     const bool counts = response && response->size() >= kFruAnswer;
     const std::size_t least = kFruAnswer + (counts ? response->at(1) : 0);
     const std::string problem = ProblemOf(response, least);
-    if (!problem.empty()) {
-        AddFault({"Read FRU Data", ipmisel::Format("%04x", device), problem, false});
+    const bool askedAgain =
+        refusedFru_ && refusedFru_->device == device && refusedFru_->offset == offset;
+    if (!askedAgain) refusedFru_.reset();
+    if (problem.empty()) {
+        // Refused for its length or since the device was busy, then answered: nothing is missing.
+        if (!askedAgain) return;
+        for (const ReadFault& fault : refusedFru_->faults) std::erase(account_.faults, fault);
+        refusedFru_.reset();
+        return;
     }
+    if (!refusedFru_) refusedFru_ = RefusedFru{device, offset, {}};
+    const ReadFault fault{"Read FRU Data", ipmisel::Format("%04x", device), problem, false};
+    if (AddFault(fault)) refusedFru_->faults.push_back(fault);
 }
 
-void CompletenessTracker::AddFault(ReadFault fault) {
-    if (account_.faults.size() >= kMaxFaults) return;
-    if (std::find(account_.faults.begin(), account_.faults.end(), fault) == account_.faults.end()) {
-        account_.faults.push_back(std::move(fault));
+bool CompletenessTracker::AddFault(ReadFault fault) {
+    const auto& known = account_.faults;
+    if (known.size() >= kMaxFaults || std::find(known.begin(), known.end(), fault) != known.end()) {
+        return false;
     }
+    account_.faults.push_back(std::move(fault));
+    return true;
 }
 
 std::string CompletenessTracker::ProblemOf(const std::optional<Response>& response,

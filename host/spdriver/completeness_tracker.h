@@ -62,7 +62,8 @@ private:
     /// Bytes that an answer must have, by what was asked and what is known of the record.
     static std::size_t WholeAnswer(const Source& source, std::uint16_t record, std::uint8_t offset,
                                    std::uint8_t count);
-    void AddFault(ReadFault fault);
+    /// False when it is known already, or there are too many.
+    bool AddFault(ReadFault fault);
     /// What went wrong with an answer that has to have so many bytes; empty when nothing did.
     std::string ProblemOf(const std::optional<Response>& response, std::size_t least) const;
 
@@ -72,6 +73,13 @@ private:
     Source sensors_;
     FactTracker facts_;
     std::uint8_t lastCommand_ = 0;  ///< Storage command
+    /// The read of a FRU device that was refused last, and the faults that this added.
+    struct RefusedFru {
+        std::uint8_t device;
+        std::uint16_t offset;
+        std::vector<ReadFault> faults;
+    };
+    std::optional<RefusedFru> refusedFru_;
     /// What of Get SEL Info tells that the log has changed.
     struct LogState {
         std::uint16_t records;

@@ -62,15 +62,20 @@ std::string PcieText(const ipmi::PcieError& error) {
                            error.bus, error.device, error.function);
 }
 
-// "reading 87 degrees C, threshold 86 degrees C"; empty when neither is known.
+// "reading 87 degrees C, threshold 86 degrees C"; "raw reading 13h" where nobody tells what the
+// sensor's counts mean; empty when the event has neither.
 std::string ReadingText(const Event& event) {
     const std::string unit = event.unit.empty() ? std::string() : ' ' + event.unit;
     std::string text;
-    if (event.reading) text = "reading " + NumberText(*event.reading) + unit;
-    if (event.threshold) {
+    const auto add = [&](const char* label, std::optional<double> value,
+                         std::optional<std::uint8_t> raw) {
+        if (!value && !raw) return;
         if (!text.empty()) text += ", ";
-        text += "threshold " + NumberText(*event.threshold) + unit;
-    }
+        text += value ? label + NumberText(*value) + unit
+                      : std::string("raw ") + label + ipmisel::HexByte(*raw);
+    };
+    add("reading ", event.reading, event.data.reading);
+    add("threshold ", event.threshold, event.data.threshold);
     return text;
 }
 

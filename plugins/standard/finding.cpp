@@ -191,7 +191,9 @@ private:
 };
 
 std::string EvidenceText(const Event& event) {
-    return event.time ? TimeText(*event.time) + ": " + event.sentence : event.sentence;
+    if (event.time) return TimeText(*event.time) + ": " + event.sentence;
+    if (event.timeKind() != ipmi::TimeKind::kSinceStart) return event.sentence;
+    return std::to_string(event.record.time) + " s after the controller's start: " + event.sentence;
 }
 
 // What stands behind a title for the events that are not shown in it: those that say the same, and

@@ -1,8 +1,10 @@
 #include "plugins/standard/fru_device.h"
 
 #include <algorithm>
+#include <chrono>
 #include <span>
 #include <string_view>
+#include <thread>
 #include <utility>
 #include <variant>
 
@@ -79,14 +81,40 @@ void Decode(FruDevice* device, const std::vector<std::uint8_t>& bytes, std::size
     device->problems.insert(device->problems.end(), problems.begin(), problems.end());
 }
 
+/// Sends the commands of one device. A device that is busy is asked again, after a pause that
+/// doubles: it costs a third of a second at most.
+class DeviceCommands {
+public:
+    DeviceCommands(Controller& controller, std::uint8_t lun) : controller_(controller), lun_(lun) {}
+
+    std::optional<Answer> Send(ipmi::Command command) {
+        command.lun = lun_;
+        auto answer = controller_.Send(command);
+        while (answer && IsBusy(answer->completionCode) && busy_ < kMaxBusy) {
+            std::this_thread::sleep_for(kFirstPause * (1 << busy_++));
+            answer = controller_.Send(command);
+        }
+        return answer;
+    }
+
+private:
+    static constexpr std::chrono::milliseconds kFirstPause{10};
+    static constexpr int kMaxBusy = 5;
+
+    static bool IsBusy(std::uint8_t completionCode) {
+        return completionCode == ipmi::kFruDeviceBusy || completionCode == ipmi::kNodeBusy;
+    }
+
+    Controller& controller_;
+    std::uint8_t lun_;
+    int busy_ = 0;  ///< how often it was
+};
+
 /// Reads a device; false when it is not there.
 bool Read(Controller& controller, Place* place) {
-    const auto atLun = [&](ipmi::Command command) {
-        command.lun = place->lun;
-        return command;
-    };
     FruDevice& device = place->device;
-    const auto answer = controller.Send(atLun(ipmi::GetFruInventoryAreaInfo(device.deviceId)));
+    DeviceCommands commands(controller, place->lun);
+    const auto answer = commands.Send(ipmi::GetFruInventoryAreaInfo(device.deviceId));
     if (answer && (answer->completionCode == ipmi::kNotPresent ||
                    answer->completionCode == ipmi::kInvalidCommand)) {
         return false;
@@ -102,7 +130,7 @@ bool Read(Controller& controller, Place* place) {
     ipmi::FruDeviceReader reader(device.deviceId, *info);
     std::optional<Answer> last;
     while (const auto command = reader.NextRequest()) {
-        last = controller.Send(atLun(*command));
+        last = commands.Send(*command);
         if (!last) break;
         reader.TakeAnswer(last->completionCode, last->data);
     }

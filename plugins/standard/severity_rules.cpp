@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <charconv>
+#include <set>
 
 namespace standard {
 
@@ -102,9 +103,13 @@ std::string ParseRule(std::string_view line, Rule* rule) {
                "\" is no severity: information, ok, warning, critical, fatal or none";
     }
     if (line.empty() || line.front() == '#') return "a rule needs a condition";
+    std::set<std::string_view> names;
     while (!line.empty() && line.front() != '#') {
-        std::string problem = AddCondition(TakeWord(&line), rule);
+        const std::string_view word = TakeWord(&line);
+        std::string problem = AddCondition(word, rule);
         if (!problem.empty()) return problem;
+        const std::string_view name = word.substr(0, word.find('='));
+        if (!names.insert(name).second) return std::string(name) + " stands twice";
     }
     return {};
 }

@@ -1,5 +1,5 @@
 // The standard's own reading: a whole pass over a controller that answers what the fuzzer wants,
-// and the decoders of records and answers one by one.
+// the decoders of records and answers one by one, and the user's file of severities.
 //
 // Input: the answers one after the other, each a length byte (0xFF: no response) and so many bytes,
 // the completion code first. When the input is used up nothing answers any more.
@@ -15,11 +15,23 @@
 
 #include "host/core/host.h"
 #include "host/spdriver/source.h"
+#include "ipmi/chassis_status.h"
+#include "ipmi/device_id.h"
+#include "ipmi/event_data.h"
+#include "ipmi/event_offsets.h"
+#include "ipmi/guid.h"
+#include "ipmi/id_string.h"
 #include "ipmi/pef.h"
+#include "ipmi/sdr_info.h"
 #include "ipmi/sdr_record.h"
+#include "ipmi/sel_info.h"
+#include "ipmi/sel_record.h"
+#include "ipmi/self_test.h"
 #include "ipmi/sensor_reading.h"
+#include "ipmi/severity.h"
 #include "ipmi/units.h"
 #include "plugins/standard/plugin.h"
+#include "plugins/standard/severity_rules.h"
 
 namespace {
 
@@ -54,7 +66,38 @@ public:
     bool CloseInstance() override { return true; }
 };
 
+/// The bytes as a log, record after record.
+void DecodeLog(Input bytes) {
+    for (; bytes.size() >= ipmi::kSelRecordSize; bytes = bytes.subspan(ipmi::kSelRecordSize)) {
+        const ipmi::SelRecord record = *ipmi::ParseSelRecord(bytes);
+        ipmi::GeneratorText(record.generator);
+        ipmi::EventOffsetText(record.eventType, record.sensorType, record.offset());
+        ipmi::GradeOf(record.eventType, record.sensorType, record.offset());
+        // Two bytes, none of them told twice.
+        if (ipmi::DecodeEventData(record).oemBytes.size() > 2) __builtin_trap();
+        ipmi::ClockSetOf(record);
+        ipmi::ParsePanicPiece(record);
+        ipmi::ParsePcieError(record);
+    }
+}
+
+void DecodeAnswers(Input bytes) {
+    ipmi::ParseDeviceId(bytes);
+    ipmi::ParseGuid(bytes);
+    ipmi::SelfTestText(bytes);
+    ipmi::ChassisStatus::Parse(bytes);
+    ipmi::ParseSelInfo(bytes);
+    ipmi::ParseSelAllocation(bytes);
+    ipmi::ParseSelTime(bytes);
+    ipmi::ParseSelTimeUtcOffset(bytes);
+    ipmi::ParseSelEntry(bytes);
+    ipmi::SdrRepositoryInfo::Parse(bytes);
+    if (!bytes.empty()) ipmi::DecodeIdString(bytes[0], bytes.subspan(1));
+}
+
 void Decode(Input bytes) {
+    DecodeLog(bytes);
+    DecodeAnswers(bytes);
     if (const auto record = ipmi::SdrRecord::Parse(bytes)) {
         for (const ipmi::Sensor& sensor : record->Sensors()) {
             ipmi::UnitText(sensor.units);
@@ -76,6 +119,9 @@ void Decode(Input bytes) {
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     const Input input(data, size);
     Decode(input);
+    standard::SeverityRules rules;
+    standard::SeverityRules::Parse(std::string_view(reinterpret_cast<const char*>(data), size),
+                                   &rules);
 
     NQORTQR20::Source source;
     source.nodes.push_back({"", std::make_unique<FuzzedController>(input), nullptr});

@@ -252,6 +252,11 @@ TEST(FruInventory, MultiRecordsEndWithTheDevice) {
     EXPECT_THAT(inventory.problems,
                 ElementsAre("multi-record 22: the device ends before the last record"));
 
+    // Zeros add up to zero, and are no records.
+    EXPECT_THAT(
+        Read({{}, {}, {}, FruBytes(64, 0)}).problems,
+        ElementsAre("multi-record 1: format version is 0, not 2; what follows is not read"));
+
     records = MultiRecord(0xC0, false, {1, 2, 3, 4});
     records.resize(8);
     EXPECT_THAT(Read({{}, {}, {}, records}).problems,

@@ -133,6 +133,22 @@ TEST_F(Completeness, AnInventoryDeviceIsReadWhenItsEndIs) {
     EXPECT_EQ(Faults(), Texts{});
 }
 
+TEST_F(Completeness, AnInventoryReadThatWasRefusedAndThenAnsweredIsNoFault) {
+    bmc.fru[3] = ipmisim::Bytes(64, 0xAA);
+    FailWith(0x11, 1, 0xCA);
+    FailWith(0x11, 2, 0x81);
+    FailWith(0x11, 4, 0x81);
+    Ask(ipmi::ReadFruData(3, 0, 32));
+    Ask(ipmi::ReadFruData(3, 0, 16));
+    EXPECT_EQ(Faults().size(), 2u);
+    Ask(ipmi::ReadFruData(3, 0, 16));
+    EXPECT_EQ(Faults(), Texts{});
+    Ask(ipmi::ReadFruData(3, 16, 16));
+    Ask(ipmi::ReadFruData(3, 32, 16));  // goes on without it
+    Ask(ipmi::ReadFruData(3, 16, 16));
+    EXPECT_EQ(Faults(), Texts{"Read FRU Data 0003: completion code 81"});
+}
+
 TEST_F(Completeness, AQuestionAnsweredAtTheSecondTryLeavesNothingOut) {
     Silence(0x40, 1);
     Send(0x40);

@@ -77,6 +77,22 @@ TEST(EventText, NamesPartSensorReadingAndThreshold) {
     EXPECT_EQ(events[1].threshold, std::nullopt);
 }
 
+TEST(EventText, AReadingThatNobodyCanConvertIsToldRaw) {
+    LogBuilder log;
+    log.Temperature(0x31, "Fan 1").sensor.sensorType = 0x04;  // of another type than the events
+    log.Event(0x02, 0xDD, 0x01, {0x52, 0x13, 0xBA})
+        .Event(0x02, 0xDD, 0x01, {0x42, 0x13, 0xBA})
+        .Event(0x01, 0x31, 0x01, {0x52, 0x13, 0xBA});
+    const auto events = log.Derive();
+    EXPECT_EQ(events[0].sentence,
+              "Voltage sensor DDh: below the lower critical threshold (raw reading 13h, raw "
+              "threshold BAh)");
+    EXPECT_EQ(events[0].reading, std::nullopt);
+    EXPECT_THAT(events[1].sentence, EndsWith("(raw reading 13h)"));
+    EXPECT_EQ(events[2].sentence,
+              "Fan 1: below the lower critical threshold (raw reading 13h, raw threshold BAh)");
+}
+
 TEST(EventText, NamesAPartThatIsCalledAsItsSensorOnceAndNoneOfASoftwareEvent) {
     LogBuilder log;
     log.Sensor(0x53, 0x04, 0x04, "Fan 3", {.id = 0x1D, .instance = 3});
@@ -120,7 +136,8 @@ TEST(EventText, OfASensorWhoseRecordSensesSomethingElseHasTheNameAtMost) {
     log.Temperature(0x30, "CPU1 Temp", {.id = 0x03, .instance = 1});
     log.Event(0x02, 0x30, 0x01, {0x59, 96, 95});
     const Event event = log.Derive()[0];
-    EXPECT_EQ(event.sentence, "CPU1 Temp: above the upper critical threshold");
+    EXPECT_EQ(event.sentence,
+              "CPU1 Temp: above the upper critical threshold (raw reading 60h, raw threshold 5Fh)");
     EXPECT_TRUE(event.part.parts.empty());
     EXPECT_EQ(event.reading, std::nullopt);
 }

@@ -223,6 +223,18 @@ TEST(Finding, OfAnOpenEventSaysWhatTheSensorReadsNow) {
     EXPECT_EQ(findings[0].stillPresent, true);
 }
 
+TEST(Finding, AnEventOfNoDateSaysHowLongAfterTheStartItWas) {
+    LogBuilder log;
+    log.At(93).Event(kPowerSupply, 0x71, kAsserted, Offset(1));
+    log.At(0xFFFFFFFF).Event(kPowerSupply, 0x72, kAsserted, Offset(1));
+    const auto findings = Findings(log);
+    ASSERT_EQ(findings.size(), 2u);
+    EXPECT_THAT(findings[0].evidence,
+                ElementsAre("93 s after the controller's start: Power Supply sensor 71h: power "
+                            "supply failed"));
+    EXPECT_THAT(findings[1].evidence, ElementsAre("Power Supply sensor 72h: power supply failed"));
+}
+
 TEST(Burst, EndsWithAGapASetClockAnotherKindOfTimeAndAClearedLog) {
     LogBuilder log;
     const auto press = [&log](std::uint32_t time) {

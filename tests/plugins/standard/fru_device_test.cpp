@@ -109,6 +109,21 @@ TEST_F(FruDeviceTest, WhatFailsIsToldAndWhatWasReadIsUsed) {
                 Contains("64 of " + std::to_string(size) + " bytes could be read: no answer"));
 }
 
+TEST_F(FruDeviceTest, ADeviceThatIsBusyForAWhileIsReadWhole) {
+    constexpr std::uint8_t kAreaInfo = 0x10;
+    constexpr std::uint8_t kRead = 0x11;
+    bmc.fru[0] = WholeFruImage().Bytes();
+    bmc.faults = {CompletionCode(kAreaInfo, 1, 0xC0), CompletionCode(kRead, 1, 0x81),
+                  CompletionCode(kRead, 3, 0xC0)};
+    const auto devices = Read({});
+    ASSERT_THAT(devices, SizeIs(1));
+    EXPECT_THAT(devices[0].problems, IsEmpty());
+    EXPECT_EQ(devices[0].SerialNumber(), "SN01");
+    bmc.faults = {CompletionCode(kRead, 0, 0x81)};
+    EXPECT_THAT(Read({})[0].problems,
+                ElementsAre(HasSubstr("bytes could be read: completion code 81h")));
+}
+
 TEST(FruDevice, NumbersToOrderByAreTheProductsElseTheBoards) {
     FruDevice device;
     const FruBytes image = WholeFruImage().Bytes();

@@ -75,6 +75,7 @@ TEST(SeverityRules, ABadLineIsRefusedWithItsNumber) {
          "the name of a sensor stands in quotation marks, sensor=\"Fan 1\""},
         {"warning sensor=\"Fan\"1\"",
          "the name of a sensor stands in quotation marks, sensor=\"Fan 1\""},
+        {"warning offset=1 number=2 offset=1", "offset stands twice"},
         {"warning direction=up", "direction is asserted or deasserted"},
     };
     for (const auto& c : cases) {
