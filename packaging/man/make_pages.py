@@ -1,7 +1,7 @@
 #!/usr/bin/env python3
 """Makes the manual pages from the documents and from the program's own help, so that nothing is said twice.
 
-usage: make_pages.py PROGRAM FOLDER      pages in FOLDER/man1 and FOLDER/man5; needs lowdown and help2man
+usage: make_pages.py PROGRAM FOLDER      pages in FOLDER/man1, man5 and man7; needs lowdown and help2man
 
 A document's first heading goes, its other headings go up by one level, links become their text. Of each
 command that PROGRAM lists there is a page, made of what the command says with --help.
@@ -18,6 +18,7 @@ DOCUMENTS = (
     ("simulated-server.md", "ipmisel-simulated-server", 5, "the file of a simulated server"),
     ("configuration.md", "ipmisel.conf", 5, "options and groups of hosts in a file"),
     ("severity-rules.md", "ipmisel-severity-rules", 5, "the file of the user's own severities"),
+    ("fleet.md", "ipmisel-fleet", 7, "collecting from many controllers"),
     ("capture.md", "ipmisel-capture", 5, "a capture of every exchange with a BMC"),
 )
 
