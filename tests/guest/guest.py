@@ -19,6 +19,23 @@ BOOT_SECONDS = 240  # software emulation on a busy machine; six seconds on an id
 MODULES = ("ipmi_msghandler", "ipmi_devintf", "ipmi_si")
 
 
+def record(number: int, kind: int, body: str, name: str) -> bytes:
+    """A sensor data record: header, body to the byte before the ID string, ID string."""
+    rest = bytes.fromhex(body) + bytes([0xC0 | len(name)]) + name.encode()
+    return bytes([number, 0, 0x51, kind, len(rest)]) + rest
+
+
+# A full record: sensor 0x30, degrees C, M = 1; and a compact one, sensor 0x31.
+SDRS = [
+    record(1, 1, "2000 30 0301 7f68 0101 000000000000 80010000 0100 0000 0000" + "00" * 17,
+           "CPU1 Temp"),
+    record(2, 2, "2000 31 0401 6740 0d6f 000000000000 c00000" + "00" * 8, "Drive 1"),
+]
+# record ID, type 02, time, generator, revision, sensor type, number, event type, data 1 to 3
+SEL = [bytes.fromhex(f"{i:02x}00 02 00000000 2000 04 {event}") for i, event in enumerate(
+    ["01 30 01 59 50 45", "01 30 81 59 40 45", "0d 31 6f f0 ff ff", "0f 00 6f c2 01 ff"], 1)]
+
+
 class Missing(Exception):
     """A facility of the test bed is not there; the text says which."""
 
@@ -73,7 +90,8 @@ def initramfs(build: pathlib.Path, modules: list[pathlib.Path], script: str) -> 
         raise Missing("no static busybox (package busybox-static)")
     files = {"bin/busybox": pathlib.Path(busybox)}
     files |= {f"modules/{module.name}": module for module in modules}
-    installed = [build / "bin/ipmisel", *sorted((build / "lib/ipmisel").iterdir())]
+    installed = [build / "bin/ipmisel", *sorted((build / "lib/ipmisel").iterdir()),
+                 *sorted((build / "tests").glob("program_with*_memory"))]
     libraries = set()
     for path in installed:
         files["opt/" + str(path.relative_to(build))] = path

@@ -5,12 +5,14 @@ usage: guest_test.py BUILD_FOLDER CACHE_FOLDER     (exit status 77: a facility i
 import json
 import os
 import pathlib
+import re
 import subprocess
 import sys
 import tempfile
 import unittest
 
 import guest
+from guest import SDRS, SEL
 
 BUILD = pathlib.Path(sys.argv[1]).resolve()
 CACHE = pathlib.Path(sys.argv[2]).resolve()
@@ -18,22 +20,6 @@ PROGRAM = BUILD / "bin/ipmisel"
 
 KCS_INTERNAL = ["-device", "ipmi-bmc-sim,id=bmc0", "-device", "isa-ipmi-kcs,bmc=bmc0"]
 LOG = "collect --from inband --format json --class QORSG_IPMILogRecord"
-
-def record(number: int, kind: int, body: str, name: str) -> bytes:
-    """A sensor data record: header, body to the byte before the ID string, ID string."""
-    rest = bytes.fromhex(body) + bytes([0xC0 | len(name)]) + name.encode()
-    return bytes([number, 0, 0x51, kind, len(rest)]) + rest
-
-
-# A full record: sensor 0x30, degrees C, M = 1; and a compact one, sensor 0x31.
-SDRS = [
-    record(1, 1, "2000 30 0301 7f68 0101 000000000000 80010000 0100 0000 0000" + "00" * 17,
-           "CPU1 Temp"),
-    record(2, 2, "2000 31 0401 6740 0d6f 000000000000 c00000" + "00" * 8, "Drive 1"),
-]
-# record ID, type 02, time, generator, revision, sensor type, number, event type, data 1 to 3
-SEL = [bytes.fromhex(f"{i:02x}00 02 00000000 2000 04 {event}") for i, event in enumerate(
-    ["01 30 01 59 50 45", "01 30 81 59 40 45", "0d 31 6f f0 ff ff", "0f 00 6f c2 01 ff"], 1)]
 
 
 def external(tcp: int) -> list[str]:
@@ -92,6 +78,22 @@ class InTheGuest(unittest.TestCase):
                                        *KCS_INTERNAL[2:]])
         self.assertEqual(json.loads(run.out)["completeness"][0]["sensors"]["read"], len(sensors))
         self.assertIn(run.transactions, range(len(sensors), len(sensors) + 24))
+
+    def test_a_report_does_not_depend_on_what_the_host_remembers(self):
+        def collect(memory):
+            return (f"/opt/tests/program_{memory}_memory collect --format json $classes"
+                    f" --output /tmp/{memory}")
+        both = ("classes | while read name rest; do echo --class $name; done >/tmp/classes;"
+                f" classes=$(cat /tmp/classes); {collect('with')} && {collect('without')} &&"
+                " cat /tmp/with /tmp/without")
+        with guest.ipmi_sim(SEL, SDRS) as (_, tcp):
+            run = self.run_guest(both, external(tcp) + ["-smbios", "type=1,product=SIM-1"])
+        self.assertEqual(run.status, 0, run.err)
+        # The controller's clock runs on between the two.
+        times = r'"\d{4}-\d\d-\d\dT[\d:]{8}Z"|(?<="ClockOffsetSeconds": )[-.\de]+'
+        lines = re.sub(times, "...", run.out).splitlines()
+        self.assertEqual(lines[:len(lines) // 2], lines[len(lines) // 2:])
+        self.assertGreater(run.out.count("IPMI_Event"), len(SEL))
 
     def test_an_empty_log_is_whole(self):
         run = self.run_guest(LOG, KCS_INTERNAL)

@@ -292,6 +292,30 @@ TEST_F(Network, ALineThatSpoilsPacketsCostsNothingOfTheReport) {
     }
 }
 
+TEST_F(Network, ASecondNodeThatDroppedItsIdleSessionIsReadWhole) {
+    using Clock = std::chrono::steady_clock;
+    Describe(IPMISEL_EXAMPLES "/two-node.json");
+    ASSERT_EQ(server.bmcs.size(), 2u);
+    const Collected expected = CollectDirectly();
+    const Peer slow(server.bmcs[0],
+                    {.service = {.perRequest = std::chrono::milliseconds(20), .oneAtATime = true}});
+    // Its session is gone when it has heard nothing for a while.
+    Peer idle(server.bmcs[1], Receiving([last = Clock::now(), expired = false](
+                                            Peer& peer, Packets*, unsigned number) mutable {
+                  const auto now = Clock::now();
+                  if (!expired && number > 10 && now - last > std::chrono::milliseconds(300)) {
+                      peer.bmc().Expire();
+                      expired = true;
+                  }
+                  last = now;
+              }));
+    const Collected found =
+        CollectFrom(NQORTQR20::OpenSources({slow.Place(), idle.Place()}, options));
+    ExpectSame(found, expected, "idle");
+    EXPECT_TRUE(found.whole);
+    EXPECT_EQ(idle.bmc().SessionsOpened(), 2u);
+}
+
 bool HasNoResponse(const std::string& captureLine) {
     return captureLine.find("\"response\": null") != std::string::npos;
 }
