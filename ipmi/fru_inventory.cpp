@@ -133,7 +133,7 @@ private:
     bool ended_ = false;
     bool marked_ = false;  ///< by the end mark
     bool broken_ = false;
-    bool missing_ = false;  ///< has told of the first field that is not there
+    bool missing_ = false;  ///< has reported the first field that is not there
 };
 
 // ---- Areas --------------------------------------------------------------------------------------

@@ -66,7 +66,7 @@ struct FruInventory {
     bool sound = true;
 };
 
-/// Reads a device of `size` bytes of which `bytes` could be had. What is damaged is told in the
+/// Reads a device of `size` bytes of which `bytes` could be had. What is damaged is reported in the
 /// problems, and what can be had beside it is had. Bytes that are no inventory give problems alone,
 /// and so does an area whose checksum and fields are both wrong: something else stands there.
 FruInventory ReadFruInventory(std::span<const std::uint8_t> bytes, std::size_t size);

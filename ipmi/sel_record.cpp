@@ -13,7 +13,7 @@ namespace {
 constexpr std::size_t kOemTimestampedData = 10;
 constexpr std::size_t kUntimestampedData = 3;
 
-// The daemon's records: type C0h, its maker's number, then C0h and the kind of error.
+// The daemon's records: type C0h, its manufacturer's number, then C0h and the kind of error.
 constexpr std::uint8_t kPcieRecordType = 0xC0;
 constexpr std::uint32_t kPcieManufacturer = 0x00CD3A;
 constexpr std::uint8_t kPcieMark = 0xC0;

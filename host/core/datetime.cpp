@@ -15,7 +15,7 @@ constexpr std::int64_t kMinute = 60 * kSecond;
 constexpr std::int64_t kHour = 60 * kMinute;
 constexpr std::int64_t kDay = 24 * kHour;
 // What eight digits hold; so many days in microseconds still fit into 63 bits.
-constexpr std::int64_t kMostDays = 99'999'999;
+constexpr std::int64_t kMaxDays = 99'999'999;
 
 /// The number that a run of decimal digits stands for; empty when it is none or above `most`.
 std::optional<unsigned> Number(std::string_view digits, unsigned most) {
@@ -61,7 +61,7 @@ TCIMDateTime::TCIMDateTime(const char* text) {
 
     const auto asShort = [](unsigned value) { return static_cast<unsigned short>(value); };
     if (sign == ':') {
-        const auto days = Number(all.substr(0, 8), kMostDays);
+        const auto days = Number(all.substr(0, 8), kMaxDays);
         if (!days) return;
         Set(*days, asShort(*hour), asShort(*minute), asShort(*second), *microseconds);
         return;
@@ -105,7 +105,7 @@ std::string TCIMDateTime::ToString() const {
     char date[24];
     char text[64];
     if (interval_) {
-        std::snprintf(date, sizeof date, "%08u", shown(day_, kMostDays));
+        std::snprintf(date, sizeof date, "%08u", shown(day_, kMaxDays));
     } else {
         std::snprintf(date, sizeof date, "%04u%02u%02u", shown(year_, 9999), shown(month_, 99),
                       shown(day_, 99));
@@ -135,8 +135,8 @@ TCIMDateTime TCIMDateTime::operator-(const TCIMDateTime& other) const {
 std::int64_t TCIMDateTime::TotalMicroseconds() const {
     const std::int64_t days =
         interval_ ? day_ : DaysToMonth(year_, month_) + static_cast<std::int64_t>(day_) - 1;
-    return std::min(days, kMostDays) * kDay + hour_ * kHour + minute_ * kMinute +
-           second_ * kSecond + microseconds_ - utcOffset_ * kMinute;
+    return std::min(days, kMaxDays) * kDay + hour_ * kHour + minute_ * kMinute + second_ * kSecond +
+           microseconds_ - utcOffset_ * kMinute;
 }
 
 }  // namespace NQORTQR20

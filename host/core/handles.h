@@ -3,7 +3,7 @@
 #include <string>
 #include <utility>
 
-#include "host/core/live.h"
+#include "host/core/handle_registry.h"
 #include "host/core/sink.h"
 #include "tqr/plugin.h"
 
@@ -11,12 +11,12 @@
 
 namespace NQORTQR20 {
 
-struct TCPluginCallbacks : tqrhost::Live<TCPluginCallbacks> {
+struct TCPluginCallbacks : tqrhost::HandleRegistry<TCPluginCallbacks> {
     explicit TCPluginCallbacks(std::string pathOfPlugin) : path(std::move(pathOfPlugin)) {}
     std::string path;
 };
 
-struct fdriIOHandle : tqrhost::Live<fdriIOHandle> {
+struct fdriIOHandle : tqrhost::HandleRegistry<fdriIOHandle> {
     explicit fdriIOHandle(InstanceSink& instanceSink) : sink(instanceSink) {}
     InstanceSink& sink;
     bool open = false;  ///< an instance is

@@ -4,20 +4,20 @@
 #include <utility>
 #include <vector>
 
+#include "host/core/handle_registry.h"
 #include "host/core/handles.h"
 #include "host/core/host.h"
-#include "host/core/live.h"
 #include "tqr/plugin.h"
 
 namespace NQORTQR20 {
 
 // Values under construction belong to the plug-in until it deletes them; one that it forgets is
 // leaked and not collected at the end, so that a leak checker shows it.
-struct TCIMReference : tqrhost::Live<TCIMReference> {
+struct TCIMReference : tqrhost::HandleRegistry<TCIMReference> {
     ObjectPath path;
 };
 
-struct TCIMValueArray : tqrhost::Live<TCIMValueArray> {
+struct TCIMValueArray : tqrhost::HandleRegistry<TCIMValueArray> {
     std::vector<std::uint8_t> values;
 };
 
@@ -25,7 +25,7 @@ namespace {
 
 template <typename T>
 bool IsLive(const T* handle) {
-    return tqrhost::Live<T>::Is(handle);
+    return tqrhost::HandleRegistry<T>::Is(handle);
 }
 
 /// Does the work of an operation; whatever goes wrong inside stays inside.

@@ -18,9 +18,9 @@
 #include <system_error>
 #include <utility>
 
+#include "host/core/handle_registry.h"
 #include "host/core/handles.h"
 #include "host/core/host.h"
-#include "host/core/live.h"
 #include "host/core/provider.h"
 #include "tqr/log.h"
 #include "tqr/plugin.h"
@@ -182,7 +182,7 @@ TTQRStatusCode fdrGetHandle(TCPluginCallbacks* context, const TPluginManagerProv
     static const TPluginManagerProvider theProvider{&GetMachineFacts()};
     if (provider == nullptr) return {kStatusFailed};
     *provider = nullptr;
-    if (!tqrhost::Live<TCPluginCallbacks>::Is(context)) return {kStatusFailed};
+    if (!tqrhost::HandleRegistry<TCPluginCallbacks>::Is(context)) return {kStatusFailed};
     *provider = &theProvider;
     return {kStatusOk};
 }
@@ -190,14 +190,14 @@ TTQRStatusCode fdrGetHandle(TCPluginCallbacks* context, const TPluginManagerProv
 TTQRStatusCode fdrGetPluginPath(TCPluginCallbacks* context, const char** path) {
     if (path == nullptr) return {kStatusFailed};
     *path = nullptr;
-    if (!tqrhost::Live<TCPluginCallbacks>::Is(context)) return {kStatusFailed};
+    if (!tqrhost::HandleRegistry<TCPluginCallbacks>::Is(context)) return {kStatusFailed};
     *path = context->path.c_str();
     return {kStatusOk};
 }
 
 TTQRStatusCode fdrShowNotice(TCPluginCallbacks* context, const char* plainText,
                              const char* markupText) {
-    if (!tqrhost::Live<TCPluginCallbacks>::Is(context) || plainText == nullptr) {
+    if (!tqrhost::HandleRegistry<TCPluginCallbacks>::Is(context) || plainText == nullptr) {
         return {kStatusFailed};
     }
     Notices().push_back({plainText, markupText == nullptr ? "" : markupText});
@@ -207,7 +207,8 @@ TTQRStatusCode fdrShowNotice(TCPluginCallbacks* context, const char* plainText,
 TTQRStatusCode fdrGetOption(TCPluginCallbacks* context, const char* name, const char** value) {
     if (value == nullptr) return {kStatusFailed};
     *value = nullptr;
-    if (!tqrhost::Live<TCPluginCallbacks>::Is(context) || name == nullptr) return {kStatusFailed};
+    if (!tqrhost::HandleRegistry<TCPluginCallbacks>::Is(context) || name == nullptr)
+        return {kStatusFailed};
     const auto option = Settings().options.find(std::string_view(name));
     if (option != Settings().options.end()) *value = option->second.c_str();
     return {kStatusOk};
@@ -216,7 +217,7 @@ TTQRStatusCode fdrGetOption(TCPluginCallbacks* context, const char* name, const 
 TTQRStatusCode fdrGetSystemName(TCPluginCallbacks* context, int node, const char** name) {
     if (name == nullptr) return {kStatusFailed};
     *name = nullptr;
-    if (!tqrhost::Live<TCPluginCallbacks>::Is(context)) return {kStatusFailed};
+    if (!tqrhost::HandleRegistry<TCPluginCallbacks>::Is(context)) return {kStatusFailed};
     const auto& names = Settings().systemNames;
     const auto index = static_cast<std::size_t>(node);
     if (node >= 0 && index < names.size()) *name = names[index].c_str();

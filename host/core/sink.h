@@ -33,7 +33,7 @@ using PropertyValue = std::variant<std::string, std::vector<std::uint8_t>, Objec
 
 /// Where the instances of a collection go, piece by piece, so that the host holds no more than the
 /// open instance. An instance counts from CloseInstance on; one that is opened while another is
-/// still open replaces it. False refuses the piece; the plug-in is told kStatusFailed.
+/// still open replaces it. False refuses the piece; the plug-in gets kStatusFailed.
 class InstanceSink {
 public:
     virtual ~InstanceSink() = default;

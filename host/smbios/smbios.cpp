@@ -5,7 +5,7 @@
 #include <memory>
 #include <vector>
 
-#include "host/core/live.h"
+#include "host/core/handle_registry.h"
 #include "host/core/provider.h"
 
 namespace {
@@ -15,7 +15,7 @@ constexpr int kMisused = NQORTQR20::kStatusFailed;
 constexpr int kNoType = -1;
 
 /// What a handle of the reader leads to.
-struct Reader : tqrhost::Live<Reader> {
+struct Reader : tqrhost::HandleRegistry<Reader> {
     explicit Reader(const NQORTQR20::TPluginManagerProvider& theProvider) : provider(theProvider) {}
     const NQORTQR20::TPluginManagerProvider& provider;
     int type = kNoType;    ///< that smBiosGetFirst was asked for
@@ -25,7 +25,7 @@ struct Reader : tqrhost::Live<Reader> {
 /// The reader behind a handle; null when there is none.
 Reader* ReaderOf(void* handle) {
     auto* const reader = static_cast<Reader*>(handle);
-    return tqrhost::Live<Reader>::Is(reader) ? reader : nullptr;
+    return tqrhost::HandleRegistry<Reader>::Is(reader) ? reader : nullptr;
 }
 
 bool MayWrite(const void* structure, const int* length) {

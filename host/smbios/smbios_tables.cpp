@@ -100,9 +100,9 @@ std::optional<SmbiosEntryPoint> ReadSmbiosEntryPoint(Bytes bytes) {
 }
 
 SmbiosStructures ReadSystemSmbios(const std::filesystem::path& folder) {
-    constexpr std::size_t kMostEntryPoint = 256;  // its length is one byte
+    constexpr std::size_t kMaxEntryPoint = 256;  // its length is one byte
     const auto entryPoint =
-        ReadSmbiosEntryPoint(ReadFile(folder / "smbios_entry_point", kMostEntryPoint));
+        ReadSmbiosEntryPoint(ReadFile(folder / "smbios_entry_point", kMaxEntryPoint));
     if (!entryPoint) return {};
     const std::vector<std::uint8_t> table = ReadFile(folder / "DMI", entryPoint->tableLength);
     if (!entryPoint->numberOfStructures) return SplitSmbiosTable(table);

@@ -21,7 +21,7 @@ namespace ipmisel {
 namespace {
 
 constexpr std::size_t kBuffer = 1 << 16;
-constexpr int kMostNames = 100;
+constexpr int kMaxNames = 100;
 constexpr mode_t kNewFileMode = 0600;  // serial numbers and addresses are not for everybody
 
 /// A device, a pipe or the like, also through a symbolic link; there is nothing to replace.
@@ -77,7 +77,7 @@ void OutputFile::OpenBeside() {
     const std::string prefix = TemporaryPrefix(place.filename().string());
     RemoveLeftovers(place.parent_path(), prefix);
     const SignalsHeld held;
-    for (int i = 0; file_ < 0 && i < kMostNames; ++i) {
+    for (int i = 0; file_ < 0 && i < kMaxNames; ++i) {
         const std::string other =
             prefix + std::to_string(getpid()) + (i == 0 ? "" : "-" + std::to_string(i));
         temporary_ = (place.parent_path() / other).string();

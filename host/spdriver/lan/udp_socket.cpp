@@ -52,7 +52,7 @@ void UdpSocket::Send(std::span<const rmcpplus::Packet> packets) {
         const int sent = sendmmsg(fd_, messages.data(), static_cast<unsigned>(count), 0);
         if (sent < 0 && errno == EINTR) continue;
         if (sent < 0 && errno == ECONNREFUSED) refused_ = true;
-        // The refusal of an earlier packet is told instead of sending the next one, once.
+        // The refusal of an earlier packet is reported instead of sending the next one, once.
         packets = packets.subspan(sent > 0 ? static_cast<std::size_t>(sent) : 1);
     }
 }

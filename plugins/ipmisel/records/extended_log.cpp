@@ -94,14 +94,14 @@ constexpr std::array<std::uint8_t, 3> kSignature{0x4D, 0x4F, 0x00};
 constexpr unsigned kExtendedDataAt = 32;
 /// The record size counts from byte 10 on: what stands before the extended data.
 constexpr unsigned kSizeWithoutData = 22;
-constexpr unsigned kMostExtendedData = sizeof(s_AuxLog_entry) - kExtendedDataAt;
+constexpr unsigned kMaxExtendedData = sizeof(s_AuxLog_entry) - kExtendedDataAt;
 
 using Bytes = std::span<const std::uint8_t>;
 
 /// As much of the extended data as the record size says and the entry holds.
 Bytes ExtendedData(Bytes entry, unsigned recordSize) {
     const unsigned length = recordSize > kSizeWithoutData ? recordSize - kSizeWithoutData : 0;
-    return entry.subspan(kExtendedDataAt, std::min(length, kMostExtendedData));
+    return entry.subspan(kExtendedDataAt, std::min(length, kMaxExtendedData));
 }
 
 std::string DataTrace(unsigned recordSize, Bytes data) {

@@ -48,7 +48,7 @@ struct IPMIRecordID {
 };
 static_assert(sizeof(IPMIRecordID) == 2);
 /// A log or repository that still goes on after as many records leads in a circle.
-constexpr unsigned kMostRecords = 0x10000;
+constexpr unsigned kMaxRecords = 0x10000;
 
 inline IPMIRecordID ReadRecordID(ByteReader* in) {
     IPMIRecordID id;

@@ -147,7 +147,7 @@ unsigned IPMIRequestFRULocator::IPMIGetSDREntry(NQORTQR20::TCPluginCallbacks* co
                                                 std::vector<IPMIFRULocator>* locators) {
     TraceScope trace("IPMIRequestFRULocator::IPMIGetSDREntry()");
     if (IPMIReserveSDR(context) != kOk) return trace.Fail();
-    for (unsigned read = 0; read < kMostRecords && !EndsRepository(recordId_); ++read) {
+    for (unsigned read = 0; read < kMaxRecords && !EndsRepository(recordId_); ++read) {
         IPMIFRULocator locator;
         const unsigned result = IPMIGetSDRHeader(context, &locator);
         if (result == kOk) {

@@ -122,7 +122,7 @@ unsigned IPMIRequestSDR::IPMIGetSDREntry(NQORTQR20::TCPluginCallbacks* context,
     TraceScope trace("IPMIRequestSDR::IPMIGetSDREntry()");
     if (IPMIGetSDRInfo(context, infoText) != kOk) return trace.Fail();
     if (IPMIReserveSDR(context) != kOk) return trace.Fail();
-    for (unsigned read = 0; read < kMostRecords && !EndsRepository(recordId_); ++read) {
+    for (unsigned read = 0; read < kMaxRecords && !EndsRepository(recordId_); ++read) {
         s_SDR_entry entry{};
         if (IPMIGetSDRHeader(context, &entry) != kOk) return trace.Fail();
         if (IsSensorRecord()) {

@@ -69,7 +69,7 @@ unsigned IPMIRequestSEL::IPMIGetSELEntry(NQORTQR20::TCPluginCallbacks*, s_SEL_ro
     // (SelWalk.FirstEntryIsStoredEvenForNoRows).
     const unsigned stored = std::max(rowCount, 1U);
     nextRecordId_ = {};  // stands for the first entry
-    for (unsigned counter = 0; counter < kMostRecords; ++counter) {
+    for (unsigned counter = 0; counter < kMaxRecords; ++counter) {
         // A reservation is not needed for whole records, hence ID 0x0000.
         const std::array<std::uint8_t, 6> request{
             0x00, 0x00, nextRecordId_.low, nextRecordId_.high, 0x00, ipmi::kWholeRecord};

@@ -9,18 +9,18 @@ namespace tqrhost {
 /// handle that was given back or never was one is refused and not followed. There are only a few at
 /// a time, and the newest is the one asked for.
 template <typename T>
-class Live {
+class HandleRegistry {
 public:
     static bool Is(const T* object) {
         return object != nullptr && std::find(All().rbegin(), All().rend(), object) != All().rend();
     }
 
-    Live(const Live&) = delete;
-    Live& operator=(const Live&) = delete;
+    HandleRegistry(const HandleRegistry&) = delete;
+    HandleRegistry& operator=(const HandleRegistry&) = delete;
 
 protected:
-    Live() { All().push_back(static_cast<const T*>(this)); }
-    ~Live() { std::erase(All(), static_cast<const T*>(this)); }
+    HandleRegistry() { All().push_back(static_cast<const T*>(this)); }
+    ~HandleRegistry() { std::erase(All(), static_cast<const T*>(this)); }
 
 private:
     /// Never destroyed: a handle may outlive every other static object.
