@@ -5,11 +5,11 @@
 #include <cstddef>
 #include <cstring>
 #include <fstream>
-#include <map>
 #include <memory>
 #include <nlohmann/json.hpp>
 #include <optional>
 #include <string>
+#include <unordered_map>
 #include <utility>
 #include <vector>
 
@@ -83,34 +83,67 @@ private:
 class ReplayTransport : public Transport {
 public:
     explicit ReplayTransport(std::shared_ptr<ReplayClock> clock) : clock_(std::move(clock)) {}
-    void Add(const RequestFrame& request, std::optional<Response> response) {
-        answers_[request.ToCommand()].recorded.push_back(std::move(response));
+    void Add(const RequestFrame& request, const std::optional<Response>& response) {
+        const auto number = static_cast<std::uint32_t>(recorded_.size());
+        Recorded& recorded = recorded_.emplace_back();
+        recorded.at = bytes_.size();
+        if (response) {
+            recorded.length = static_cast<std::uint32_t>(response->size());
+            bytes_.insert(bytes_.end(), response->begin(), response->end());
+        }
+        const auto [answers, isNew] = answers_.try_emplace(KeyOf(request), Answers{number, number});
+        if (!isNew) {
+            recorded_[answers->second.last].next = number;
+            answers->second.last = number;
+        }
     }
     std::optional<Response> Exchange(const RequestFrame& request) override {
-        const auto found = answers_.find(request.ToCommand());
+        const auto found = answers_.find(KeyOf(request));
         if (found == answers_.end()) {
             NoteMissing(request);
             return std::nullopt;
         }
         Answers& answers = found->second;
-        const std::size_t position = std::min(answers.given, answers.recorded.size() - 1);
-        ++answers.given;
+        const Recorded& recorded = recorded_[answers.next];
+        answers.spent = answers.next == answers.last;
+        answers.given = true;
+        if (!answers.spent) answers.next = recorded.next;
         clock_->Answered(request.code() == ipmi::kGetSelTime);
-        return answers.recorded[position];
+        if (recorded.length == 0) return std::nullopt;
+        const auto begin = bytes_.begin() + static_cast<std::ptrdiff_t>(recorded.at);
+        return Response(begin, begin + recorded.length);
     }
     /// The recording ends with a Get SEL Info that this pass has not asked.
     bool HasLaterLogInfo() const {
-        const auto found = answers_.find(ipmi::GetSelInfo());
-        return found != answers_.end() && found->second.given > 0 &&
-               found->second.given < found->second.recorded.size();
+        const auto found = answers_.find(KeyOf(RequestFrame(ipmi::GetSelInfo())));
+        return found != answers_.end() && found->second.given && !found->second.spent;
     }
     const std::vector<ReadFault>& Missing() const { return missing_; }
 
 private:
-    struct Answers {
-        std::vector<std::optional<Response>> recorded;
-        std::size_t given = 0;
+    /// An answer; a length of 0 is none at all. There are as many as the longest log has records,
+    /// hence all bytes in one piece.
+    struct Recorded {
+        std::size_t at = 0;
+        std::uint32_t length = 0;
+        std::uint32_t next = 0;  ///< the next one to the same request, where there is one
     };
+    /// The answers to one request, by their numbers.
+    struct Answers {
+        std::uint32_t next;
+        std::uint32_t last;
+        bool given = false;
+        bool spent = false;  ///< the last one was given
+    };
+
+    /// Short enough, mostly, to need no memory of its own.
+    static std::string KeyOf(const RequestFrame& request) {
+        const ipmi::Command command = request.ToCommand();
+        std::string key{static_cast<char>(command.netFn), static_cast<char>(command.lun),
+                        static_cast<char>(command.command)};
+        key.append(command.data.begin(), command.data.end());
+        return key;
+    }
 
     void NoteMissing(const RequestFrame& request) {
         const std::string name(ipmi::CommandName(request.code()));
@@ -125,7 +158,9 @@ private:
     }
 
     std::shared_ptr<ReplayClock> clock_;
-    std::map<ipmi::Command, Answers> answers_;
+    std::vector<std::uint8_t> bytes_;
+    std::vector<Recorded> recorded_;
+    std::unordered_map<std::string, Answers> answers_;
     std::vector<ReadFault> missing_;
 };
 
@@ -194,7 +229,7 @@ void ReadExchange(const JsonValue& line, const Nodes& nodes, ReplayClock* clock)
         {"took", [&](const JsonValue& v) { took = v.Real(); }},
     });
     if (!at.empty()) clock->Add(at, took);
-    nodes[node]->Add(*request, std::move(response));
+    nodes[node]->Add(*request, response);
 }
 
 /// The next line without its end, at most kMaxLine bytes and one more; empty at the end of the

@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cmath>
 #include <map>
 #include <memory>
 #include <unordered_map>
@@ -108,6 +109,8 @@ std::string BarOf(const Sensor& sensor) {
     const double margin = *most > *least ? (*most - *least) * 0.12 : 1;
     const double low = *least - margin;
     const double scale = 200 / (*most + margin - low);
+    // Numbers so far apart that their distance is none.
+    if (!std::isfinite(low) || !(scale > 0)) return "";
     const auto x = [&](double value) { return (value - low) * scale; };
     std::string zones;
     const auto zone = [&](const char* name, double from, double to) {
