@@ -11,6 +11,7 @@
 #include <utility>
 #include <vector>
 
+#include "program/commands/ack.h"
 #include "program/commands/check.h"
 #include "program/commands/classes.h"
 #include "program/commands/collect.h"
@@ -26,9 +27,9 @@ namespace ipmisel {
 namespace {
 
 /// In the order of the help.
-constexpr Command (*kCommands[])(CLI::App* program) = {AddCollectCommand, AddReportCommand,
-                                                       AddDiffCommand,    AddCheckCommand,
-                                                       AddClassesCommand, AddWorkerCommand};
+constexpr Command (*kCommands[])(CLI::App* program) = {
+    AddCollectCommand, AddReportCommand,  AddDiffCommand,  AddCheckCommand,
+    AddAckCommand,     AddClassesCommand, AddWorkerCommand};
 
 /// Letters to put in, take out or change to make one word the other.
 std::size_t Distance(std::string_view a, std::string_view b) {

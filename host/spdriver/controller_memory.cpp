@@ -46,6 +46,7 @@ std::optional<Response> ControllerMemory::Answer(const ipmi::Command& command) c
     }
     if (code == ipmi::kGetSdr) return AnswerRead(sensors.get(), reservation, command);
     if (!command.data.empty()) return std::nullopt;
+    if (code == ipmi::kGetSystemGuid) return guid;
     if (code == ipmi::kGetSelInfo) return logInfo;
     if (code == ipmi::kGetSdrRepositoryInfo) return sensorInfo;
     if (code == ipmi::kReserveSdrRepository) return reservation;

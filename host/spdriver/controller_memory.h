@@ -13,6 +13,7 @@ namespace tqrhost {
 /// What was read of one controller before the plug-ins' pass: its event log and its sensor
 /// repository, in one state for all who ask.
 struct ControllerMemory {
+    std::optional<Response> guid;  ///< of Get System GUID, where it was asked for
     /// Answers of Get SEL Info, Get SDR Repository Info and Reserve SDR Repository; empty where
     /// they were not asked for or refused.
     std::optional<Response> logInfo;

@@ -4,8 +4,10 @@
 #include <functional>
 #include <memory>
 #include <optional>
+#include <utility>
 
 #include "host/spdriver/controller_memory.h"
+#include "host/spdriver/known_controller.h"
 #include "host/spdriver/pipeline.h"
 #include "host/spdriver/reading.h"
 #include "host/spdriver/record_reader.h"
@@ -20,25 +22,45 @@ struct ReadCount {
 
 /// Reads the event log and then the sensor repository of one controller into its memory. Ends with
 /// a second Get SEL Info: when the log has changed meanwhile it is read once more.
+///
+/// Of a controller that is known from an earlier collection only what is new is read, as far as
+/// that can be proven: the GUID is the same, and the last record that is known stands under its ID
+/// with the same bytes. With the count and both time stamps of the log unchanged nothing more is
+/// read. With records behind it, the last erasure unchanged and as many of them as the count has
+/// grown by, those are read. Everything else is another log, and read whole.
 class ControllerReader : public std::enable_shared_from_this<ControllerReader> {
 public:
-    ControllerReader(RequestPipeline* pipeline, ReadingNeeds needs)
-        : pipeline_(pipeline), needs_(needs) {}
+    ControllerReader(RequestPipeline* pipeline, ReadingNeeds needs,
+                     std::optional<KnownController> known = std::nullopt)
+        : pipeline_(pipeline), needs_(needs), known_(std::move(known)) {}
     /// Asks for the first things; the rest follows as answers come.
     void Start();
     bool Done() const { return phase_ == Phase::kDone; }
     bool ReadsLog() const;
     ReadCount LogCount() const;
     ReadCount SensorCount() const;
+    /// How it went; before Take.
+    NodeReading Result() const;
     /// What was read, also of a reading that was stopped; once.
     ControllerMemory Take();
 
 private:
-    enum class Phase { kLog, kSensors, kCheck, kLogAgain, kCheckAgain, kDone };
+    enum class Phase { kCompare, kLog, kSensors, kCheck, kLogAgain, kCheckAgain, kDone };
 
     /// Asks without data and hands on the answer.
     void Ask(ipmi::Command command, std::function<void(std::optional<Response>)> take);
     void Pump();
+    void StartWhole();
+    void StartComparing();
+    void AskGuid();
+    /// What is known and what the controller says now have come.
+    void Compare();
+    /// Puts the records that were known before those that were read; false when they do not make
+    /// the log that was announced.
+    bool Join();
+    void ReadWhole();
+    bool SensorsAreKnown() const;
+    void RecallSensors();
     void StartSensors();
     void Check();
     void Checked(std::optional<Response> info);
@@ -52,8 +74,16 @@ private:
     std::shared_ptr<RecordReader> logAgain_;
     std::shared_ptr<RecordReader> sensors_;
     std::optional<Response> infoAgain_;
+    std::optional<KnownController> known_;
+    LogChange change_ = LogChange::kNotKnown;
+    unsigned comparing_ = 0;  ///< answers to come
+    std::optional<Response> lastKnown_, first_;  ///< records as they stand now, with the next ID
+    std::unique_ptr<RecordStore> joined_;  ///< known and new records
+    std::optional<Response> guid_;
+    std::optional<Response> sensorAnswer_;  ///< of Get SDR Repository Info, whatever it is
     bool toldOfLog_ = false;  ///< Get SEL Info has been answered, or failed
     bool toldOfSensors_ = false;
+    bool reserving_ = false;
     bool reserved_ = false;
     bool pumping_ = false;
 };

@@ -7,11 +7,13 @@
 
 #include "host/spdriver/controller_reader.h"
 #include "host/spdriver/memory_transport.h"
+#include "host/spdriver/serial_pipeline.h"
 
 namespace NQORTQR20 {
 namespace {
 
 struct Live {
+    std::size_t number;
     SourceNode* node;
     std::shared_ptr<tqrhost::ControllerReader> reader;
 };
@@ -33,14 +35,23 @@ ReadingState StateOf(const std::vector<Live>& live) {
 
 }  // namespace
 
-void ReadLiveNodes(Source& source, ReadingNeeds needs, const ReadingProgress& progress) {
+std::vector<NodeReading> ReadLiveNodes(Source& source, ReadingNeeds needs,
+                                       const ReadingProgress& progress,
+                                       std::vector<std::optional<KnownController>> known) {
     std::vector<Live> live;
     std::vector<RequestPipeline*> pipelines;
-    for (SourceNode& node : source.nodes) {
+    std::vector<NodeReading> readings(source.nodes.size());
+    known.resize(source.nodes.size());
+    for (std::size_t i = 0; i < source.nodes.size(); ++i) {
+        SourceNode& node = source.nodes[i];
+        if (needs.every && node.transport) {
+            node.pipeline = std::make_unique<tqrhost::SerialPipeline>(std::move(node.transport));
+        }
         if (!node.pipeline) continue;
         pipelines.push_back(node.pipeline.get());
-        live.push_back(
-            {&node, std::make_shared<tqrhost::ControllerReader>(node.pipeline.get(), needs)});
+        live.push_back({i, &node,
+                        std::make_shared<tqrhost::ControllerReader>(node.pipeline.get(), needs,
+                                                                    std::move(known[i]))});
     }
     for (const Live& one : live) one.reader->Start();
     tqrhost::RunPipelines(pipelines, [&] {
@@ -49,11 +60,13 @@ void ReadLiveNodes(Source& source, ReadingNeeds needs, const ReadingProgress& pr
                            [](const Live& one) { return one.reader->Done(); });
     });
     for (const Live& one : live) {
+        readings[one.number] = one.reader->Result();
         auto transport = std::make_unique<tqrhost::MemoryTransport>(std::move(one.node->pipeline),
                                                                     one.reader->Take());
         one.node->endPass = [memory = transport.get()] { return memory->EndPass(); };
         one.node->transport = std::move(transport);
     }
+    return readings;
 }
 
 }  // namespace NQORTQR20

@@ -4,7 +4,9 @@
 #include <functional>
 #include <optional>
 #include <string_view>
+#include <vector>
 
+#include "host/spdriver/known_controller.h"
 #include "host/spdriver/source.h"
 
 namespace NQORTQR20 {
@@ -13,6 +15,8 @@ namespace NQORTQR20 {
 struct ReadingNeeds {
     bool log = true;
     bool sensors = true;
+    bool guid = false;
+    bool every = false;  ///< also the nodes that answer each request by themselves
 };
 
 /// How far the reading is.
@@ -29,8 +33,11 @@ using ReadingProgress = std::function<void(const ReadingState& state)>;
 /// Reads the live nodes of a source, all at the same time, as far as is needed, before the
 /// plug-ins' pass, which is answered from there. The other nodes answer each request by themselves.
 /// Ends early when the collection is to stop; what has come is kept. `progress` is called with the
-/// counts of all nodes together whenever records have come.
-void ReadLiveNodes(Source& source, ReadingNeeds needs, const ReadingProgress& progress = {});
+/// counts of all nodes together whenever records have come. `known`, by node, is what need not be
+/// read again; empty when nothing is known. How it went, by node.
+std::vector<NodeReading> ReadLiveNodes(Source& source, ReadingNeeds needs,
+                                       const ReadingProgress& progress = {},
+                                       std::vector<std::optional<KnownController>> known = {});
 
 /// Calls `progress` after each read of the pass over the open machine, with the counts of the node
 /// that was read; until it is called with nothing.

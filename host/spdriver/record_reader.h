@@ -30,6 +30,8 @@ public:
     /// How many records are announced: no try goes beyond them, and none is made before this is
     /// known.
     void Expect(std::size_t records) { expected_ = records; }
+    /// Begins with this record instead of the first one.
+    void BeginAt(std::uint16_t id) { position_ = id; }
     void Reserved(std::uint16_t reservation) { reservation_ = reservation; }
     /// Asks for what there is room for; to be called when there may be room.
     void Pump();

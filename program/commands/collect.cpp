@@ -32,6 +32,7 @@
 #include "program/reports/report.h"
 #include "program/reports/report_sink.h"
 #include "program/reports/terminal_text.h"
+#include "program/store/visit_recorder.h"
 #include "tqr/datetime.h"
 #include "tqr/splibrary.h"
 
@@ -173,6 +174,50 @@ private:
     std::optional<ProgressLine> line_;
 };
 
+/// The names of the systems behind these sources, which could not be opened.
+std::vector<std::string> NamesOf(const std::vector<std::string>& unopened,
+                                 const CollectOptions& options) {
+    const std::vector<std::string> sources = options.access.Sources();
+    std::vector<std::string> names;
+    for (const std::string& source : unopened) {
+        const auto place = std::find(sources.begin(), sources.end(), source);
+        const auto index = static_cast<std::size_t>(place - sources.begin());
+        names.push_back(index < options.names.size() && options.names.size() == sources.size()
+                            ? options.names[index]
+                            : HostOf(source));
+    }
+    return names;
+}
+
+/// Opens the sources; those that cannot be opened are stored as visits that failed.
+NQORTQR20::Source OpenFor(StoredCollection* store, const CollectOptions& options) {
+    try {
+        NQORTQR20::Source source = OpenSource(options.access);
+        if (store != nullptr) {
+            for (const NQORTQR20::UnreachableNode& node : source.unreachable) {
+                store->Fail(NamesOf({node.name}, options), node.reason);
+            }
+        }
+        return source;
+    } catch (const Failure& failure) {
+        if (store != nullptr && failure.exitStatus == kExitNoSource) {
+            store->Fail(NamesOf(options.access.Sources(), options), failure.what());
+        }
+        throw;
+    }
+}
+
+/// These, and those that are not among them.
+std::vector<std::string> With(std::vector<std::string> classes,
+                              const std::vector<std::string>& more) {
+    for (const std::string& name : more) {
+        if (std::find(classes.begin(), classes.end(), name) == classes.end()) {
+            classes.push_back(name);
+        }
+    }
+    return classes;
+}
+
 Outcome CollectTo(const CollectOptions& options, ReportOutput& output) {
     const auto begin = std::chrono::steady_clock::now();
     // The plug-ins first: without them nobody is asked for a password.
@@ -180,7 +225,15 @@ Outcome CollectTo(const CollectOptions& options, ReportOutput& output) {
     const auto ofFormat = FindFormat(options.report.format)->classes;
     std::vector<std::string> wanted = ClassesToCollect(options.report.classes, ofFormat, *plugins);
     NQORTQR20::PluginSettings settings = SettingsOf(options, *plugins);
-    NQORTQR20::Source source = OpenSource(options.access);
+    std::optional<StoredCollection> store;
+    const bool ofWholeLog =
+        options.report.format == "prometheus" || options.report.format == "redfish";
+    if (options.onlyNew && ofWholeLog) {
+        throw Failure(kExitUsage, "--format " + options.report.format +
+                                      " is of the whole log; leave out --new, or give another");
+    }
+    if (options.store) store.emplace(*options.store, options.onlyNew);
+    NQORTQR20::Source source = OpenFor(store ? &*store : nullptr, options);
     // A capture answers what was asked for when it was made, if the format can be made of that.
     const bool suffices = std::all_of(ofFormat.begin(), ofFormat.end(), [&](std::string_view name) {
         return std::find(source.classes.begin(), source.classes.end(), name) !=
@@ -193,9 +246,20 @@ Outcome CollectTo(const CollectOptions& options, ReportOutput& output) {
     const std::vector<SystemInfo> systems = SystemsOf(source, options);
     for (const SystemInfo& system : systems) settings.systemNames.push_back(system.name);
     NQORTQR20::SetPluginSettings(std::move(settings));
+    const std::vector<std::string> reported = wanted;
+    NQORTQR20::ReadingNeeds needs = NeedsOf(wanted, *plugins);
+    if (store) {
+        wanted = With(std::move(wanted), ClassesToCollect(StoredClasses(), {}, *plugins));
+        needs = NeedsOf(wanted, *plugins);
+        needs.guid = true;
+        needs.every = options.access.Sources().front().starts_with("sim:");
+        store->Begin(systems);
+    }
     StopSignals::BeginCollecting();
     ReadingProgressLine progress(options.progress);
-    NQORTQR20::ReadLiveNodes(source, NeedsOf(wanted, *plugins), progress.Observer());
+    std::vector<NQORTQR20::NodeReading> readings =
+        NQORTQR20::ReadLiveNodes(source, needs, progress.Observer(),
+                                 store ? store->Known() : decltype(store->Known())());
     const std::shared_ptr<NQORTQR20::CaptureWriter> capture = Record(options, source, wanted);
     const Machine machine(std::move(source));
 
@@ -208,23 +272,27 @@ Outcome CollectTo(const CollectOptions& options, ReportOutput& output) {
                           .collected = {NQORTQR20::TOSSpecific::GetLocalTime().TotalMicroseconds() /
                                         kMicrosecondsPerSecond},
                           .classes = plugins->Classes(),
-                          .wanted = wanted,
+                          .wanted = reported,
                           .named = !options.report.classes.empty()};
     const std::unique_ptr<ReportWriter> report = output.Make(head);
-    ReportSink sink(*report, *plugins, wanted, nodes);
+    const bool unchanged = store && StoredCollection::Unchanged(readings);
+    if (unchanged) wanted.clear();
+    ReportWriter& taken = store && !unchanged ? store->Record(*report, reported) : *report;
+    ReportSink sink(taken, *plugins, wanted, nodes);
     NQORTQR20::CollectionPlan plan(*plugins, wanted);
     ReportEnd end;
     if (output.StreamsToTerminal()) progress.End();
     NQORTQR20::ObserveReading(progress.Observer());
     plan.RunPasses(sink, [] { return !OutputIsOver(); });
     if (HasBmc()) plan.RunExporters(sink);
-    NQORTQR20::EndPass();
+    if (!unchanged) NQORTQR20::EndPass();
     progress.End();
     StopSignals::EndCollecting();
     sink.Check();
     end.stopped = NQORTQR20::Stopped();
     end.hasBmc = HasBmc();
     end.notices = TellNotices();
+    if (unchanged) end.notices = store->NoticesOfUnchanged();
     end.completeness = NQORTQR20::GetCompleteness();
     end.exported = sink.Exported();
     for (std::size_t node = 0; node < end.exported.size(); ++node) {
@@ -241,6 +309,7 @@ Outcome CollectTo(const CollectOptions& options, ReportOutput& output) {
         throw Failure(kExitUsage, "the capture " + *options.record +
                                       " is cut short; make room there, or name another --record");
     }
+    if (store) store->Finish(end, std::move(readings));
     return OutcomeOf(end);
 }
 
@@ -312,6 +381,19 @@ void AddSeveritiesOption(CLI::App* command, std::optional<std::string>* file) {
         ->check(FileName());
 }
 
+void AddStoreOptions(CLI::App* command, CollectOptions* options) {
+    CLI::Option* const store =
+        command
+            ->add_option("--store", options->store,
+                         "Keep what is collected: sqlite:FILE or postgresql://HOST/DATABASE")
+            ->type_name("URI")
+            ->check(NotEmpty("the store is empty; give sqlite:FILE or postgresql://..."));
+    command
+        ->add_flag("--new", options->onlyNew,
+                   "Read and report only events that the store does not have")
+        ->needs(store);
+}
+
 Command AddCollectCommand(CLI::App* program) {
     CLI::App* const command = program->add_subcommand("collect", "Collect and write a report");
     const auto options = std::make_shared<CollectOptions>();
@@ -332,6 +414,7 @@ Command AddCollectCommand(CLI::App* program) {
     AddSeveritiesOption(command, &options->severities);
     const auto hosts = std::make_shared<HostsOptions>();
     AddHostsOptions(command, hosts.get());
+    AddStoreOptions(command, options.get());
     command->footer(FormatHelp() + WorkaroundHelp() + kExitStatusHelp);
     return {command, [options, hosts] {
                 return hosts->lists.empty() ? Collect(*options) : CollectHosts(*options, *hosts);

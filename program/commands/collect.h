@@ -22,7 +22,12 @@ struct CollectOptions {
     std::vector<std::string> names;  ///< of the systems, as their sources follow each other
     std::optional<std::string> severities;
     bool progress = true;  ///< on standard error, where that is a terminal
+    std::optional<std::string> store;  ///< URI of the store that the systems are visited for
+    bool onlyNew = false;              ///< report only the events that the store does not have
 };
+
+/// Adds --store and --new to a command.
+void AddStoreOptions(CLI::App* command, CollectOptions* options);
 
 /// Collects and writes a report; how it went, of which whoever runs it is still to be told. Throws
 /// Failure.

@@ -54,6 +54,8 @@ CollectOptions ParseRequest(const std::string& message) {
         Get(json, "deadline", &options.deadlineSeconds);
         options.names = {json.at("name").get<std::string>()};
         Get(json, "severities", &options.severities);
+        Get(json, "store", &options.store);
+        options.onlyNew = json.at("new");
         options.plugins = json.at("plugins").get<std::vector<std::string>>();
         options.report.classes = json.at("classes").get<std::vector<std::string>>();
         options.report.format = json.at("format");
@@ -110,7 +112,8 @@ std::string WriteWorkerRequest(const CollectOptions& options) {
                  {"plugins", options.plugins},
                  {"classes", options.report.classes},
                  {"format", options.report.format},
-                 {"log_level", options.log.level}};
+                 {"log_level", options.log.level},
+                 {"new", options.onlyNew}};
     Put(json, "user", access.user);
     Put(json, "password", options.access.password);
     Put(json, "kg", options.access.kg);
@@ -118,6 +121,7 @@ std::string WriteWorkerRequest(const CollectOptions& options) {
     Put(json, "window", access.window);
     Put(json, "deadline", options.deadlineSeconds);
     Put(json, "severities", options.severities);
+    Put(json, "store", options.store);
     return Message(json);
 }
 

@@ -9,9 +9,9 @@
 
 #include "base/text.h"
 #include "host/spdriver/reading.h"
+#include "host/spdriver/serial_pipeline.h"
 #include "tests/support/fru_inventory.h"
 #include "tests/support/machine_fixture.h"
-#include "tests/support/serial_pipeline.h"
 
 namespace ipmiseltest {
 namespace {
@@ -97,7 +97,7 @@ protected:
         auto watched = std::make_unique<Watched>(bmc, this);
         if (readAhead) {
             source.nodes.push_back(
-                {"", nullptr, std::make_unique<SerialPipeline>(std::move(watched))});
+                {"", nullptr, std::make_unique<tqrhost::SerialPipeline>(std::move(watched))});
             NQORTQR20::ReadLiveNodes(source, {});
         } else {
             source.nodes.push_back({"", std::move(watched), nullptr});

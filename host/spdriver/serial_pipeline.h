@@ -6,12 +6,12 @@
 
 #include "host/spdriver/pipeline.h"
 
-namespace ipmiseltest {
+namespace tqrhost {
 
 /// A pipeline over a way that takes one request at a time.
-class SerialPipeline : public NQORTQR20::RequestPipeline {
+class SerialPipeline : public RequestPipeline {
 public:
-    explicit SerialPipeline(std::unique_ptr<NQORTQR20::Transport> transport)
+    explicit SerialPipeline(std::unique_ptr<Transport> transport)
         : transport_(std::move(transport)) {}
     void Submit(ipmi::Command command, Handler handler) override {
         queue_.emplace_back(std::move(command), std::move(handler));
@@ -27,12 +27,12 @@ public:
         if (queue_.empty()) return;
         const auto [command, handler] = std::move(queue_.front());
         queue_.pop_front();
-        handler(transport_->Exchange(NQORTQR20::RequestFrame(command)));
+        handler(transport_->Exchange(RequestFrame(command)));
     }
 
 private:
-    std::unique_ptr<NQORTQR20::Transport> transport_;
+    std::unique_ptr<Transport> transport_;
     std::deque<std::pair<ipmi::Command, Handler>> queue_;
 };
 
-}  // namespace ipmiseltest
+}  // namespace tqrhost
