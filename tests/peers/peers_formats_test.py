@@ -168,7 +168,7 @@ class TakenByPrograms(Folder):
         conf = conf.replace("/var/log/ipmisel.json", str(output)).replace("/var/spool/ipmisel", str(spool))
         # The same rules behind a port of loopback too.
         conf += ('module(load="imptcp")\n'
-                 f'input(type="imptcp" address="127.0.0.1" port="{port}" ruleset="ipmisel")\n')
+                 f'input(type="imptcp" address="127.0.0.1" port="{port}" maxFrameSize="1000000" ruleset="ipmisel")\n')
         conf = conf.replace("global(", f'global(workDirectory="{self.folder}" ', 1)
         (self.folder / "rsyslog.conf").write_text(conf)
         checked = subprocess.run([rsyslogd, "-N1", "-f", self.folder / "rsyslog.conf"], capture_output=True, text=True)
