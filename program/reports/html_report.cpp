@@ -395,11 +395,13 @@ private:
     struct PartRow {
         std::size_t system;
         std::string name, manufacturer, product, partNumber, serialNumber;
-        std::optional<Severity> worst;
+        std::string boardSerialNumber{};  ///< of the board in it, where it has one of its own
+        std::optional<Severity> worst{};
         bool Is(const Finding& finding) const {
             return serialNumber.empty() || finding.serialNumber.empty()
                        ? name == finding.part
-                       : serialNumber == finding.serialNumber;
+                       : serialNumber == finding.serialNumber ||
+                             boardSerialNumber == finding.serialNumber;
         }
     };
     /// Those of the inventory, and those that only a finding names; the ones with problems first.
@@ -409,13 +411,10 @@ private:
             return text.empty() ? other : text;
         };
         for (const Fru& f : machine_.frus) {
-            rows.push_back({IndexOf(f.node),
-                            FruName(f),
-                            orElse(f.manufacturer, f.moduleManufacturer),
-                            f.product,
+            rows.push_back({IndexOf(f.node), FruName(f),
+                            orElse(f.manufacturer, f.moduleManufacturer), f.product,
                             orElse(f.partNumber, f.modulePartNumber),
-                            orElse(f.serialNumber, f.moduleSerialNumber),
-                            {}});
+                            orElse(f.serialNumber, f.moduleSerialNumber), f.boardSerialNumber});
         }
         for (const Finding& finding : machine_.findings) {
             if (finding.part.empty()) continue;
@@ -429,6 +428,10 @@ private:
                 row = rows.end() - 1;
             }
             row->worst = std::max(row->worst, finding.severity);
+            if (!finding.serialNumber.empty()) {  // of the board, where that is what is broken
+                row->partNumber = finding.partNumber;
+                row->serialNumber = finding.serialNumber;
+            }
         }
         // What is neither broken nor known by anything but its place is no help here.
         std::erase_if(rows, [](const PartRow& r) {

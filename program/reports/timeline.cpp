@@ -130,6 +130,7 @@ std::string Timeline::Svg() const {
     };
     std::map<std::pair<std::size_t, std::size_t>, Mark> bins;
     double lastLabel = -kWidth;
+    double lastX = 0;
     MaybeTime last;
     for (std::size_t i = 0; i < points_.size(); ++i) {
         const Point& point = points_[i];
@@ -164,9 +165,10 @@ std::string Timeline::Svg() const {
             lastLabel = x[i];
         }
         last = point.time;
+        lastX = x[i];
     }
-    if (last && x.back() - lastLabel > 240) {
-        label(x.back(), height - 3, "end", DateAndTime(*last).substr(0, 16));
+    if (last && lastX - lastLabel > 240) {
+        label(lastX, height - 3, "end", DateAndTime(*last).substr(0, 16));
     }
     for (const auto& [key, mark] : bins) {
         const auto& [index, bin] = key;
