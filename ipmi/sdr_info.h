@@ -16,6 +16,11 @@ struct SdrRepositoryInfo {
     std::uint8_t operations = 0;
 
     bool operator==(const SdrRepositoryInfo&) const = default;
+    /// Whether records came or went between the two answers.
+    bool HasChanged(const SdrRepositoryInfo& later) const {
+        return records != later.records || lastAddition != later.lastAddition ||
+               lastErase != later.lastErase;
+    }
     /// From the data after the completion code; empty when a byte is missing.
     static std::optional<SdrRepositoryInfo> Parse(std::span<const std::uint8_t> data);
 };

@@ -11,8 +11,9 @@
 namespace tqrhost {
 namespace {
 
-/// The log, between two answers of Get SEL Info.
+/// Log and repository, between two answers of Get SEL Info and Get SDR Repository Info.
 constexpr const char* kChanged = "the log has changed while it was read";
+constexpr const char* kSensorsChanged = "the sensor repository has changed while it was read";
 
 constexpr std::size_t kMaxFaults = 1000;
 
@@ -118,10 +119,15 @@ void CompletenessTracker::NoteInfo(Source* source, bool askedAgain,
     // A question that was asked again at once and then answered left nothing out.
     if (askedAgain) {
         std::erase_if(account_.faults, [&what](const ReadFault& fault) {
-            return fault.what == what && fault.problem != kChanged;
+            return fault.what == what && fault.problem != kChanged &&
+                   fault.problem != kSensorsChanged;
         });
     }
-    if (source->isLog) NoteLogState(*response);
+    if (source->isLog) {
+        NoteLogState(*response);
+    } else {
+        NoteSensorState(*response);
+    }
     // By the count as it was then; the inventory's walk comes before anybody has asked for it.
     if (source->account->announced) FinishWalk(source);
     ipmisel::ByteReader in(*response);
@@ -136,6 +142,16 @@ void CompletenessTracker::NoteLogState(const Response& response) {
     const LogState state{info->records, info->lastAddition, info->lastErase};
     if (logState_.value_or(state) != state) AddFault({"Get SEL Info", "", kChanged, true});
     logState_ = state;
+}
+
+void CompletenessTracker::NoteSensorState(const Response& response) {
+    const auto info = ipmi::SdrRepositoryInfo::Parse(std::span(response).subspan(1));
+    if (!info) return;
+    // What was read of it may be whole all the same: no more than told.
+    if (sensorState_ && sensorState_->HasChanged(*info)) {
+        AddFault({"Get SDR Repository Info", "", kSensorsChanged, false});
+    }
+    sensorState_ = info;
 }
 
 void CompletenessTracker::FinishWalk(Source* source) {

@@ -12,6 +12,7 @@
 #include "host/spdriver/loop_guard.h"
 #include "host/spdriver/reading.h"
 #include "host/spdriver/transport.h"
+#include "ipmi/sdr_info.h"
 
 namespace tqrhost {
 
@@ -50,6 +51,7 @@ private:
 
     void NoteInfo(Source* source, bool askedAgain, const std::optional<Response>& response);
     void NoteLogState(const Response& response);
+    void NoteSensorState(const Response& response);
     /// Judges a walk that is over: a second one that was whole does not make up for it.
     void FinishWalk(Source* source);
     void NoteRecord(Source* source, const RequestFrame& request,
@@ -87,6 +89,7 @@ private:
         bool operator==(const LogState&) const = default;
     };
     std::optional<LogState> logState_;
+    std::optional<ipmi::SdrRepositoryInfo> sensorState_;
 };
 
 }  // namespace tqrhost

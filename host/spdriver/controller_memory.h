@@ -26,6 +26,8 @@ struct ControllerMemory {
     /// The log has changed while it was read, and once more while it was read again: the last
     /// answer of Get SEL Info, or nothing when that could not be had. Otherwise not set.
     std::optional<std::optional<Response>> laterLogInfo;
+    /// The repository has changed while it was read: the last answer of Get SDR Repository Info.
+    std::optional<Response> laterSensorInfo;
 
     /// What the controller would answer; empty when it has to be asked.
     std::optional<Response> Answer(const ipmi::Command& command) const;

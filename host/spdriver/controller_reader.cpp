@@ -314,6 +314,7 @@ void ControllerReader::Pump() {
         if (sensors_) sensors_->Pump();
         if (!sensors_ || sensors_->Finished()) {
             phase_ = Phase::kCheck;
+            if (sensors_) CheckSensors();
             Check();
         }
     }
@@ -325,6 +326,20 @@ void ControllerReader::Pump() {
         }
     }
     pumping_ = false;
+}
+
+void ControllerReader::CheckSensors() {
+    if (!memory_.sensorInfo) return;
+    checkingSensors_ = true;
+    Ask(ipmi::GetSdrRepositoryInfo(), [this](std::optional<Response> info) {
+        checkingSensors_ = false;
+        if (!Completed(info)) return;
+        const auto before = ipmi::SdrRepositoryInfo::Parse(DataOf(*memory_.sensorInfo));
+        const auto after = ipmi::SdrRepositoryInfo::Parse(DataOf(*info));
+        if (before && after && before->HasChanged(*after)) {
+            memory_.laterSensorInfo = std::move(info);
+        }
+    });
 }
 
 void ControllerReader::Check() {

@@ -21,7 +21,8 @@ struct ReadCount {
 };
 
 /// Reads the event log and then the sensor repository of one controller into its memory. Ends with
-/// a second Get SEL Info: when the log has changed meanwhile it is read once more.
+/// a second Get SEL Info: when the log has changed meanwhile it is read once more. A second Get SDR
+/// Repository Info tells whether the repository has changed, which is noted.
 ///
 /// Of a controller that is known from an earlier collection only what is new is read, as far as
 /// that can be proven: the GUID is the same, and the last record that is known stands under its ID
@@ -35,7 +36,7 @@ public:
         : pipeline_(pipeline), needs_(needs), known_(std::move(known)) {}
     /// Asks for the first things; the rest follows as answers come.
     void Start();
-    bool Done() const { return phase_ == Phase::kDone; }
+    bool Done() const { return phase_ == Phase::kDone && !checkingSensors_; }
     bool ReadsLog() const;
     ReadCount LogCount() const;
     ReadCount SensorCount() const;
@@ -63,6 +64,7 @@ private:
     void RecallSensors();
     void StartSensors();
     void Check();
+    void CheckSensors();
     void Checked(std::optional<Response> info);
     std::shared_ptr<RecordReader> Reader(ipmi::CommandCode command);
 
@@ -85,6 +87,7 @@ private:
     bool toldOfSensors_ = false;
     bool reserving_ = false;
     bool reserved_ = false;
+    bool checkingSensors_ = false;  ///< the second Get SDR Repository Info is on its way
     bool pumping_ = false;
 };
 

@@ -54,10 +54,17 @@ std::optional<Response> MemoryTransport::Exchange(const RequestFrame& request) {
     return response;
 }
 
-bool MemoryTransport::EndPass() {
-    if (!memory_.laterLogInfo) return false;
-    memory_.logInfo = *std::exchange(memory_.laterLogInfo, std::nullopt);
-    return true;
+std::vector<ipmi::Command> MemoryTransport::EndPass() {
+    std::vector<ipmi::Command> commands;
+    if (memory_.laterLogInfo) {
+        memory_.logInfo = *std::exchange(memory_.laterLogInfo, std::nullopt);
+        commands.push_back(ipmi::GetSelInfo());
+    }
+    if (memory_.laterSensorInfo) {
+        memory_.sensorInfo = std::exchange(memory_.laterSensorInfo, std::nullopt);
+        commands.push_back(ipmi::GetSdrRepositoryInfo());
+    }
+    return commands;
 }
 
 std::optional<Response> MemoryTransport::ExchangeLive(const ipmi::Command& command) {

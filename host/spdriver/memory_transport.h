@@ -3,6 +3,7 @@
 #include <map>
 #include <memory>
 #include <optional>
+#include <vector>
 
 #include "host/spdriver/command_predictor.h"
 #include "host/spdriver/controller_memory.h"
@@ -18,9 +19,10 @@ class MemoryTransport : public Transport {
 public:
     MemoryTransport(std::unique_ptr<RequestPipeline> pipeline, ControllerMemory memory);
     std::optional<Response> Exchange(const RequestFrame& request) override;
-    /// The pass is over. Whether the log is known to have changed since it was read: from now on
-    /// Get SEL Info is answered with the later state.
-    bool EndPass();
+    /// The pass is over. Get SEL Info and Get SDR Repository Info, where log or repository are
+    /// known to have changed since they were read: from now on they are answered with the later
+    /// state.
+    std::vector<ipmi::Command> EndPass();
 
 private:
     using Clock = RequestPipeline::Clock;

@@ -113,10 +113,14 @@ public:
         const auto begin = bytes_.begin() + static_cast<std::ptrdiff_t>(recorded.at);
         return Response(begin, begin + recorded.length);
     }
-    /// The recording ends with a Get SEL Info that this pass has not asked.
-    bool HasLaterLogInfo() const {
-        const auto found = answers_.find(KeyOf(RequestFrame(ipmi::GetSelInfo())));
-        return found != answers_.end() && found->second.given && !found->second.spent;
+    /// Those with which the recording ends and which this pass has not asked.
+    std::vector<ipmi::Command> LaterInfos() const {
+        std::vector<ipmi::Command> commands{ipmi::GetSelInfo(), ipmi::GetSdrRepositoryInfo()};
+        std::erase_if(commands, [this](const ipmi::Command& command) {
+            const auto found = answers_.find(KeyOf(RequestFrame(command)));
+            return found == answers_.end() || !found->second.given || found->second.spent;
+        });
+        return commands;
     }
     const std::vector<ReadFault>& Missing() const { return missing_; }
 
@@ -294,7 +298,7 @@ Source OpenReplay(const std::vector<std::string>& places, const Access& /*access
         const ReplayTransport* const replay = node.get();
         source.nodes.push_back(
             {"replay:" + place, std::make_unique<StopGate>(std::move(node)), nullptr});
-        source.nodes.back().endPass = [replay] { return replay->HasLaterLogInfo(); };
+        source.nodes.back().endPass = [replay] { return replay->LaterInfos(); };
         source.nodes.back().missing = [replay, cutShort] {
             std::vector<ReadFault> faults;
             if (cutShort)

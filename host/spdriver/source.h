@@ -17,6 +17,7 @@
 #include "host/spdriver/completeness.h"
 #include "host/spdriver/pipeline.h"
 #include "host/spdriver/transport.h"
+#include "ipmi/command.h"
 
 // Where a machine is reached: what the user says of it, and what comes of it.
 
@@ -27,9 +28,9 @@ struct SourceNode {
     std::string name;                           ///< the source as the user wrote it
     std::unique_ptr<Transport> transport;       ///< each request is answered by itself
     std::unique_ptr<RequestPipeline> pipeline;  ///< a live BMC, which is read ahead
-    /// The pass is over; whether Get SEL Info is to be asked a last time, since the log is known to
-    /// have changed after it was read. Null for never.
-    std::function<bool()> endPass = {};
+    /// The pass is over; what is to be asked a last time, since log or sensor repository are known
+    /// to have changed after they were read: Get SEL Info, Get SDR Repository Info. Null for never.
+    std::function<std::vector<ipmi::Command>()> endPass = {};
     /// What else is known to be missing when the pass is over. Null for nothing.
     std::function<std::vector<ReadFault>()> missing = {};
 };

@@ -36,7 +36,7 @@ constexpr std::size_t kResponseAt = 8;
 struct OpenNode {
     std::string source;
     std::unique_ptr<SPLibrary> library;
-    std::function<bool()> endPass;
+    std::function<std::vector<ipmi::Command>()> endPass;
     std::function<std::vector<ReadFault>()> missing;
 };
 constexpr std::size_t kTransferBuffer = 256;
@@ -90,12 +90,14 @@ void OpenMachine(Source source) {
 
 void EndPass() {
     for (const OpenNode& node : Nodes()) {
-        if (!node.endPass || !node.endPass()) continue;
-        std::vector<unsigned char> buffer = FrameOf(ipmi::GetSelInfo());
-        buffer.resize(kTransferBuffer);
-        int length = 0;
-        node.library->sendIPMICommand(buffer.data(), &length, static_cast<int>(buffer.size()),
-                                      true);
+        if (!node.endPass) continue;
+        for (const ipmi::Command& command : node.endPass()) {
+            std::vector<unsigned char> buffer = FrameOf(command);
+            buffer.resize(kTransferBuffer);
+            int length = 0;
+            node.library->sendIPMICommand(buffer.data(), &length, static_cast<int>(buffer.size()),
+                                          true);
+        }
     }
 }
 

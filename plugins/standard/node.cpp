@@ -257,6 +257,8 @@ std::vector<ipmi::SdrRecord> Node::ReadRepository() {
         if (parsed) records.push_back(*std::move(parsed));
         return Link{own, record->nextRecordId};
     });
+    // The host compares this answer with the one before: whether it changed while it was read.
+    if (info) controller_.Send(ipmi::GetSdrRepositoryInfo());
     return records;
 }
 

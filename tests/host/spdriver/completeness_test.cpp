@@ -149,6 +149,22 @@ TEST_F(Completeness, AnInventoryReadThatWasRefusedAndThenAnsweredIsNoFault) {
     EXPECT_EQ(Faults(), Texts{"Read FRU Data 0003: completion code 81"});
 }
 
+TEST_F(Completeness, ARepositoryThatHasChangedIsToldAndNoMore) {
+    bmc.faults.push_back({.netFn = 0x0A,
+                          .command = 0x20,
+                          .call = 3,
+                          .kind = ipmisim::Fault::Kind::kData,
+                          .data = ipmisim::Bytes{0x51, 0, 0, 0, 0, 1, 0, 0, 0, 0, 0, 0, 0, 0}});
+    for (int i = 0; i < 2; ++i) Send(0x20);
+    EXPECT_EQ(Faults(), Texts{});
+    Send(0x20);
+    Send(0x20);
+    EXPECT_EQ(Faults(),
+              Texts{"Get SDR Repository Info : the sensor repository has changed while it "
+                    "was read"});
+    EXPECT_TRUE(Account().Whole());
+}
+
 TEST_F(Completeness, AQuestionAnsweredAtTheSecondTryLeavesNothingOut) {
     Silence(0x40, 1);
     Send(0x40);

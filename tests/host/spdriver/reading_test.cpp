@@ -68,7 +68,7 @@ protected:
         return (*info)[2] | (*info)[3] << 8;
     }
     /// What is missing after a pass that reads the log.
-    std::vector<std::string> FaultsOfAPass() {
+    std::vector<std::string> FaultsOfAPass(bool sensors = false) {
         NQORTQR20::OpenMachine(std::move(source));
         auto* const library = NQORTQR20::SPLibrary::GetSplibraryInstance(0);
         const auto send = [&](const ipmi::Command& command) {
@@ -85,6 +85,7 @@ protected:
             if (answer.empty() || answer[8] != 0) break;
             id = static_cast<std::uint16_t>(answer[9] | answer[10] << 8);
         }
+        if (sensors) send(ipmi::GetSdrRepositoryInfo());
         NQORTQR20::EndPass();
         std::vector<std::string> faults;
         const NQORTQR20::NodeCompleteness node = NQORTQR20::GetCompleteness().front();
@@ -106,7 +107,7 @@ TEST_F(Reading, EveryRecordIsAskedForOnceWhateverTheWindowAndTheOrderOfAnswers) 
                 EXPECT_EQ(Asked(ipmi::kGetSdr), 20u);
                 EXPECT_EQ(Asked(ipmi::kGetSelInfo), 2u);
                 EXPECT_EQ(Asked(ipmi::kGetSdrRepositoryInfo) + Asked(ipmi::kReserveSdrRepository),
-                          2u);
+                          3u);
                 asked.clear();
                 EXPECT_EQ(Log().size(), events);
                 EXPECT_EQ(LogCount(), events);
@@ -212,6 +213,29 @@ TEST_F(Reading, ALostReservationIsTakenAnewAndThePassDoesNotSeeIt) {
         EXPECT_EQ(ipmisim::Bytes(record->begin() + 3, record->end()), bmc.sdrRecords[id - 1]);
     }
     EXPECT_THAT(asked, IsEmpty());
+}
+
+TEST_F(Reading, ARepositoryThatChangesWhileItIsReadIsTold) {
+    for (const bool changes : {false, true}) {
+        Describe(1, 3);
+        ipmisim::BmcDescription grown = bmc;
+        grown.sdrRecords.push_back(FullSensor(4, 4, 7, 1, "New"));
+        Read({.window = 1,
+              .before = [&, infos = 0](std::size_t, const ipmi::Command& command,
+                                       ipmisim::SimulatedBmc* of) mutable {
+                  if (command.code() == ipmi::kGetSdrRepositoryInfo && ++infos == 2 && changes) {
+                      *of = ipmisim::SimulatedBmc(grown);
+                  }
+              }});
+        const auto faults = FaultsOfAPass(true);
+        NQORTQR20::CloseMachine();
+        if (changes) {
+            EXPECT_THAT(faults, ElementsAre("Get SDR Repository Info: the sensor repository has "
+                                            "changed while it was read"));
+        } else {
+            EXPECT_THAT(faults, IsEmpty());
+        }
+    }
 }
 
 /// A log that changes while it is read, once and twice; what comes of it, and what is said.
