@@ -55,6 +55,13 @@ bool HasBmc() {
     return known && NQORTQR20::SPLibrary::GetNumberBMCNode() > 0;
 }
 
+/// A controller that answered is one, whatever the machine's tables say of it.
+bool HasAnswered(const std::vector<NQORTQR20::NodeCompleteness>& nodes) {
+    return std::ranges::any_of(nodes, [](const NQORTQR20::NodeCompleteness& node) {
+        return node.controller.read + node.log.read + node.sensors.read > 0;
+    });
+}
+
 struct Machine {
     explicit Machine(NQORTQR20::Source source) { NQORTQR20::OpenMachine(std::move(source)); }
     ~Machine() { NQORTQR20::CloseMachine(); }
@@ -290,10 +297,10 @@ Outcome CollectTo(const CollectOptions& options, ReportOutput& output) {
     StopSignals::EndCollecting();
     sink.Check();
     end.stopped = NQORTQR20::Stopped();
-    end.hasBmc = HasBmc();
     end.notices = TellNotices();
     if (unchanged) end.notices = store->NoticesOfUnchanged();
     end.completeness = NQORTQR20::GetCompleteness();
+    end.hasBmc = HasBmc() || HasAnswered(end.completeness);
     end.exported = sink.Exported();
     for (std::size_t node = 0; node < end.exported.size(); ++node) {
         end.completeness[node].log.exported = end.exported[node];

@@ -253,6 +253,16 @@ TEST_F(Collecting, AMachineWithoutABmcGivesAnEmptyReport) {
     }
 }
 
+TEST_F(Collecting, AControllerThatAnswersIsOneWhateverTheTablesOfTheMachineSay) {
+    Json server = Server();
+    server.erase("smbios");
+    const Ended ended =
+        Collect(Write(server), {"--format", "json", "--class", "IPMI_EventLog"});
+    EXPECT_EQ(ended.exitStatus, 0);
+    EXPECT_EQ(Json::parse(ended.out)["instances"].size(), 1U);
+    EXPECT_EQ(ended.err, "");
+}
+
 TEST_F(Collecting, AReaderThatLeavesEndsItQuietly) {
     const std::string source = Write(Server(500));
     const Ended ended =
