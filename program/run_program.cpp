@@ -18,6 +18,7 @@
 #include "program/commands/command.h"
 #include "program/commands/configuration.h"
 #include "program/commands/diff.h"
+#include "program/commands/doctor.h"
 #include "program/commands/failure.h"
 #include "program/commands/report.h"
 #include "program/fleet/worker.h"
@@ -28,8 +29,8 @@ namespace {
 
 /// In the order of the help.
 constexpr Command (*kCommands[])(CLI::App* program) = {
-    AddCollectCommand, AddReportCommand,  AddDiffCommand,  AddCheckCommand,
-    AddAckCommand,     AddClassesCommand, AddWorkerCommand};
+    AddCollectCommand, AddReportCommand, AddDiffCommand,    AddCheckCommand,
+    AddAckCommand,     AddDoctorCommand, AddClassesCommand, AddWorkerCommand};
 
 /// Letters to put in, take out or change to make one word the other.
 std::size_t Distance(std::string_view a, std::string_view b) {

@@ -16,7 +16,9 @@ namespace NQORTQR20 {
 
 /// Why a source could not be opened; what() is one line for the user that says what to do.
 struct SourceError : std::runtime_error {
-    using std::runtime_error::runtime_error;
+    explicit SourceError(const std::string& line, bool forCredentials = false)
+        : std::runtime_error(line), credentials(forCredentials) {}
+    bool credentials;  ///< a BMC took exception to user, password or key
 };
 /// The sources are named wrongly: a kind that is not known, kinds that do not go together, or
 /// options that no BMC could be opened with.

@@ -26,6 +26,12 @@ enum class OpeningError {
     kStopped,
 };
 
+/// User, password or key are not what the BMC has.
+constexpr bool IsOfCredentials(OpeningError error) {
+    return error == OpeningError::kUserUnknown || error == OpeningError::kPasswordWrong ||
+           error == OpeningError::kSilentAtPassword || error == OpeningError::kKgWrong;
+}
+
 /// One line for the user: what failed at `place` and what to do.
 std::string Advice(const std::string& place, OpeningError error);
 

@@ -15,7 +15,6 @@ constexpr std::uint8_t kRmcpPlus = 0x06;   // authentication type of IPMI 2.0
 constexpr std::uint8_t kNextHeader = 0x07;
 constexpr std::uint8_t kEncrypted = 0x80;
 constexpr std::uint8_t kAuthenticated = 0x40;
-constexpr std::uint8_t kThisChannel = 0x0E;
 constexpr std::uint8_t kIpmi20Data = 0x80;  // asks for the extended capabilities
 constexpr std::uint8_t kConsoleAddress = 0x81;
 constexpr std::uint8_t kLookupByNameOnly = 0x10;
@@ -116,36 +115,47 @@ Packet& Packet::Fill(std::size_t count, std::uint8_t value) {
 
 // --- Before the session -----------------------------------------------------------------------
 
-Packet AuthenticationCapabilitiesRequest(std::uint8_t privilege, std::uint8_t rqSeq) {
-    const std::uint8_t data[] = {kThisChannel | kIpmi20Data, privilege};
+Packet SessionlessRequest(const ipmi::Command& command, std::uint8_t rqSeq) {
     Packet packet;
     // Authentication type "none", session sequence number and session ID 0.
-    packet.U8(0x06).U8(0).U8(0xFF).U8(0x07).Fill(9, 0).U8(kMessageFrame + sizeof data);
-    constexpr ipmi::CommandCode kCommand = ipmi::kGetChannelAuthenticationCapabilities;
-    AppendMessage(&packet, kCommand.netFn, ipmi::kBmcLun, rqSeq, kCommand.number, data);
+    packet.U8(0x06).U8(0).U8(0xFF).U8(0x07).Fill(9, 0).U8(
+        static_cast<unsigned>(kMessageFrame + command.data.size()));
+    AppendMessage(&packet, command.netFn, command.lun, rqSeq, command.command, command.data);
     return packet;
 }
 
-std::optional<AuthenticationCapabilities> ParseAuthenticationCapabilities(ByteView packet,
-                                                                          std::uint8_t rqSeq,
-                                                                          bool skipChecksums) {
+std::optional<ByteView> ParseSessionlessAnswer(ByteView packet, std::uint8_t rqSeq,
+                                               ipmi::CommandCode command, bool skipChecksums) {
     constexpr std::size_t kHeader15 = 14;  // RMCP header and session header of IPMI 1.5
     if (packet.size() < kHeader15 || !IsRmcpOfIpmi(packet) || packet[4] != 0) return std::nullopt;
     const std::size_t length = packet[kHeader15 - 1];
     if (length > packet.size() - kHeader15) return std::nullopt;
     const auto answer = ParseMessage(packet.subspan(kHeader15, length), skipChecksums);
-    if (!answer || answer->rqSeq != rqSeq ||
-        answer->command != ipmi::kGetChannelAuthenticationCapabilities) {
-        return std::nullopt;
-    }
-    // Completion code, channel, authentication types (bit 7: extended data), status, extended
-    // capabilities (bit 1: IPMI 2.0), IPMI 2.0, table 22-15.
-    ipmisel::ByteReader in(answer->response);
+    if (!answer || answer->rqSeq != rqSeq || answer->command != command) return std::nullopt;
+    return answer->response;
+}
+
+Packet AuthenticationCapabilitiesRequest(std::uint8_t privilege, std::uint8_t rqSeq) {
+    return SessionlessRequest(
+        ipmi::MakeCommand(ipmi::kGetChannelAuthenticationCapabilities,
+                          {static_cast<std::uint8_t>(kThisChannel | kIpmi20Data), privilege}),
+        rqSeq);
+}
+
+std::optional<AuthenticationCapabilities> ParseAuthenticationCapabilities(ByteView packet,
+                                                                          std::uint8_t rqSeq,
+                                                                          bool skipChecksums) {
+    const auto response = ParseSessionlessAnswer(
+        packet, rqSeq, ipmi::kGetChannelAuthenticationCapabilities, skipChecksums);
+    if (!response) return std::nullopt;
+    // Completion code, channel, authentication types (bit 7: extended data), status (bit 5: a key
+    // of the BMC's own), extended capabilities (bit 1: IPMI 2.0), IPMI 2.0, table 22-15.
+    ipmisel::ByteReader in(*response);
     AuthenticationCapabilities found;
     const bool completed = in.U8() == ipmi::kCompleted;
     in.Skip(1);
     const bool extended = (in.U8() & 0x80) != 0;
-    in.Skip(1);
+    found.hasKey = (in.U8() & 0x20) != 0;
     found.ipmi20 = (in.U8() & 0x02) != 0 && in.ok() && completed && extended;
     return found;
 }

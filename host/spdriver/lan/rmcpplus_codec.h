@@ -55,8 +55,12 @@ struct Credentials {
     Deviations deviations{};
 };
 
+/// The channel that a request came in by (IPMI 2.0, 22.13).
+constexpr std::uint8_t kThisChannel = 0x0E;
+
 struct AuthenticationCapabilities {
     bool ipmi20 = false;
+    bool hasKey = false;  ///< the BMC has a key of its own (Kg)
 };
 
 /// The answer to an IPMI request inside a session.
@@ -94,6 +98,12 @@ constexpr std::uint8_t kInvalidIntegrityCheckValue = 0x0F;
 constexpr std::uint8_t kInvalidConfidentialityAlgorithm = 0x10;
 constexpr std::uint8_t kNoCipherSuiteMatch = 0x11;
 }  // namespace status
+
+/// A command in a packet of IPMI 1.5 without a session, with little data. `rqSeq` has six bits.
+Packet SessionlessRequest(const ipmi::Command& command, std::uint8_t rqSeq);
+/// From the completion code on, within the packet; empty for every other packet.
+std::optional<ByteView> ParseSessionlessAnswer(ByteView packet, std::uint8_t rqSeq,
+                                               ipmi::CommandCode command, bool skipChecksums);
 
 /// Get Channel Authentication Capabilities in a packet of IPMI 1.5, which wants no session and no
 /// cryptography. `rqSeq` has six bits.
