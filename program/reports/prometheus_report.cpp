@@ -81,7 +81,14 @@ public:
     }
 
 private:
-    std::string Name(Integer node) const { return systems_.Of(node).name; }
+    /// A series stands once: nodes of one name have their number behind it.
+    std::string Name(Integer node) const {
+        const std::string& name = systems_.Of(node).name;
+        const std::string label = systems_.LabelOf(node);
+        if (label.empty() || label == name) return name;
+        return name.empty() ? label : name + ' ' + label;
+    }
+    static Integer NodeAt(std::size_t index) { return static_cast<std::int64_t>(index + 1); }
 
     void AddEvent(const Event& event) {
         if (event.severity && event.time) {
@@ -102,11 +109,11 @@ private:
             const bool whole = i < end.completeness.size() ? end.completeness[i].Whole() : false;
             const bool good = OutcomeOf(end).exitStatus == 0 ||
                               (whole && end.status.code == NQORTQR20::kStatusOk);
-            success.Sample({{"system", systems_.All()[i].name}}, good ? 1 : 0);
+            success.Sample({{"system", Name(NodeAt(i))}}, good ? 1 : 0);
         }
         Metric collected(out_, "collection_timestamp_seconds", "When the collection was made.");
-        for (const SystemInfo& system : systems_.All()) {
-            collected.Sample({{"system", system.name}},
+        for (std::size_t i = 0; i < systems_.All().size(); ++i) {
+            collected.Sample({{"system", Name(NodeAt(i))}},
                              static_cast<double>(head_.collected.seconds));
         }
         Metric duration(out_, "collection_duration_seconds", "How long the collection took.");
@@ -138,9 +145,9 @@ private:
                                         std::get<1>(key) == severity;
                     if (counts) count += number;
                 }
-                findings.Sample({{"system", systems_.All()[i].name},
-                                 {"severity", std::string(InfoOf(severity).name)}},
-                                count);
+                findings.Sample(
+                    {{"system", Name(NodeAt(i))}, {"severity", std::string(InfoOf(severity).name)}},
+                    count);
             }
         }
         Metric types(out_, "findings_by_sensor_type",

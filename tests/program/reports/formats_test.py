@@ -142,6 +142,11 @@ class Examples(unittest.TestCase):
                 logs.validate(json.loads(line))
             self.assertTrue(text, example)
 
+    def test_prometheus_has_each_series_once(self):
+        for example, text in self.each("prometheus"):
+            series = [line.rpartition(" ")[0] for line in text.splitlines() if not line.startswith("#")]
+            self.assertEqual(len(series), len(set(series)), example)
+
     def test_html_holds_together_without_anything_else(self):
         for example, text in self.each("html"):
             page = Page(text)
