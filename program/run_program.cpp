@@ -21,6 +21,7 @@
 #include "program/commands/doctor.h"
 #include "program/commands/failure.h"
 #include "program/commands/report.h"
+#include "program/commands/watch.h"
 #include "program/fleet/worker.h"
 #include "program/reports/terminal_text.h"
 
@@ -30,7 +31,8 @@ namespace {
 /// In the order of the help.
 constexpr Command (*kCommands[])(CLI::App* program) = {
     AddCollectCommand, AddReportCommand, AddDiffCommand,    AddCheckCommand,
-    AddAckCommand,     AddDoctorCommand, AddClassesCommand, AddWorkerCommand};
+    AddWatchCommand,   AddAckCommand,    AddDoctorCommand,  AddClassesCommand,
+    AddWorkerCommand};
 
 /// Letters to put in, take out or change to make one word the other.
 std::size_t Distance(std::string_view a, std::string_view b) {

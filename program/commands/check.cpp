@@ -1,7 +1,9 @@
 #include "program/commands/check.h"
 
 #include <CLI/CLI.hpp>
+#include <map>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -16,12 +18,15 @@
 #include "program/reports/output_file.h"
 #include "program/reports/saved_report.h"
 #include "program/reports/view.h"
+#include "program/store/store.h"
 
 namespace ipmisel {
 namespace {
 
 struct CheckOptions {
     std::vector<std::string> files;
+    std::optional<std::string> store;
+    std::vector<std::string> systems;  ///< of the store; none: all
     CollectOptions collect;
     HostsOptions hosts;
 };
@@ -47,7 +52,45 @@ std::vector<SystemSummary> Saved(const std::vector<std::string>& files) {
     return systems;
 }
 
+/// What is open in a store and not acknowledged, as it was at the last visits.
+std::vector<SystemSummary> Stored(const std::string& uri, const std::vector<std::string>& names) {
+    Store store(uri);
+    std::vector<SystemSummary> systems;
+    std::map<std::string, std::size_t> index;
+    for (const StoredVisit& visit : store.LastVisits(names)) {
+        index[visit.system] = systems.size();
+        SystemSummary& system = systems.emplace_back();
+        system.index = systems.size();
+        system.name = visit.system;
+        if (!visit.complete) {
+            const int status = visit.kind == "failed" ? kExitNoSource : kExitPart;
+            system.outcome = {status, visit.problem, ""};
+        }
+    }
+    for (const StoredFinding& stored : store.OpenFindings(names)) {
+        const auto place = index.find(stored.system);
+        if (stored.acknowledged || place == index.end()) continue;
+        Finding finding;
+        finding.severity = SeverityNamed(stored.severity);
+        finding.title = stored.title;
+        finding.part = stored.part;
+        finding.partNumber = stored.partNumber;
+        finding.serialNumber = stored.serial;
+        AddFinding(finding, &systems[place->second]);
+    }
+    for (const std::string& name : names) {
+        if (index.contains(name)) continue;
+        SystemSummary& system = systems.emplace_back();
+        system.index = systems.size();
+        system.name = name;
+        system.outcome = {kExitNoSource, "the store has no system of this name", "check --system"};
+    }
+    SortWorstFirst(&systems);
+    return systems;
+}
+
 int Check(CheckOptions options) {
+    if (options.store) return Print(CheckSystems(Stored(*options.store, options.systems)));
     const bool live = !options.collect.access.sources.empty() || !options.hosts.lists.empty();
     if (!options.files.empty()) {
         if (live) {
@@ -73,8 +116,19 @@ Command AddCheckCommand(CLI::App* program) {
     options->collect.progress = false;
     command->add_option("FILE", options->files, "Saved reports of --format json, instead of --from")
         ->check(FileName());
+    CLI::Option* const store =
+        command
+            ->add_option("--store", options->store, "What a store has instead, by its last visits")
+            ->type_name("URI")
+            ->check(NotEmpty("the store is empty; give sqlite:FILE or postgresql://..."));
+    command->add_option("--system", options->systems, "A system of the store; else all")
+        ->type_name("NAME")
+        ->allow_extra_args(false)
+        ->needs(store);
     AddAccessOptions(command, &options->collect.access);
+    for (const char* other : {"FILE", "--from"}) store->excludes(command->get_option(other));
     AddHostsOptions(command, &options->hosts);
+    store->excludes(command->get_option("--hosts"));
     AddDeadlineOption(command, &options->collect.deadlineSeconds);
     AddSeveritiesOption(command, &options->collect.severities);
     AddPluginOption(command, &options->collect.plugins);

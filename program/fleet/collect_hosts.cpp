@@ -1,6 +1,5 @@
 #include "program/fleet/collect_hosts.h"
 
-#include <sys/resource.h>
 #include <unistd.h>
 
 #include <CLI/CLI.hpp>
@@ -70,21 +69,10 @@ std::string AsNamed(const CollectOptions& options, const HostsOptions& hosts) {
     return text + (hosts.shard ? ", part " + *hosts.shard : "");
 }
 
-/// Three descriptors a worker, and some of our own.
-void RaiseFileLimit() {
-    rlimit limit{};
-    if (getrlimit(RLIMIT_NOFILE, &limit) != 0) return;
-    limit.rlim_cur = limit.rlim_max;
-    setrlimit(RLIMIT_NOFILE, &limit);
-}
-
 class Collection {
 public:
     Collection(const CollectOptions& common, std::size_t jobs, FleetReport& report)
-        : report_(report), pool_(jobs, [](std::string_view line) {
-              HideProgress();
-              std::fprintf(stderr, "%.*s\n", static_cast<int>(line.size()), line.data());
-          }) {
+        : report_(report), pool_(jobs, PassLogLine) {
         if (common.progress) progress_.emplace();
     }
 
@@ -110,12 +98,9 @@ public:
 
 private:
     void Start(std::size_t index, const CollectOptions& options) {
-        const std::chrono::duration<double> deadline(*options.deadlineSeconds);
-        const auto limit =
-            Clock::now() + std::chrono::duration_cast<Clock::duration>(deadline) + kTimeToEnd;
         names_.resize(std::max(names_.size(), index + 1));
         names_[index] = {options.access.sources.front(), options.names.front()};
-        pool_.Start(index, options.names.front(), WriteWorkerRequest(options), limit);
+        StartWorker(&pool_, index, options);
     }
     void LeaveOut(std::size_t index, const CollectOptions& options) {
         Add({index,
@@ -160,19 +145,32 @@ private:
 
 /// Collects from the controllers that are meant, as `common` says, into a report.
 Outcome CollectInto(FleetReport& report, const CollectOptions& common, const HostsOptions& hosts) {
-    std::vector<HostEntry> list = HostsOf(common, hosts);
-    HostOptions own(common, list);
-    if (hosts.shard) {
-        std::erase_if(list, [shard = *ParseShard(*hosts.shard)](const HostEntry& host) {
-            return !shard.Has(host.source);
-        });
-    }
-    RaiseFileLimit();
+    HostPlan plan(common, hosts);
     const StopSignals signals;
-    return Collection(common, hosts.jobs, report).Run(list, &own);
+    return Collection(common, hosts.jobs, report).Run(plan.hosts, &plan.own);
 }
 
 }  // namespace
+
+HostPlan::HostPlan(const CollectOptions& common, const HostsOptions& meant)
+    : hosts(HostsOf(common, meant)), own(common, hosts) {
+    if (!meant.shard) return;
+    std::erase_if(hosts, [shard = *ParseShard(*meant.shard)](const HostEntry& host) {
+        return !shard.Has(host.source);
+    });
+}
+
+void StartWorker(WorkerPool* pool, std::size_t id, const CollectOptions& options) {
+    const std::chrono::duration<double> deadline(*options.deadlineSeconds);
+    const auto limit =
+        Clock::now() + std::chrono::duration_cast<Clock::duration>(deadline) + kTimeToEnd;
+    pool->Start(id, options.names.front(), WriteWorkerRequest(options), limit);
+}
+
+void PassLogLine(std::string_view line) {
+    HideProgress();
+    std::fprintf(stderr, "%.*s\n", static_cast<int>(line.size()), line.data());
+}
 
 void AddHostsOptions(CLI::App* command, HostsOptions* options) {
     command

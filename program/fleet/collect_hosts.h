@@ -3,10 +3,14 @@
 #include <cstddef>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "program/commands/collect.h"
 #include "program/fleet/fleet_summary.h"
+#include "program/fleet/host_list.h"
+#include "program/fleet/host_options.h"
+#include "program/fleet/worker_pool.h"
 
 namespace ipmisel {
 
@@ -18,6 +22,20 @@ struct HostsOptions {
 };
 /// Adds --hosts, --jobs and --shard to a command.
 void AddHostsOptions(CLI::App* command, HostsOptions* options);
+
+/// The controllers that are meant, in their order, and what each of them takes. Throws Failure.
+struct HostPlan {
+    HostPlan(const CollectOptions& common, const HostsOptions& meant);
+
+    std::vector<HostEntry> hosts;
+    HostOptions own;
+};
+
+/// Starts a worker with these options, as HostOptions gives them, and kills it some time after its
+/// deadline.
+void StartWorker(WorkerPool* pool, std::size_t id, const CollectOptions& options);
+/// Hands a worker's line on to standard error.
+void PassLogLine(std::string_view line);
 
 /// Collects from each controller in a process of its own, and writes the report of all; the exit
 /// status. Throws Failure.

@@ -15,7 +15,6 @@
 #include <vector>
 
 #include "program/commands/failure.h"
-#include "program/reports/saved_report.h"
 #include "program/reports/spool.h"
 
 namespace ipmisel {
@@ -289,6 +288,8 @@ std::unique_ptr<FleetReport> MakeFleetReport(const FormatInfo& format, OutputFil
     }
     return std::make_unique<WholeReport>(format, out, head, look);
 }
+
+SavedReport ReadWorkerReport(const std::string& name, int file) { return ReadReport(name, file); }
 
 std::unique_ptr<FleetReport> MakeSummaries(std::vector<SystemSummary>* systems) {
     return std::make_unique<Summaries>(systems);

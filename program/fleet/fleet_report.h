@@ -11,6 +11,7 @@
 #include "program/fleet/worker.h"
 #include "program/reports/output_file.h"
 #include "program/reports/report.h"
+#include "program/reports/saved_report.h"
 
 namespace ipmisel {
 
@@ -38,6 +39,9 @@ std::string_view WorkerFormat(std::string_view format);
 /// worst first.
 std::unique_ptr<FleetReport> MakeFleetReport(const FormatInfo& format, OutputFile& out,
                                              const ReportHead& head, const ReportLook& look);
+
+/// The report in JSON that a worker wrote, as long as the file is open. Throws Failure.
+SavedReport ReadWorkerReport(const std::string& name, int file);
 
 /// Takes reports in JSON into summaries, and in the end sorts them, the worst first.
 std::unique_ptr<FleetReport> MakeSummaries(std::vector<SystemSummary>* systems);

@@ -90,18 +90,22 @@ void Summarize(const SavedReport& report, SystemSummary* summary) {
     report.ForEach([summary](const NQORTQR20::Instance& instance) {
         if (instance.className == kEventLogClass) {
             const EventLog log = EventLogOf(instance);
-            summary->records += log.records.value_or(0);
+            if (log.records) summary->records = summary->records.value_or(0) + *log.records;
             summary->logUsedPercent = std::max(summary->logUsedPercent, log.usedPercent);
         }
         if (instance.className != kFindingClass) return;
-        const Finding finding = FindingOf(instance);
-        ++summary->problems;
-        if (finding.severity >= Severity::kCritical) ++summary->critical;
-        if (summary->findings.size() < kMaxFindings) summary->findings.push_back(finding);
+        AddFinding(FindingOf(instance), summary);
     });
+}
+
+void AddFinding(const Finding& finding, SystemSummary* summary) {
+    ++summary->problems;
+    if (finding.severity >= Severity::kCritical) ++summary->critical;
+    summary->findings.push_back(finding);
     // The worst first, of every node of the system.
     std::stable_sort(summary->findings.begin(), summary->findings.end(),
                      [](const Finding& a, const Finding& b) { return a.severity > b.severity; });
+    if (summary->findings.size() > kMaxFindings) summary->findings.pop_back();
 }
 
 void SortWorstFirst(std::vector<SystemSummary>* systems) {

@@ -22,7 +22,7 @@ struct SystemSummary {
     std::vector<Finding> findings{};         ///< the worst first, no more than are shown
     std::size_t problems = 0;                ///< all of them
     std::size_t critical = 0;                ///< that are critical or fatal
-    std::int64_t records = 0;                ///< in the event logs
+    Integer records{};                       ///< in the event logs, where known
     std::optional<double> logUsedPercent{};  ///< of the fullest log
 
     std::optional<Severity> Worst() const;
@@ -30,6 +30,7 @@ struct SystemSummary {
 
 /// Takes what a summary says from a report.
 void Summarize(const SavedReport& report, SystemSummary* summary);
+void AddFinding(const Finding& finding, SystemSummary* summary);
 /// The worst first; behind those with a problem those that could not be read whole; the others as
 /// in the list.
 void SortWorstFirst(std::vector<SystemSummary>* systems);

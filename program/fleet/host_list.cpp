@@ -73,9 +73,8 @@ using Options = std::vector<std::pair<std::string, std::string>>;
 Options Over(const Options& common, const Options& own) {
     Options options;
     for (const auto& option : common) {
-        const bool isOwn = std::any_of(own.begin(), own.end(), [&](const auto& other) {
-            return other.first == option.first;
-        });
+        const bool isOwn = std::any_of(
+            own.begin(), own.end(), [&](const auto& other) { return other.first == option.first; });
         if (!isOwn) options.push_back(option);
     }
     options.insert(options.end(), own.begin(), own.end());

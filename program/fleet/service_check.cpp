@@ -44,18 +44,18 @@ std::string OutcomeText(const SystemSummary& system) {
 
 std::string PerformanceData(const std::vector<SystemSummary>& systems) {
     std::size_t problems = 0, critical = 0, notWhole = 0;
-    std::int64_t records = 0;
+    Integer records;
     std::optional<double> used;
     for (const SystemSummary& system : systems) {
         problems += system.problems;
         critical += system.critical;
         if (system.outcome.exitStatus != kExitCollected) ++notWhole;
-        records += system.records;
+        if (system.records) records = records.value_or(0) + *system.records;
         used = std::max(used, system.logUsedPercent);
     }
     // label=value[unit];warning;critical;minimum;maximum
-    std::string data = Format("critical=%zu;;0;0 warning=%zu;0;;0 records=%lld;;;0", critical,
-                              problems - critical, static_cast<long long>(records));
+    std::string data = Format("critical=%zu;;0;0 warning=%zu;0;;0", critical, problems - critical);
+    if (records) data += Format(" records=%lld;;;0", static_cast<long long>(*records));
     if (used) data += Format(" log_used=%.1f%%;;;0;100", *used);
     if (systems.size() != 1) data += Format(" systems=%zu", systems.size());
     return data + Format(" not_whole=%zu;;;0;%zu", notWhole, systems.size());

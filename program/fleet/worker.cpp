@@ -1,5 +1,6 @@
 #include "program/fleet/worker.h"
 
+#include <poll.h>
 #include <sys/prctl.h>
 #include <unistd.h>
 
@@ -91,6 +92,8 @@ WorkerResult CollectAsAsked() {
 int Work(const std::string& name) {
     // Whoever started it may be killed at any time; nobody would take the report then.
     prctl(PR_SET_PDEATHSIG, SIGTERM);
+    pollfd reader{kWorkerResult, 0, 0};
+    if (poll(&reader, 1, 0) != 0) throw Failure(kExitUsage, kNoRequest);  // it is gone already
     SayFor(name);
     const WorkerResult result = CollectAsAsked();
     const std::string message = WriteWorkerResult(result);

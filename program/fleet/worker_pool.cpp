@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <spawn.h>
+#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -100,6 +101,14 @@ bool ReadSome(const FileDescriptor& file, std::string* text) {
     return count > 0;
 }
 
+/// Three descriptors a worker, and some of our own.
+void RaiseFileLimit() {
+    rlimit limit{};
+    if (getrlimit(RLIMIT_NOFILE, &limit) != 0) return;
+    limit.rlim_cur = limit.rlim_max;
+    setrlimit(RLIMIT_NOFILE, &limit);
+}
+
 }  // namespace
 
 struct WorkerPool::Worker {
@@ -135,7 +144,9 @@ struct WorkerPool::Worker {
 };
 
 WorkerPool::WorkerPool(std::size_t jobs, std::function<void(std::string_view line)> log)
-    : jobs_(jobs), log_(std::move(log)) {}
+    : jobs_(jobs), log_(std::move(log)) {
+    RaiseFileLimit();
+}
 
 WorkerPool::~WorkerPool() = default;
 

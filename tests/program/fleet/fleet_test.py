@@ -1,7 +1,7 @@
 #!/usr/bin/env python3
 """Collections from many controllers at a time, which are simulated ones on ports.
 
-usage: fleet_test.py IPMISEL IPMISEL-SIMULATOR TREE
+usage: fleet_test.py IPMISEL IPMISEL-SIMULATOR TREE [TEST]...
 """
 import csv
 import io
@@ -9,6 +9,7 @@ import json
 import os
 import pathlib
 import signal
+import socket
 import subprocess
 import sys
 import tempfile
@@ -274,6 +275,42 @@ class Fleet(unittest.TestCase):
                 self.assertEqual(ended.returncode, 3, options)
                 self.assertRegex(ended.stdout, r"\AIPMI UNKNOWN - [^\n]+\n\Z", options)
 
+    def test_watching_tells_what_is_new_and_ends_in_good_order(self):
+        source = pathlib.Path(self.folder.name, "server.json")
+        lists = pathlib.Path(self.folder.name, "hosts")
+        server = {"smbios": ["26123000012020ffa30c0000000000000105 0000"],
+                  "bmcs": [{"device_id": "20 01 02 15 02 bf 57 01 00 00 01 00 00 00 00", "sdr": {"records": []},
+                            "sel": {"entries": ["0100 02 b0e5e665 2000 04 08 30 6f 01ffff"]}}]}
+        source.write_text(json.dumps(server))
+        notify = socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM)
+        self.addCleanup(notify.close)
+        notify.bind(self.folder.name + "/notify")
+        notify.settimeout(20)
+        self.environment.update(NOTIFY_SOCKET=self.folder.name + "/notify", WATCHDOG_USEC="4000000")
+        with Controllers(1, "--records", "3") as one:
+            lists.write_text(one.names[0] + "\n")
+            command = [IPMISEL, "watch", "--from", f"sim:{source}", "--hosts", f"@{lists}", "--user", "root",
+                       "--password-file", self.password, "--every", "60"]
+            with subprocess.Popen(command, stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
+                                  env=self.environment) as run:
+                self.assertEqual(notify.recv(999), b"READY=1\nSTATUS=2 controllers")
+                time.sleep(5)
+                server["bmcs"][0]["sel"]["entries"].append("0200 02 b1e5e665 2000 04 08 30 ef 01ffff")
+                source.write_text(json.dumps(server))
+                lists.write_text(one.names[0] + "  # as before\n")
+                run.send_signal(signal.SIGHUP)
+                told = [notify.recv(999).split(b"\n")[0] for _ in range(30)]
+                self.assertEqual(told[0], b"WATCHDOG=1")
+                self.assertIn(b"RELOADING=1", told)
+                self.assertIn(b"READY=1", told)
+                run.send_signal(signal.SIGTERM)
+                out, err = run.communicate(timeout=20)
+            self.assertEqual((run.returncode, err), (0, ""))
+            events = [json.loads(line) for line in out.splitlines()]
+            self.assertEqual([(event["system"], event["RecordID"]) for event in events], [("server", 2)])
+            while told[-1] != b"STOPPING=1":
+                told.append(notify.recv(999))
+
     def test_what_does_not_go_with_many_is_refused(self):
         for options in (("--record", "x"), ("--name", "x"), ("--log-file", "x"), ("--jobs", "0"), ("--shard", "9/8"),
                         ("--last", "3"), ("--format", "csv", "--class", "IPMI_Event", "--class", "IPMI_FRU")):
@@ -297,4 +334,4 @@ def state(pid):
 
 
 if __name__ == "__main__":
-    unittest.main(argv=sys.argv[:1])
+    unittest.main(argv=sys.argv[:1] + sys.argv[4:])
