@@ -2,18 +2,23 @@
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <charconv>
+#include <chrono>
 #include <iterator>
 #include <map>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "program/commands/failure.h"
+#include "program/reports/event_filter.h"
 #include "program/reports/output_file.h"
 #include "program/reports/saved_report.h"
 #include "program/reports/systems.h"
 #include "program/reports/terminal_text.h"
 #include "program/reports/wording.h"
+#include "program/store/store.h"
 
 namespace ipmisel {
 namespace {
@@ -58,6 +63,51 @@ State StateOf(const SavedReport& saved) {
     for (const Finding& f : machine.findings) {
         state.problems.emplace(named(f.node, Listed({f.title, f.part}, " - ")),
                                f.severity ? std::string(InfoOf(*f.severity).name) : "");
+    }
+    return state;
+}
+
+struct Options {
+    std::vector<std::string> sides;  ///< files, or visits of the store
+    std::optional<std::string> store;
+    std::optional<std::string> system;
+};
+
+/// A visit by its number, or the last one of the system at a time.
+std::int64_t VisitNamed(Store& store, const std::string& text, const Options& options) {
+    std::int64_t number = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    if (error == std::errc() && end == text.data() + text.size()) return number;
+    const auto now = std::chrono::duration_cast<std::chrono::seconds>(
+        std::chrono::system_clock::now().time_since_epoch());
+    const auto moment = ParseMoment(text, {now.count()});
+    if (!moment || !options.system) {
+        throw Failure(kExitUsage, "\"" + text +
+                                      "\" is no visit of the store; give its number, or a time "
+                                      "such as 2026-03-09 or 7d with --system");
+    }
+    const auto visit = store.VisitAt(*options.system, moment->seconds);
+    if (visit) return *visit;
+    throw Failure(kExitUsage, "the store has no visit of " + *options.system + " from before " +
+                                  text + "; give a later time, or another --system");
+}
+
+State StateOf(Store& store, const std::string& text, const Options& options) {
+    const auto stored = store.StateAt(VisitNamed(store, text, options));
+    if (!stored) {
+        throw Failure(kExitUsage, "the store has no visit " + text + "; take one from its visits");
+    }
+    State state;
+    for (const VisitPart& part : stored->parts) {
+        Values& values = part.kind == "firmware" ? state.firmware : state.parts;
+        values.emplace(
+            TerminalText(part.slot),
+            TerminalText(Listed({part.manufacturer, part.product,
+                                 OrderText(part.partNumber, part.serial), part.version})));
+    }
+    for (const StoredFinding& finding : stored->findings) {
+        state.problems.emplace(TerminalText(Listed({finding.title, finding.part}, " - ")),
+                               finding.severity);
     }
     return state;
 }
@@ -108,9 +158,16 @@ private:
     bool different_ = false;
 };
 
-int Diff(const std::vector<std::string>& files) {
-    const State before = StateOf(SavedReport(files.at(0)));
-    const State after = StateOf(SavedReport(files.at(1)));
+int Diff(const Options& options) {
+    State before, after;
+    if (options.store) {
+        Store store(*options.store);
+        before = StateOf(store, options.sides.at(0), options);
+        after = StateOf(store, options.sides.at(1), options);
+    } else {
+        before = StateOf(SavedReport(options.sides.at(0)));
+        after = StateOf(SavedReport(options.sides.at(1)));
+    }
     OutputFile out(std::nullopt);
     Comparison comparison(out);
     comparison.Compare("Problems", before.problems, after.problems);
@@ -123,18 +180,27 @@ int Diff(const std::vector<std::string>& files) {
 }  // namespace
 
 Command AddDiffCommand(CLI::App* program) {
-    CLI::App* const command =
-        program->add_subcommand("diff", "Tell what changed between two saved reports");
-    const auto files = std::make_shared<std::vector<std::string>>();
-    command->add_option("FILE", *files, "The earlier report of --format json, and the later one")
+    CLI::App* const command = program->add_subcommand(
+        "diff", "Tell what changed between two saved reports, or two visits of a store");
+    const auto options = std::make_shared<Options>();
+    command
+        ->add_option("FILE", options->sides,
+                     "The earlier report of --format json, and the later one; with --store two "
+                     "visits by number, or by time")
         ->required()
         ->expected(2);
+    CLI::Option* const store =
+        command->add_option("--store", options->store, "The store that has the visits")
+            ->type_name("URI");
+    command->add_option("--system", options->system, "Whose visits a time means")
+        ->type_name("NAME")
+        ->needs(store);
     command->footer(
         "Exit status:\n"
         "  0  nothing changed\n"
         "  1  something did\n"
-        "  2  wrong usage, or a report cannot be read\n");
-    return {command, [files] { return Diff(*files); }};
+        "  2  wrong usage, or a report or store cannot be read\n");
+    return {command, [options] { return Diff(*options); }};
 }
 
 }  // namespace ipmisel

@@ -651,4 +651,39 @@ std::size_t Store::Acknowledge(const std::string& key, const std::string& who,
     return rows.size();
 }
 
+std::optional<std::int64_t> Store::VisitAt(const std::string& name, std::int64_t time) {
+    const auto rows = database_->Query(
+        "SELECT MAX(v.id) FROM visits v JOIN systems s ON s.id = v.system"
+        " WHERE s.name = $1 AND v.started <= $2",
+        SqlText(name), time);
+    return rows.empty() ? std::nullopt : MaybeInteger(rows[0].at(0));
+}
+
+std::optional<StoredState> Store::StateAt(std::int64_t visit) {
+    const auto systems = database_->Query("SELECT system FROM visits WHERE id = $1", visit);
+    if (systems.empty()) return std::nullopt;
+    const std::int64_t system = IntegerOf(systems[0].at(0));
+    StoredState state;
+    for (const SqlRow& row : database_->Query(
+             "SELECT kind, slot, manufacturer, product, part_number, serial, version FROM parts"
+             " WHERE system = $1 AND first_visit <= $2"
+             " AND (gone_visit IS NULL OR gone_visit > $2) ORDER BY id",
+             system, visit)) {
+        state.parts.push_back({TextOf(row.at(0)), TextOf(row.at(1)), TextOf(row.at(2)),
+                               TextOf(row.at(3)), TextOf(row.at(4)), TextOf(row.at(5)),
+                               TextOf(row.at(6)), ""});
+    }
+    for (const SqlRow& row :
+         database_->Query("SELECT title, part, severity FROM findings"
+                          " WHERE system = $1 AND first_visit <= $2"
+                          " AND (gone_visit IS NULL OR gone_visit > $2) ORDER BY id",
+                          system, visit)) {
+        StoredFinding& finding = state.findings.emplace_back();
+        finding.title = TextOf(row.at(0));
+        finding.part = TextOf(row.at(1));
+        finding.severity = TextOf(row.at(2));
+    }
+    return state;
+}
+
 }  // namespace ipmisel

@@ -94,6 +94,12 @@ struct StoredVisit {
     std::string problem;
 };
 
+/// What stood in a system at a visit.
+struct StoredState {
+    std::vector<VisitPart> parts;
+    std::vector<StoredFinding> findings;  ///< as they were last
+};
+
 /// Systems, parts, events, findings and visits in a database. Every operation throws Failure.
 class Store {
 public:
@@ -124,6 +130,11 @@ public:
     /// to be looked at, until they come anew: with a further event, or worse. The number of them.
     std::size_t Acknowledge(const std::string& key, const std::string& who, const std::string& note,
                             std::int64_t now);
+
+    /// The number of a system's last visit at a time or before it; empty when there is none.
+    std::optional<std::int64_t> VisitAt(const std::string& name, std::int64_t time);
+    /// What was known when a visit had been stored; empty when there is none of that number.
+    std::optional<StoredState> StateAt(std::int64_t visit);
 
     Database& database() { return *database_; }
 

@@ -84,7 +84,7 @@ protected:
     }
     void NewUri(int number) {
         uri = GetParam() ? PostgresqlServer::Get()->FreshUri()
-                         : "sqlite:" + (folder.path() / (std::to_string(number) + ".db")).string();
+                         : "sqlite:" + databases.path() + "/" + std::to_string(number) + ".db";
     }
 };
 INSTANTIATE_TEST_SUITE_P(, StoreFaults, Values(false, true), StoreName);
@@ -190,7 +190,7 @@ TEST_P(StoreFaults, AnothersBmcIsReadToTheSameUnion) {
         const IpmiSim sim({});
         const std::string place = sim.Place();
         const auto tool = [&](const std::string& command) {
-            const std::string line = "ipmitool -I lanplus -C 3 -o intelplus -H 127.0.0.1 -p " +
+            const std::string line = "ipmitool -I lanplus -C 3 -H 127.0.0.1 -p " +
                                      place.substr(place.find(':') + 1) + " -U root -P secret " +
                                      command + " >/dev/null 2>&1";
             return std::system(line.c_str()) == 0;
@@ -204,8 +204,8 @@ TEST_P(StoreFaults, AnothersBmcIsReadToTheSameUnion) {
             }
             for (std::size_t n = Pick(random, 4); n > 0; --n) {
                 // Platform event: a temperature, its upper critical limit
-                ASSERT_TRUE(tool("raw 0x0a 0x44 0 0 2 0 0 0 0 0x20 0 4 1 0x30 0x59 " +
-                                 std::to_string(Pick(random, 200)) + " 0x45 0"));
+                ASSERT_TRUE(tool("raw 0x0a 0x44 0 0 2 0 0 0 0 0x20 0 4 1 0x30 1 0x59 " +
+                                 std::to_string(Pick(random, 200)) + " 0x45"));
             }
             const std::vector<std::string> access{
                 "collect", "--from",       "lan:" + place, "--user", "root", "--password-file",

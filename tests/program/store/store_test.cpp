@@ -53,7 +53,7 @@ TEST_P(StoreOf, EachThingThatHappensToALogIsSeenToldAndRight) {
     for (const auto& c : cases) {
         SCOPED_TRACE(c.what);
         uri = GetParam() ? PostgresqlServer::Get()->FreshUri()
-                         : "sqlite:" + (folder.path() / (std::string(c.what) + ".db")).string();
+                         : "sqlite:" + databases.path() + "/" + c.what + ".db";
         Controller each;
         for (int i = 0; i < 4; ++i) each.Grow(i % 2 == 0);
         const Result first = Visit(each.Server());
@@ -106,6 +106,29 @@ TEST_P(StoreOf, AnAcknowledgementHoldsUntilTheFindingComesAnew) {
     ASSERT_THAT(open(), SizeIs(1));
     EXPECT_FALSE(open()[0].acknowledged);
     EXPECT_THAT(Column("SELECT note FROM acknowledgements WHERE ended IS NOT NULL"), SizeIs(1));
+}
+
+TEST_P(StoreOf, CheckAndDiffTellWhatTheStoreHas) {
+    bmc.Grow(true);
+    Visit(bmc.Server());
+    const auto told = [&](std::vector<std::string> arguments) {
+        ::testing::internal::CaptureStdout();
+        arguments.insert(arguments.end(), {"--store", uri});
+        const Result result = Run(arguments);
+        return std::pair(result.exitStatus, ::testing::internal::GetCapturedStdout() + result.err);
+    };
+    EXPECT_EQ(told({"check"}).first, 2);
+    EXPECT_EQ(told({"check", "--system", "nobody"}).first, 3);
+    EXPECT_EQ(told({"diff", "1", "1"}), std::pair(0, std::string()));
+    EXPECT_EQ(told({"diff", "1", "9"}).first, 2);
+    Run({"ack", Column("SELECT key FROM events").at(0), "--store", uri});
+    EXPECT_EQ(told({"check"}).first, 0);
+    bmc.Grow(false);
+    Visit(bmc.Server());
+    const auto [status, text] = told({"diff", "1", "2"});
+    EXPECT_EQ(status, 1);
+    EXPECT_THAT(text, AllOf(StartsWith("Problems\n- "), EndsWith(": critical\n")));
+    EXPECT_EQ(told({"diff", "2000-01-01", "2", "--system", "bmc"}).first, 2);
 }
 
 TEST_P(StoreOf, TwoNamesThatClaimOneGuidAreReportedAndKeptApart) {
