@@ -65,7 +65,8 @@ public:
             Write(FactsLine(source, classes));
         }
         if (file_ && !failed_) return;
-        const std::string reason = std::strerror(errno);
+        const std::string reason =
+            errno == EINTR ? "nobody has opened its other end" : std::strerror(errno);
         if (created) unlink(name.c_str());
         throw SourceError("the capture " + name + " cannot be written: " + reason +
                           "; name another file");
@@ -75,7 +76,7 @@ public:
         return !failed_;
     }
     void Write(const std::string& line) {
-        if (std::fputs(line.c_str(), file_.get()) == EOF) failed_ = true;
+        if (!failed_ && std::fputs(line.c_str(), file_.get()) == EOF) failed_ = true;
     }
 
 private:

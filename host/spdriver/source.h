@@ -64,8 +64,8 @@ const std::vector<UnreachableNode>& GetUnreachable();
 void EndPass();
 void CloseMachine();
 
-/// Whether the last command of a plug-in was an optional one that the BMC says it does not know:
-/// what the plug-in logs of it is no warning to whoever reads along.
-bool OptionalCommandRefused();
+/// The number, from 1, of the last command of a plug-in if that was an optional one which the BMC
+/// says it does not know; else 0. What the plug-in logs of it is no warning to whoever reads along.
+unsigned RefusedOptionalCommand();
 
 }  // namespace NQORTQR20

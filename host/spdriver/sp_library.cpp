@@ -61,8 +61,8 @@ ReadingProgress& Observer() {
     return observer;
 }
 
-/// The last answer was that the BMC does not know an optional command.
-bool gOptionalRefused = false;
+unsigned gCommands = 0;
+unsigned gRefusedCommand = 0;  ///< see RefusedOptionalCommand
 
 /// Commands that a BMC may lack without being at fault: the auxiliary log, and what vendors define.
 bool IsOptional(const RequestFrame& request) {
@@ -103,7 +103,7 @@ void EndPass() {
 
 void ObserveReading(ReadingProgress progress) { Observer() = std::move(progress); }
 
-bool OptionalCommandRefused() { return gOptionalRefused; }
+unsigned RefusedOptionalCommand() { return gRefusedCommand; }
 
 NodeCompleteness CompletenessOf(const SPLibrary& library) {
     const auto& tracker = library.impl_->transport;
@@ -172,8 +172,10 @@ bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSi
         fdrWriteLog(ILogger::kError, line.c_str());
         return false;
     }
-    gOptionalRefused = response && !response->empty() &&
-                       response->front() == ipmi::kInvalidCommand && IsOptional(*request);
+    ++gCommands;
+    const bool refused = response && !response->empty() &&
+                         response->front() == ipmi::kInvalidCommand && IsOptional(*request);
+    gRefusedCommand = refused ? gCommands : 0;
     if (!response || response->empty()) return false;
     std::fill(frame.begin(), frame.end(), static_cast<unsigned char>(0));
     const auto fits = std::min(response->size(), frame.size() - kResponseAt);

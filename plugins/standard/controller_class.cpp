@@ -59,7 +59,7 @@ const char* OrderName(ipmi::GuidOrder order) {
 
 void Write(NodePass& pass, Output& output) {
     Node& node = pass.node();
-    output.Begin(kName);
+    if (!output.Begin(kName)) return;
     output.Integer("Node", node.number());
     const auto& system = pass.Smbios().system;
     const GuidReading guid = ReadGuid(node.Guid(), system ? system->uuid : std::nullopt);

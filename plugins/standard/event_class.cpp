@@ -138,7 +138,7 @@ void WriteEvents(NodePass& pass, Output& output) {
     const bool zoneKnown = pass.node().GetClock().utcOffsetMinutes.has_value();
     for (std::size_t i = 0; i < events.size(); ++i) {
         const Event event = events[i];
-        output.Begin(kEventClass.info.name);
+        if (!output.Begin(kEventClass.info.name)) return;
         output.Text("Key", event.key);
         output.Integer("Node", pass.node().number());
         output.Integer("RecordID", event.record.id);

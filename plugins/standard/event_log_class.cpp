@@ -52,7 +52,7 @@ void Write(NodePass& pass, Output& output) {
     Node& node = pass.node();
     const auto& info = node.LogInfo();
     if (!info) return;
-    output.Begin(kName);
+    if (!output.Begin(kName)) return;
     output.Integer("Node", node.number());
     output.Text("Version", ipmisel::Format("%d.%d", info->version & 0x0F, info->version >> 4));
     output.Integer("Records", info->records);

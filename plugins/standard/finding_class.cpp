@@ -31,7 +31,7 @@ constexpr fdrPropertyInfo kProperties[] = {
 void WriteFindings(NodePass& pass, Output& output) {
     const Events& events = pass.GetEvents();
     for (const Finding& finding : pass.Findings()) {
-        output.Begin(kFindingClass.info.name);
+        if (!output.Begin(kFindingClass.info.name)) return;
         output.Integer("Node", pass.node().number());
         output.Text("Severity", ipmi::SeverityName(finding.severity));
         output.Text("State",

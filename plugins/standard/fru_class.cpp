@@ -111,7 +111,7 @@ void WriteModule(const ipmi::MemoryModule& module, Output& output) {
 
 void WriteDevices(NodePass& pass, Output& output) {
     for (const FruDevice& device : pass.FruDevices()) {
-        output.Begin(kFruClass.info.name);
+        if (!output.Begin(kFruClass.info.name)) return;
         output.Integer("Node", pass.node().number());
         output.Integer("DeviceID", device.deviceId);
         if (device.controllerAddress != ipmi::kBmcAddress) {

@@ -4,7 +4,11 @@
 
 namespace standard {
 
-void Output::Begin(const char* className) { Note(NQORTQR20::fdrGetInstance(handle_, className)); }
+bool Output::Begin(const char* className) {
+    const auto status = NQORTQR20::fdrGetInstance(handle_, className);
+    Note(status);
+    return status.code == NQORTQR20::kStatusOk;
+}
 
 void Output::End() { Note(NQORTQR20::fdrAddInstance(handle_)); }
 

@@ -17,7 +17,8 @@ class Output {
 public:
     explicit Output(NQORTQR20::fdriIOHandle* handle) : handle_(handle) {}
 
-    void Begin(const char* className);
+    /// False when the host takes no instance any more; then there is nothing left to write.
+    [[nodiscard]] bool Begin(const char* className);
     void End();
 
     void Text(const char* name, std::string_view value);

@@ -178,7 +178,7 @@ std::vector<std::string> ProblemsOf(const ipmi::SdrRecord& record, const ipmi::S
 void WriteSensor(NodePass& pass, Output& output, const ipmi::SdrRecord& record,
                  const ipmi::Sensor& sensor) {
     Node& node = pass.node();
-    output.Begin(kName);
+    if (!output.Begin(kName)) return;
     output.Integer("Node", node.number());
     WriteRecord(output, sensor);
     const SensorState& state = node.StateOf(sensor);
@@ -200,7 +200,7 @@ void WriteSensor(NodePass& pass, Output& output, const ipmi::SdrRecord& record,
 /// A sensor's record that ends before it says what the sensor is.
 void WriteCutRecord(Output& output, unsigned node, const ipmi::SdrRecord& record) {
     const std::string problem = "the sensor's record ends before the sensor's type";
-    output.Begin(kName);
+    if (!output.Begin(kName)) return;
     output.Integer("Node", node);
     output.Integer("RecordID", record.header.recordId);
     output.Texts("Problems", std::span(&problem, 1));

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <chrono>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
@@ -136,6 +137,19 @@ NQORTQR20::PluginSettings SettingsOf(const CollectOptions& options,
     return settings;
 }
 
+/// Whether a file that the classes' plug-ins need cannot be read any more.
+std::function<bool()> MissingFiles(const std::shared_ptr<NQORTQR20::PluginSet>& plugins,
+                                   const std::vector<std::string>& wanted) {
+    return [plugins = std::weak_ptr(plugins), wanted] {
+        try {
+            if (const auto held = plugins.lock()) held->CheckNeededFiles(wanted);
+            return false;
+        } catch (const NQORTQR20::PluginError&) {
+            return true;
+        }
+    };
+}
+
 /// Notices that the plug-in had for whoever runs the collection, said and kept.
 std::vector<std::string> TellNotices() {
     std::vector<std::string> texts;
@@ -225,10 +239,10 @@ std::vector<std::string> With(std::vector<std::string> classes,
     return classes;
 }
 
-Outcome CollectTo(const CollectOptions& options, ReportOutput& output) {
+Outcome CollectTo(const CollectOptions& options, LogLines& log, ReportOutput& output) {
     const auto begin = std::chrono::steady_clock::now();
     // The plug-ins first: without them nobody is asked for a password.
-    const std::unique_ptr<NQORTQR20::PluginSet> plugins = LoadPlugins(options.plugins);
+    const std::shared_ptr<NQORTQR20::PluginSet> plugins = LoadPlugins(options.plugins);
     const auto ofFormat = FindFormat(options.report.format)->classes;
     std::vector<std::string> wanted = ClassesToCollect(options.report.classes, ofFormat, *plugins);
     NQORTQR20::PluginSettings settings = SettingsOf(options, *plugins);
@@ -240,6 +254,7 @@ Outcome CollectTo(const CollectOptions& options, ReportOutput& output) {
                                       " is of the whole log; leave out --new, or give another");
     }
     if (options.store) store.emplace(*options.store, options.onlyNew);
+    log.SetFileCheck(MissingFiles(plugins, wanted));
     NQORTQR20::Source source = OpenFor(store ? &*store : nullptr, options);
     // A capture answers what was asked for when it was made, if the format can be made of that.
     const bool suffices = std::all_of(ofFormat.begin(), ofFormat.end(), [&](std::string_view name) {
@@ -356,13 +371,13 @@ Outcome CollectOutcome(const CollectOptions& options) {
     const StopSignals signals;
     if (options.deadlineSeconds) {
         using Clock = std::chrono::steady_clock;
-        NQORTQR20::StopAt(Clock::now() +
-                          std::chrono::duration_cast<Clock::duration>(
-                              std::chrono::duration<double>(*options.deadlineSeconds)));
+        StopSignals::StopAt(Clock::now() +
+                            std::chrono::duration_cast<Clock::duration>(
+                                std::chrono::duration<double>(*options.deadlineSeconds)));
     }
     LogLines log(options.log);
     ReportOutput output(options.report);
-    Outcome outcome = CollectTo(options, output);
+    Outcome outcome = CollectTo(options, log, output);
     log.Finish();
     return outcome;
 }

@@ -4,13 +4,15 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <cstring>
 #include <iterator>
+#include <utility>
 
 #include "host/spdriver/source.h"
 #include "program/commands/arguments.h"
 #include "program/commands/failure.h"
+#include "program/commands/stop_signals.h"
 #include "program/reports/json_text.h"
+#include "program/reports/report_sink.h"
 #include "program/reports/terminal_text.h"
 
 namespace ipmisel {
@@ -26,27 +28,41 @@ void WriteToTerminal(ILogger::ETQRLogSeverity severity, std::string_view text) {
     Say(std::string(kSeverityNames[known]) + ": " + std::string(text));
 }
 
-/// Which severity a line has for whoever reads along. What a plug-in warns of after a BMC did not
-/// know an optional command, a line and the status line after it, is a notice.
+/// Which severity a line has for whoever reads along. Notices are what a plug-in warns of
+/// - after a BMC did not know an optional command: a line and the status line after it;
+/// - while a file that it needs cannot be read, as for every text of every record: all but the
+/// first;
+/// - once the collection is over and every instance that it still makes is refused.
 class TerminalRule {
 public:
+    explicit TerminalRule(const std::function<bool()>& filesMissing)
+        : filesMissing_(filesMissing) {}
+
     ILogger::ETQRLogSeverity SeverityOf(ILogger::ETQRLogSeverity severity) {
-        if (!NQORTQR20::OptionalCommandRefused()) {
-            lines_ = 0;
-        } else if (severity == ILogger::kWarning && lines_ < kLines) {
-            ++lines_;
+        if (severity > ILogger::kWarning) return severity;
+        if (severity == ILogger::kWarning && (IsOfRefusal() || OutputIsOver())) {
             return ILogger::kNotice;
         }
-        return severity;
+        if (!filesMissing_ || !filesMissing_()) return severity;
+        return std::exchange(missingTold_, true) ? ILogger::kNotice : severity;
     }
 
 private:
+    bool IsOfRefusal() {
+        const unsigned refused = NQORTQR20::RefusedOptionalCommand();
+        if (std::exchange(command_, refused) != refused) lines_ = 0;
+        return refused != 0 && lines_++ < kLines;
+    }
+
     static constexpr int kLines = 2;
-    int lines_ = 0;
+    unsigned command_ = 0;  ///< that was refused
+    int lines_ = 0;         ///< of it
+    const std::function<bool()>& filesMissing_;
+    bool missingTold_ = false;
 };
 
 [[noreturn]] void Fail(const std::string& name, int error) {
-    throw Failure(kExitUsage, "cannot write the log to " + name + ": " + std::strerror(error) +
+    throw Failure(kExitUsage, "cannot write the log to " + name + ": " + ProblemText(error) +
                                   "; name another file with --log-file");
 }
 
@@ -87,7 +103,7 @@ LogLines::LogLines(const LogOptions& options) : name_(options.file.value_or(""))
             });
     }
     toTerminal_ = NQORTQR20::AddLogConsumer(
-        options.level, [level = options.level, shown = TerminalRule()](
+        options.level, [level = options.level, shown = TerminalRule(filesMissing_)](
                            ILogger::ETQRLogSeverity severity, std::string_view text) mutable {
             if (shown.SeverityOf(severity) <= level) WriteToTerminal(severity, text);
         });
@@ -101,15 +117,15 @@ LogLines::~LogLines() {
 void LogLines::WriteToFile(ILogger::ETQRLogSeverity severity, std::string_view text) {
     const std::string line = "{\"severity\": " + std::to_string(static_cast<int>(severity)) +
                              ", \"text\": " + JsonText(text) + "}\n";
-    std::fwrite(line.data(), 1, line.size(), file_.get());
+    if (writeError_ == 0 && std::fwrite(line.data(), 1, line.size(), file_.get()) != line.size()) {
+        writeError_ = errno;
+    }
 }
 
 void LogLines::Finish() {
     if (!file_) return;
-    errno = 0;
-    if (std::fflush(file_.get()) != 0 || std::ferror(file_.get()) != 0) {
-        Fail(name_, errno != 0 ? errno : EIO);
-    }
+    if (writeError_ == 0 && std::fflush(file_.get()) != 0) writeError_ = errno;
+    if (writeError_ != 0) Fail(name_, writeError_);
 }
 
 }  // namespace ipmisel

@@ -2,10 +2,12 @@
 
 #include <CLI/CLI.hpp>
 #include <cstdio>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 
 #include "host/core/host.h"
 #include "tqr/log.h"
@@ -31,6 +33,10 @@ public:
     LogLines(const LogLines&) = delete;
     LogLines& operator=(const LogLines&) = delete;
 
+    /// How to find out that a file which a plug-in needs cannot be read any more.
+    void SetFileCheck(std::function<bool()> filesMissing) {
+        filesMissing_ = std::move(filesMissing);
+    }
     /// Everything is in the file. Throws Failure.
     void Finish();
 
@@ -41,8 +47,10 @@ private:
 
     void WriteToFile(NQORTQR20::ILogger::ETQRLogSeverity severity, std::string_view text);
 
+    std::function<bool()> filesMissing_;
     std::string name_;
     std::unique_ptr<std::FILE, Close> file_;
+    int writeError_ = 0;  ///< of the file; nothing more is written to it
     int toTerminal_ = 0;
     std::optional<int> toFile_;
 };

@@ -8,14 +8,17 @@
 #include <algorithm>
 #include <cerrno>
 #include <charconv>
+#include <chrono>
 #include <csignal>
 #include <cstdlib>
-#include <cstring>
+#include <ctime>
 #include <iterator>
 #include <string_view>
 
 #include "base/hex.h"
+#include "host/spdriver/stop.h"
 #include "program/commands/failure.h"
+#include "program/commands/stop_signals.h"
 
 namespace ipmisel {
 namespace {
@@ -53,16 +56,16 @@ std::string PathOf(const std::string& name) {
 }
 
 std::string FromFile(const std::string& name, const std::string& what) {
-    const auto refuse = [&name, &what](const char* why) {
+    const auto refuse = [&name, &what](const std::string& why) {
         Refuse("cannot read a " + what + " from " + name + ": " + why + "; name a file with the " +
                what + " in its first line");
     };
     const Descriptor file(open(PathOf(name).c_str(), O_RDONLY | O_CLOEXEC));
-    if (file.get() < 0) refuse(std::strerror(errno));
+    if (file.get() < 0) refuse(ProblemText(errno));
     std::string line;
     for (char c = 0;;) {
         const ssize_t count = read(file.get(), &c, 1);
-        if (count < 0) refuse(std::strerror(errno));
+        if (count < 0) refuse(ProblemText(errno));
         if (count == 0 || c == '\n') {
             if (count == 0 && line.empty()) refuse("it is empty");
             break;
@@ -109,10 +112,19 @@ public:
     QuietTerminal(const QuietTerminal&) = delete;
     QuietTerminal& operator=(const QuietTerminal&) = delete;
 
-    /// False when a signal came instead of input.
+    /// False when a signal or the deadline came instead of input.
     bool Wait() const {
         pollfd input{terminal_, POLLIN, 0};
-        return ppoll(&input, 1, nullptr, &mask_) >= 0;
+        const auto end = NQORTQR20::StopTime();
+        if (end == std::chrono::steady_clock::time_point::max()) {
+            return ppoll(&input, 1, nullptr, &mask_) > 0;
+        }
+        const auto rest = std::max(
+            std::chrono::ceil<std::chrono::milliseconds>(end - std::chrono::steady_clock::now()),
+            std::chrono::milliseconds(0));
+        const timespec wait{static_cast<time_t>(rest.count() / 1000),
+                            static_cast<long>(rest.count() % 1000 * 1'000'000)};
+        return ppoll(&input, 1, &wait, &mask_) > 0;
     }
 
 private:
@@ -150,6 +162,9 @@ std::string FromTerminal() {
             "FILE or set IPMISEL_PASSWORD");
     }
     const std::optional<std::string> password = Prompt(terminal.get());
+    if (!password && NQORTQR20::Stopped() != NQORTQR20::StopReason::kNone) {
+        Refuse("the deadline has passed at the prompt; type sooner, or give --password-file FILE");
+    }
     if (!password) Refuse("no password was typed; type one and Enter, or give --password-file");
     return *password;
 }

@@ -7,6 +7,7 @@
 
 #include "program/commands/arguments.h"
 #include "program/commands/failure.h"
+#include "program/commands/stop_signals.h"
 #include "program/reports/event_filter.h"
 #include "program/reports/severity.h"
 #include "program/reports/terminal_text.h"
@@ -21,7 +22,7 @@ public:
         : report_(std::move(report)), pager_(pager) {}
     void Add(const NQORTQR20::Instance& instance) override { report_->Add(instance); }
     void Finish(const ReportEnd& end) override {
-        pager_.Start();
+        if (pager_.Start()) StopSignals::LeaveTime();
         report_->Finish(end);
     }
 

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <csignal>
 #include <string>
 
@@ -7,7 +8,8 @@ namespace ipmisel {
 
 /// Takes over SIGINT, SIGTERM and SIGHUP while it lives. Between BeginCollecting and
 /// EndCollecting the first of them ends the collection early but in order; any other ends the
-/// program, after the unfinished output file is gone.
+/// program, after the unfinished output file is gone. Soon after a collection was to stop, calls
+/// that are still blocked, as in a pipe that nobody reads, return with EINTR.
 class StopSignals {
 public:
     StopSignals();
@@ -17,7 +19,14 @@ public:
 
     static void BeginCollecting();
     static void EndCollecting();
+    /// As NQORTQR20::StopAt.
+    static void StopAt(std::chrono::steady_clock::time_point deadline);
+    /// No call is interrupted any more: somebody reads the report as slowly as he likes.
+    static void LeaveTime();
 };
+
+/// What an error number of a file means, that of an interrupted call included.
+std::string ProblemText(int error);
 
 /// Holds the same signals back while it lives.
 class SignalsHeld {

@@ -9,13 +9,13 @@
 #include <csignal>
 #include <cstdint>
 #include <cstdio>
-#include <cstring>
 #include <filesystem>
 #include <system_error>
 
 #include "base/text.h"
 #include "program/commands/failure.h"
 #include "program/commands/stop_signals.h"
+#include "program/reports/report_sink.h"
 
 namespace ipmisel {
 namespace {
@@ -123,7 +123,7 @@ void OutputFile::Flush() {
         const ssize_t written = write(file_, rest.data(), rest.size());
         if (written >= 0) {
             rest.remove_prefix(static_cast<std::size_t>(written));
-        } else if (errno != EINTR) {
+        } else if (errno != EINTR || OutputIsOver()) {
             buffer_.clear();
             Fail(errno);
         }
@@ -150,11 +150,10 @@ void OutputFile::Fail(int error) const {
         std::raise(SIGPIPE);
     }
     if (name_.empty()) {
-        throw Failure(kExitUsage, std::string("cannot write to standard output: ") +
-                                      std::strerror(error) +
+        throw Failure(kExitUsage, "cannot write to standard output: " + ProblemText(error) +
                                       "; send it elsewhere or use --output FILE");
     }
-    throw Failure(kExitUsage, "cannot write " + name_ + ": " + std::strerror(error) +
+    throw Failure(kExitUsage, "cannot write " + name_ + ": " + ProblemText(error) +
                                   "; name another file with --output");
 }
 

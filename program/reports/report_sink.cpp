@@ -39,12 +39,16 @@ void ReportSink::Check() const {
 }
 
 bool OutputIsOver() {
-    constexpr auto kTimeToExport = std::chrono::milliseconds(800);
+    constexpr auto kTimeToExport = std::chrono::milliseconds(500);
     return NQORTQR20::StoppedFor(kTimeToExport);
 }
 
+bool ReportSink::OpenInstance(std::string_view className) {
+    return !IsOver() && WholeInstanceSink::OpenInstance(className);
+}
+
 bool ReportSink::Take(const NQORTQR20::Instance& instance) {
-    if (failure_ || OutputIsOver()) return false;
+    if (IsOver()) return false;
     try {
         report_.Add(instance);
     } catch (const Failure& failure) {

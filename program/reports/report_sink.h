@@ -5,6 +5,7 @@
 #include <map>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "host/core/plugin_set.h"
@@ -30,10 +31,15 @@ public:
     /// Throws what has kept the report from being written. No exception goes through the plug-in.
     void Check() const;
 
+    /// False as soon as nothing is taken any more: what would be refused whole need not be made.
+    bool OpenInstance(std::string_view className) override;
+
 protected:
     bool Take(const NQORTQR20::Instance& instance) override;
 
 private:
+    bool IsOver() const { return failure_ || OutputIsOver(); }
+
     /// A class with one instance for each log record.
     struct Counted {
         std::string nodeProperty;

@@ -50,14 +50,14 @@ ReportLook LookOfOutput(std::string_view colour, bool toFile) {
     return look;
 }
 
-void Pager::Start() {
-    if (process_ >= 0 || isatty(STDOUT_FILENO) != 1 || IsDumb()) return;
+bool Pager::Start() {
+    if (process_ >= 0 || isatty(STDOUT_FILENO) != 1 || IsDumb()) return process_ > 0;
     std::string pager = Environment("IPMISEL_PAGER");
     if (pager.empty()) pager = Environment("PAGER");
     if (pager.empty()) pager = "less";
-    if (pager == "cat") return;
+    if (pager == "cat") return false;
     int ends[2];
-    if (pipe2(ends, O_CLOEXEC) != 0) return;
+    if (pipe2(ends, O_CLOEXEC) != 0) return false;
     // Through the shell, since PAGER may have arguments; without the pager the text goes on as it
     // is.
     const std::string command = pager + " || cat";
@@ -72,6 +72,7 @@ void Pager::Start() {
     if (process_ > 0) dup2(ends[1], STDOUT_FILENO);
     close(ends[0]);
     close(ends[1]);
+    return process_ > 0;
 }
 
 void Pager::Wait() {

@@ -20,7 +20,7 @@ public:
     Pager(const Pager&) = delete;
     Pager& operator=(const Pager&) = delete;
     /// From here on what is written to standard output goes through the pager.
-    void Start();
+    bool Start();
     /// Ends the pager's input and waits until it has been read. Nothing may be written any more.
     void Wait();
 

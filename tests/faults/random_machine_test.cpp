@@ -3,7 +3,6 @@
 // report is partial. IPMISEL_SEEDS=COUNT or IPMISEL_SEEDS=FIRST-LAST runs others than the first
 // 400.
 
-#include <cstdlib>
 #include <random>
 #include <set>
 
@@ -12,6 +11,7 @@
 #include "host/spdriver/serial_pipeline.h"
 #include "tests/support/fru_inventory.h"
 #include "tests/support/machine_fixture.h"
+#include "tests/support/seeds.h"
 
 namespace ipmiseltest {
 namespace {
@@ -123,16 +123,7 @@ protected:
 };
 
 TEST_F(RandomMachine, EveryRecordThatWasAnsweredIsInTheReportOrTheReportIsPartial) {
-    unsigned first = 1;
-    unsigned last = 400;
-    if (const char* const seeds = std::getenv("IPMISEL_SEEDS")) {
-        char* rest = nullptr;
-        last = static_cast<unsigned>(std::strtoul(seeds, &rest, 10));
-        if (*rest == '-') {
-            first = last;
-            last = static_cast<unsigned>(std::strtoul(rest + 1, nullptr, 10));
-        }
-    }
+    const auto [first, last] = Seeds(400);
     for (unsigned seed = first; seed <= last; ++seed) {
         Run(seed, false);
         Run(seed, true);

@@ -196,6 +196,49 @@ TEST_F(Collecting, TheLogFileHoldsEveryLineAndTheTerminalWhatWasAskedFor) {
                 HasSubstr("ipmisel: info: Getting IPMI SEL data.\n"));
 }
 
+TEST_F(Collecting, WhatABmcMayLackIsNoWarningOnTheTerminal) {
+    Json server = Server();
+    for (const std::size_t nodes : {1U, 2U}) {
+        while (server["bmcs"].size() < nodes) server["bmcs"].push_back(server["bmcs"][0]);
+        const auto collect = [&](const char* level) {
+            return Collect(Write(server),
+                           {"--class", "QORSG_IPMILogRecord", "--class", "QORSG_ZMCAuxDebugRecord",
+                            "--log-level", level, "--log-file", InPlace("log")});
+        };
+        EXPECT_EQ(collect("warning").err, "") << nodes;
+        std::size_t warnings = 0;
+        for (const std::string& line : Lines(ReadText(InPlace("log")))) {
+            warnings += Json::parse(line)["severity"] == 1 ? 1U : 0U;
+        }
+        EXPECT_EQ(warnings, 3 * nodes);  // no auxiliary log, twice, and what that class makes of it
+        EXPECT_THAT(Lines(collect("notice").err),
+                    Contains(StartsWith("ipmisel: warning: ")).Times(3 * static_cast<int>(nodes)));
+    }
+}
+
+TEST_F(Collecting, TextsThatAreGoneInMidRunAreWarnedOfOnceAndLoggedEachTime) {
+    namespace fs = std::filesystem;
+    const fs::path program = IPMISEL_PROGRAM;
+    fs::create_directories(folder.path() / "bin");
+    fs::create_directories(folder.path() / "lib");
+    fs::copy(program, folder.path() / "bin/ipmisel");
+    fs::copy(program.parent_path().parent_path() / "lib/ipmisel", folder.path() / "lib/ipmisel");
+    Json server = Server(30);
+    server["bmcs"][0]["latency_us"] = 50000;
+    RunningProgram running(
+        folder.path().string(),
+        {(folder.path() / "bin/ipmisel").string(), "collect", "--from", Write(server), "--class",
+         "QORSG_IPMILogRecord", "--log-file", InPlace("log"), "--output", InPlace("report")},
+        setting);
+    ASSERT_TRUE(Eventually([&] { return ReadText(InPlace("log")).size() > 4000; }));
+    fs::remove(folder.path() / "lib/ipmisel/ipmisel.INI");
+    const Ended ended = running.Wait();
+    EXPECT_EQ(ended.exitStatus, 0) << ended.err;
+    EXPECT_THAT(Lines(ended.err), ElementsAre(HasSubstr("ipmisel.INI. Did not obtain string #")));
+    EXPECT_THAT(Lines(ReadText(InPlace("log"))),
+                Contains(HasSubstr("ipmisel.INI. Did not obtain string #")).Times(Ge(30)));
+}
+
 TEST_F(Collecting, ANoticeIsToldAndKept) {
     Json server = Server();
     server["ipmi_driver"] = false;
@@ -311,6 +354,44 @@ TEST_F(Slow, ASecondSignalEndsItAtOnceAndLeavesNothing) {
     program.Signal(SIGTERM);
     EXPECT_EQ(program.Wait().signal, SIGTERM);
     EXPECT_THAT(Left(), IsEmpty());
+}
+
+TEST_F(Collecting, DeadSourcesBesideALivingOneAreNamedAndItIsExitStatusFour) {
+#ifndef IPMISEL_LAN
+    GTEST_SKIP() << "built without access over the network";
+#endif
+    if (!IpmiSim::Missing().empty()) GTEST_SKIP() << IpmiSim::Missing();
+    const IpmiSim sim({});
+    setting.environment["IPMISEL_PASSWORD"] = "secret";
+    const std::string living = "lan:" + sim.Place();
+    const std::vector<std::string> dead{"lan:127.0.0.1:1", "lan:127.0.0.1:2"};
+    const Ended ended =
+        Collect(dead[0], {"--from", living, "--from", dead[1], "--user", "root", "--workaround",
+                          "opensesspriv", "--format", "json", "--timeout", "2"});
+    EXPECT_EQ(ended.exitStatus, 4);
+    EXPECT_THAT(ended.err, AllOf(HasSubstr("ipmisel: " + dead[0] + ": "),
+                                 HasSubstr("ipmisel: " + dead[1] + ": "),
+                                 HasSubstr(dead[1] + " could not be opened")));
+    const Json report = Json::parse(ended.out);
+    EXPECT_EQ(report["complete"], false);
+    const Json& completeness = report["completeness"];
+    ASSERT_EQ(completeness.size(), 3U);
+    EXPECT_EQ(completeness[0]["source"], living);
+    EXPECT_EQ(completeness[0]["node"], 1);
+    for (std::size_t i = 0; i < dead.size(); ++i) {
+        EXPECT_EQ(completeness[i + 1]["source"], dead[i]);
+        EXPECT_FALSE(completeness[i + 1].contains("node"));
+    }
+    // Out of descriptors: the line says so.
+    const Ended without =
+        RunningProgram(folder.path().string(),
+                       {"/bin/sh", "-c", "ulimit -n 6; exec \"$@\"", "sh", IPMISEL_PROGRAM,
+                        "collect", "--from", dead[0], "--from", dead[1], "--from",
+                        "lan:127.0.0.1:3", "--from", "lan:127.0.0.1:4", "--timeout", "2"},
+                       setting)
+            .Wait();
+    EXPECT_EQ(without.exitStatus, 3);
+    EXPECT_THAT(without.err, MatchesRegex("ipmisel: [^\n]*no file descriptor is left[^\n]*\n"));
 }
 
 TEST_F(Collecting, ThePasswordComesFromAFileOrIsAskedForUnseen) {
