@@ -79,7 +79,10 @@ void Check(bool good, const char* what) {
 
 struct Hmac::Context {
     EVP_MAC_CTX* handle = nullptr;
-    ~Context() { Library::Get().EVP_MAC_CTX_free(handle); }
+    ~Context() {
+        // Without the library there is none, and no exception may leave.
+        if (handle != nullptr) Library::Get().EVP_MAC_CTX_free(handle);
+    }
 };
 
 Hmac::Hmac(Digest digest)
@@ -136,7 +139,9 @@ struct AesCbc::Context {
         if (!good) crypto.EVP_CIPHER_CTX_free(handle);
         Check(good, "AES");
     }
-    ~Context() { Library::Get().EVP_CIPHER_CTX_free(handle); }
+    ~Context() {
+        if (handle != nullptr) Library::Get().EVP_CIPHER_CTX_free(handle);
+    }
     Context(const Context&) = delete;
     Context& operator=(const Context&) = delete;
 
