@@ -1,6 +1,8 @@
 """One repository, read by ipmisel, ipmitool and ipmi-sensors: names, units, readings, thresholds.
 
 usage: peers_sensors_test.py PROGRAM SOURCE_FOLDER    (exit status 77: a facility is missing)
+
+With IPMISEL_REAL_MACHINES the repositories of real machines are compared as well.
 """
 import csv
 import json
@@ -100,7 +102,7 @@ class SideBySide(unittest.TestCase):
                 run("ipmi-sensors", "-D", "LAN_2_0", "-I", "3", "-h", f"127.0.0.1:{port}", "-u",
                     "root", "-p", "secret", "-W", "opensesspriv", "--comma-separated-output",
                     "--no-header-output", "--output-sensor-thresholds", "--quiet-cache",
-                    "--non-abbreviated-units").splitlines()))
+                    "--sdr-cache-directory", folder, "--non-abbreviated-units").splitlines()))
 
     def test_every_sensor_is_told_of_by_all(self):
         count = len(ANALOG) + len(NAMES)
@@ -131,6 +133,114 @@ class SideBySide(unittest.TestCase):
                         self.assertIsNotNone(peer)
                         self.assertAlmostEqual(mine, peer,
                                                delta=max(PLACES, abs(mine) * 1e-5))
+
+
+def simulated_sensors(records: list[bytes]) -> dict:
+    """Readings, states and thresholds for every sensor of a repository, each another."""
+    sensors = {}
+    for record in records:
+        if record[3] not in (1, 2):
+            continue
+        for place in range(max(1, record[23] & 15) if record[3] == 2 else 1):
+            number = record[7] + place & 255
+            state = 1 << number % (6 if record[12] == 1 else 15)
+            sensors[f"{record[5]:02x}/{record[6] & 3}/{number:02x}"] = {
+                "reading": f"{number * 37 + 11 & 255:02x}",
+                "states": f"c0 {state & 255:02x} {0x80 | state >> 8:02x}",
+                "thresholds": "3f 10 08 04 c8 d2 dc"}
+    return sensors
+
+
+@unittest.skipUnless(os.environ.get("IPMISEL_REAL_MACHINES"),
+                     "no IPMISEL_REAL_MACHINES: the repositories of real machines are not compared")
+class RealMachines(unittest.TestCase):
+    """No other program says of a sensor what we do not. What they say more is not the sensor's:
+
+    - ipmi-sensors and ipmitool ask the BMC for the number of another controller's sensor;
+    - ipmitool asks for thresholds where the record says that there are none;
+    - ipmi-sensors gives a state to "state asserted" and "entity absent", which the standard leaves
+      open; ipmitool has one name for all sensors that share a record.
+    """
+    def machine(self, path: pathlib.Path, folder: str):
+        server = json.loads(path.read_text())
+        for bmc in server["bmcs"]:
+            bmc["sensors"] = simulated_sensors([bytes.fromhex(one) for one in bmc["sdr"]["records"]])
+        file = pathlib.Path(folder) / "server.json"
+        file.write_text(json.dumps(server))
+        environment = dict(os.environ, IPMISEL_PASSWORD="secret", HOME=folder, TZ="UTC")
+
+        def run(*command: str) -> str:
+            return subprocess.run(["timeout", "120", *command], capture_output=True, check=False,
+                                  text=True, errors="replace", env=environment).stdout
+        with subprocess.Popen([PROGRAM.parent / "ipmisel-simulator", "--server", file, "--port", "0",
+                               "--cipher-suite", "3"], stdout=subprocess.PIPE,
+                              text=True) as simulator:
+            try:
+                port = simulator.stdout.readline().strip().rpartition(":")[2]
+                free = list(csv.reader(run(
+                    "ipmi-sensors", "-D", "LAN_2_0", "-I", "3", "-h", f"127.0.0.1:{port}", "-u",
+                    "root", "-p", "secret", "--comma-separated-output", "--no-header-output",
+                    "--output-sensor-thresholds", "--output-sensor-state", "--quiet-cache",
+                    "--sdr-cache-directory", folder, "--shared-sensors",
+                    "--non-abbreviated-units").splitlines()))
+                tool = [[cell.strip() for cell in line.split("|")] for line in run(
+                    "ipmitool", "-I", "lanplus", "-C", "3", "-H", "127.0.0.1", "-p", port, "-U",
+                    "root", "-P", "secret", "sensor").splitlines()]
+            finally:
+                simulator.terminate()
+        ours = [one["properties"] for one in json.loads(run(
+            str(PROGRAM), "collect", "--from", f"sim:{file}", "--format", "json", "--class",
+            "IPMI_Sensor"))["instances"]]
+        return ours, free, tool
+
+    def values(self, mine: dict, names: list[str], cells: list[str]):
+        """Each number that another has is ours; ours alone is no fault."""
+        for name, cell in zip(names, cells):
+            value = number(cell)
+            if value is not None:
+                self.assertIn(name, mine)
+                self.assertAlmostEqual(mine[name], value,
+                                       delta=max(PLACES, abs(mine[name]) * 1e-5))
+
+    def test_no_other_program_says_more(self):
+        upward = ["Reading", "LowerNonRecoverable", "LowerCritical", "LowerNonCritical", *LIMITS[3:]]
+        compared = 0
+        for path in sorted(pathlib.Path(os.environ["IPMISEL_REAL_MACHINES"]).glob("*.json")):
+            with tempfile.TemporaryDirectory() as folder:
+                ours, free, tool = self.machine(path, folder)
+            rows = {}
+            for one in ours:
+                rows.setdefault(one["RecordID"], []).append(one)
+            for row in free:
+                self.assertIn(int(row[0]), rows, path.name)
+                mine = rows[int(row[0])].pop(0)
+                if mine["OwnerAddress"] != 0x20:
+                    continue
+                with self.subTest(machine=path.name, ours=mine, theirs=row):
+                    self.assertEqual(mine["Name"].split(), row[1].split())
+                    self.assertTrue(row[2] == "N/A" or mine.get("Type"))
+                    self.values(mine, upward, [row[4], *row[6:12]])
+                    if number(row[4]) is not None and row[5] not in ("unspecified", "%"):
+                        self.assertTrue(mine["Unit"].lower().startswith(row[5].lower()))
+                    left_open = {"state asserted", "state deasserted", "absent"}
+                    if row[3] != "N/A" and row[12] != "'reserved'" and not (
+                            left_open & set(mine.get("States", []))):
+                        self.assertIn("Status", mine)
+                    if row[12] not in ("N/A", "'OK'"):
+                        self.assertIn("States", mine)
+                compared += 1
+            named = {}
+            for one in ours:
+                named.setdefault(one["Name"], []).append(one)
+            for row in tool:
+                if row[2] == "discrete" or len(named.get(row[0], [])) != 1:
+                    continue
+                mine = named[row[0]][0]
+                with self.subTest(machine=path.name, ours=mine, theirs=row):
+                    limits = row[4:10] if any(limit in mine for limit in LIMITS) else []
+                    self.values(mine, upward, [row[1], *limits])
+                compared += 1
+        self.assertGreater(compared, 1500)
 
 
 if __name__ == "__main__":
