@@ -299,7 +299,7 @@ class Fleet(unittest.TestCase):
                 source.write_text(json.dumps(server))
                 lists.write_text(one.names[0] + "  # as before\n")
                 run.send_signal(signal.SIGHUP)
-                told = [notify.recv(999).split(b"\n")[0] for _ in range(30)]
+                told = [notify.recv(999).split(b"\n")[0] for _ in range(36)]
                 self.assertEqual(told[0], b"WATCHDOG=1")
                 self.assertIn(b"RELOADING=1", told)
                 self.assertIn(b"READY=1", told)
