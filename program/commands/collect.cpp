@@ -239,6 +239,17 @@ std::vector<std::string> With(std::vector<std::string> classes,
     return classes;
 }
 
+/// A report of the state of all would say of what is known that nothing is wrong.
+void RefuseNewOfAll(const CollectOptions& options) {
+    const std::string& format = options.report.format;
+    const bool isOfAll =
+        FindFormat(format)->forPeople || format == "prometheus" || format == "redfish";
+    if (!options.onlyNew || !isOfAll) return;
+    throw Failure(kExitUsage, "--format " + format +
+                                  " tells the state of all; leave out --new, or give another "
+                                  "format such as events");
+}
+
 Outcome CollectTo(const CollectOptions& options, LogLines& log, ReportOutput& output) {
     const auto begin = std::chrono::steady_clock::now();
     // The plug-ins first: without them nobody is asked for a password.
@@ -247,12 +258,6 @@ Outcome CollectTo(const CollectOptions& options, LogLines& log, ReportOutput& ou
     std::vector<std::string> wanted = ClassesToCollect(options.report.classes, ofFormat, *plugins);
     NQORTQR20::PluginSettings settings = SettingsOf(options, *plugins);
     std::optional<StoredCollection> store;
-    const bool ofWholeLog =
-        options.report.format == "prometheus" || options.report.format == "redfish";
-    if (options.onlyNew && ofWholeLog) {
-        throw Failure(kExitUsage, "--format " + options.report.format +
-                                      " is of the whole log; leave out --new, or give another");
-    }
     if (options.store) store.emplace(*options.store, options.onlyNew);
     log.SetFileCheck(MissingFiles(plugins, wanted));
     NQORTQR20::Source source = OpenFor(store ? &*store : nullptr, options);
@@ -439,6 +444,7 @@ Command AddCollectCommand(CLI::App* program) {
     AddStoreOptions(command, options.get());
     command->footer(FormatHelp() + WorkaroundHelp() + kExitStatusHelp);
     return {command, [options, hosts] {
+                RefuseNewOfAll(*options);
                 return hosts->lists.empty() ? Collect(*options) : CollectHosts(*options, *hosts);
             }};
 }
