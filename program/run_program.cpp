@@ -30,9 +30,8 @@ namespace {
 
 /// In the order of the help.
 constexpr Command (*kCommands[])(CLI::App* program) = {
-    AddCollectCommand, AddReportCommand, AddDiffCommand,    AddCheckCommand,
-    AddWatchCommand,   AddAckCommand,    AddDoctorCommand,  AddClassesCommand,
-    AddWorkerCommand};
+    AddCollectCommand, AddReportCommand, AddDiffCommand,    AddCheckCommand, AddWatchCommand,
+    AddAckCommand,     AddDoctorCommand, AddClassesCommand, AddWorkerCommand};
 
 /// Letters to put in, take out or change to make one word the other.
 std::size_t Distance(std::string_view a, std::string_view b) {

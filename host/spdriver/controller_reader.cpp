@@ -91,8 +91,8 @@ bool HoldsRecord(const std::optional<Response>& response, const ipmi::SelBytes& 
 /// Each record names the one that follows by its ID, and the last one none.
 bool IsChain(const RecordStore& records) {
     for (std::size_t i = 0; i < records.size(); ++i) {
-        const std::uint16_t next = i + 1 < records.size() ? IdOf(records.At(i + 1).bytes)
-                                                          : ipmi::kLastRecordId;
+        const std::uint16_t next =
+            i + 1 < records.size() ? IdOf(records.At(i + 1).bytes) : ipmi::kLastRecordId;
         if (records.At(i).next != next) return false;
     }
     return true;
@@ -181,8 +181,8 @@ void ControllerReader::Compare() {
         return;
     }
     const std::size_t records = now->records;
-    const std::uint16_t next = known_->log.empty() ? ipmi::kLastRecordId
-                                                   : IdOf(std::span(*lastKnown_).subspan(1));
+    const std::uint16_t next =
+        known_->log.empty() ? ipmi::kLastRecordId : IdOf(std::span(*lastKnown_).subspan(1));
     if (records == known_->log.size() && now->lastAddition == before->lastAddition &&
         now->overflow == before->overflow && next == ipmi::kLastRecordId) {
         joined_ = std::make_unique<RecordStore>();

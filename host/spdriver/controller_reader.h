@@ -78,12 +78,12 @@ private:
     std::optional<Response> infoAgain_;
     std::optional<KnownController> known_;
     LogChange change_ = LogChange::kNotKnown;
-    unsigned comparing_ = 0;  ///< answers to come
+    unsigned comparing_ = 0;                     ///< answers to come
     std::optional<Response> lastKnown_, first_;  ///< records as they stand now, with the next ID
-    std::unique_ptr<RecordStore> joined_;  ///< known and new records
+    std::unique_ptr<RecordStore> joined_;        ///< known and new records
     std::optional<Response> guid_;
     std::optional<Response> sensorAnswer_;  ///< of Get SDR Repository Info, whatever it is
-    bool toldOfLog_ = false;  ///< Get SEL Info has been answered, or failed
+    bool toldOfLog_ = false;                ///< Get SEL Info has been answered, or failed
     bool toldOfSensors_ = false;
     bool reserving_ = false;
     bool reserved_ = false;

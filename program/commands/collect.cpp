@@ -284,9 +284,8 @@ Outcome CollectTo(const CollectOptions& options, LogLines& log, ReportOutput& ou
     }
     StopSignals::BeginCollecting();
     ReadingProgressLine progress(options.progress);
-    std::vector<NQORTQR20::NodeReading> readings =
-        NQORTQR20::ReadLiveNodes(source, needs, progress.Observer(),
-                                 store ? store->Known() : decltype(store->Known())());
+    std::vector<NQORTQR20::NodeReading> readings = NQORTQR20::ReadLiveNodes(
+        source, needs, progress.Observer(), store ? store->Known() : decltype(store->Known())());
     const std::shared_ptr<NQORTQR20::CaptureWriter> capture = Record(options, source, wanted);
     const Machine machine(std::move(source));
 

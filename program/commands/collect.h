@@ -21,7 +21,7 @@ struct CollectOptions {
     std::optional<double> deadlineSeconds;
     std::vector<std::string> names;  ///< of the systems, as their sources follow each other
     std::optional<std::string> severities;
-    bool progress = true;  ///< on standard error, where that is a terminal
+    bool progress = true;              ///< on standard error, where that is a terminal
     std::optional<std::string> store;  ///< URI of the store that the systems are visited for
     bool onlyNew = false;              ///< report only the events that the store does not have
 };

@@ -102,7 +102,8 @@ TEST(HostList, AGroupIsAListByName) {
     const auto hosts = ParseHostLists({"%all"}, find);
     EXPECT_EQ(Sources(hosts), (Names{"lan:n1", "lan:n2", "lan:x"}));
     using Options = decltype(HostEntry::options);
-    EXPECT_EQ(hosts[0].options, (Options{{"window", "4"}, {"user", "rack"}})) << "the inner group's";
+    EXPECT_EQ(hosts[0].options, (Options{{"window", "4"}, {"user", "rack"}}))
+        << "the inner group's";
     EXPECT_EQ(hosts[2].options, (Options{{"user", "all"}, {"window", "4"}}));
     EXPECT_THAT(Refusal({"%none"}, find), HasSubstr("no group %none"));
     EXPECT_THAT(Refusal({"%circle"}, find), HasSubstr("circle"));
