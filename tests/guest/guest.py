@@ -12,8 +12,11 @@ import shutil
 import socket
 import struct
 import subprocess
+import sys
 import tempfile
-import time
+
+sys.path.insert(0, str(pathlib.Path(__file__).resolve().parents[2] / "bench"))
+from lan_peers import wait_for_bmc  # noqa: E402
 
 BOOT_SECONDS = 240  # software emulation on a busy machine; six seconds on an idle one
 MODULES = ("ipmi_msghandler", "ipmi_devintf", "ipmi_si")
@@ -198,9 +201,7 @@ def ipmi_sim(sel: list[bytes], sdrs: list[bytes], commands: tuple[str, ...] = ()
                                    cwd=folder, stdin=subprocess.DEVNULL,
                                    stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
         try:
-            time.sleep(2)
-            if process.poll() is not None:
-                raise Missing("ipmi_sim does not start")
+            wait_for_bmc(udp, process)
             yield udp, tcp
         finally:
             process.kill()
