@@ -505,8 +505,9 @@ std::vector<SqlRow> ForNames(Database& db, const std::string& select, const std:
                              const std::vector<std::string>& names) {
     if (names.empty()) return db.Query(select + order);
     std::vector<SqlRow> all;
+    const std::string ofOne = select + " AND s.name = $1" + order;
     for (const std::string& name : names) {
-        auto rows = db.Query(select + " AND s.name = $1" + order, SqlText(name));
+        auto rows = db.Query(ofOne, SqlText(name));
         std::move(rows.begin(), rows.end(), std::back_inserter(all));
     }
     return all;
