@@ -86,6 +86,11 @@ bool IsSecret(std::string_view name) { return name == "password" || name == "kg"
                                   name + "-file");
 }
 
+[[noreturn]] void RefuseSection(const std::string& file, const std::string& name) {
+    throw Failure(kExitUsage, file + ": there is no command \"" + name +
+                                  "\"; a section is [COMMAND] or [group.NAME]");
+}
+
 std::optional<Configuration>& InUse() {
     static std::optional<Configuration> configuration;
     return configuration;
@@ -135,8 +140,7 @@ void Configuration::Read(const std::string& file, const std::vector<Command>& co
                 return one.arguments->get_name() == command;
             });
         if (!isCommand) {
-            throw Failure(kExitUsage, file + ": there is no command \"" + command +
-                                          "\"; a section is [COMMAND] or [group.NAME]");
+            RefuseSection(file, command);
         }
         const bool isOption = std::any_of(known_.begin(), known_.end(), [&](const auto& one) {
             return (command.empty() || one.first == command) && one.second == item.name;
