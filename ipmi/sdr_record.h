@@ -25,6 +25,8 @@ namespace ipmi {
 constexpr std::size_t kSdrHeaderLength = 5;
 /// The longest record there can be.
 constexpr std::size_t kMaxSdrLength = kSdrHeaderLength + 0xFF;
+/// The last offset that a part can be read from: Get SDR has one byte for it (clause 33.12).
+constexpr std::size_t kMaxSdrOffset = 0xFF;
 
 enum class SdrType : std::uint8_t {
     kFull = 0x01,

@@ -16,8 +16,9 @@
 
 namespace tqrhost {
 
-/// Tracks what could be read of one node: the event log, the sensor repository and the FRU devices.
-/// Every exchange goes through unchanged.
+/// Tracks what could be read of one node: the event log, the sensor repository, readings, FRU
+/// devices and facts of the controller. Every exchange goes through unchanged; an empty answer is
+/// none.
 class CompletenessTracker : public Transport {
 public:
     explicit CompletenessTracker(std::unique_ptr<LoopGuard> guard);

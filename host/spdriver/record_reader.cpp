@@ -6,14 +6,13 @@
 #include <utility>
 
 #include "base/bytes.h"
+#include "ipmi/sdr_record.h"
+#include "ipmi/sel_record.h"
 
 namespace tqrhost {
 namespace {
 
 constexpr std::size_t kBeforeRecord = 3;  // completion code, next record ID
-constexpr std::size_t kSelEntryLength = 16;
-// The length of a sensor record counts what follows its header (IPMI 2.0, clause 43).
-constexpr std::size_t kSdrHeaderLength = 5;
 
 // What fits an answer over every interface of a controller, and what then still may.
 constexpr std::size_t kFirstPart = 22;
@@ -23,11 +22,6 @@ constexpr unsigned kMaxTries = 2;
 // Tries that have not come true yet: those on their way, and a few that never will.
 constexpr std::size_t kMaxOpenGuesses = 36;
 constexpr std::size_t kGuessesPerHit = 4;
-
-bool IsTooLong(std::uint8_t code) {
-    return code == ipmi::kCannotReturnBytes || code == ipmi::kRequestLengthInvalid ||
-           code == ipmi::kRequestLengthExceeded;
-}
 
 }  // namespace
 
@@ -130,7 +124,7 @@ bool RecordReader::Recovered(std::uint16_t id, Incoming* record, std::size_t off
         Reserve();
         return true;
     }
-    if (!IsTooLong(code)) return false;
+    if (!ipmi::RefusesSoManyBytes(code)) return false;
     if (offset == 0 && count == ipmi::kWholeRecord) {
         whole_ = false;
     } else {
@@ -179,20 +173,23 @@ void RecordReader::TakeBytes(std::uint16_t id, Incoming* record, std::size_t off
         record->headed = true;
         record->bytes.assign(bytes.begin(), bytes.end());
         if (command_ == ipmi::kGetSelEntry) {
-            if (bytes.size() < kSelEntryLength && record->tries < kMaxTries) record->failed = true;
+            if (bytes.size() < ipmi::kSelRecordSize && record->tries < kMaxTries)
+                record->failed = true;
             return;
         }
-        if (bytes.size() < kSdrHeaderLength) {
+        if (bytes.size() < ipmi::kSdrHeaderLength) {
             record->failed = record->tries < kMaxTries;
             return;
         }
-        record->length = kSdrHeaderLength + bytes[kSdrHeaderLength - 1];
+        record->length = ipmi::kSdrHeaderLength + bytes[ipmi::kSdrHeaderLength - 1];
         if (bytes.size() >= record->length) return;
         if (count == ipmi::kWholeRecord) {  // cut: so much it gives at a time
             whole_ = false;
             part_ = std::min(std::max(bytes.size(), std::end(kSmallerParts)[-1]), kFirstPart);
         }
-        const std::size_t had = bytes.size();
+        // Past the last offset that a request can name nothing is read: the record stays cut.
+        record->length = std::min(record->length, ipmi::kMaxSdrOffset + 1);
+        const std::size_t had = std::min(bytes.size(), record->length);
         record->bytes.resize(record->length);
         for (std::size_t at = had; at < record->length; at += part_) {
             AskPart(id, record, at, std::min(part_, record->length - at));

@@ -61,7 +61,8 @@ std::optional<RepositoryReader::Record> RepositoryReader::ReadWhole(std::uint16_
 }
 
 bool RepositoryReader::ReadRest(std::uint16_t recordId, Record* record) {
-    const std::size_t length = ClaimedLength(record->bytes);
+    // Past the last offset that a request can name nothing is read: the record stays cut.
+    const std::size_t length = std::min(ClaimedLength(record->bytes), ipmi::kMaxSdrOffset + 1);
     // The ID in the record is the one to go on with: 0000h has only asked for the first.
     if (recordId == ipmi::kFirstRecordId && length > 0) {
         recordId = ipmi::SdrHeader::Parse(record->bytes)->recordId;

@@ -11,7 +11,12 @@ namespace NQORTQR20 {
 TCIMDateTime TOSSpecific::GetLocalTime() { return TCIMDateTime("20260310093000.000000+000"); }
 
 #ifdef WITHOUT_MEMORY
-void ReadLiveNodes(Source&, ReadingNeeds, const ReadingProgress&) {}
+std::vector<NodeReading> ReadLiveNodes(Source& source, ReadingNeeds, const ReadingProgress&,
+                                       std::vector<std::optional<KnownController>>) {
+    return std::vector<NodeReading>(source.nodes.size());
+}
+// Ambiguous, were it another function than the host's.
+[[maybe_unused]] constexpr auto kInItsPlace = &ReadLiveNodes;
 #endif
 
 }  // namespace NQORTQR20

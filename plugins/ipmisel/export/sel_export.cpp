@@ -26,7 +26,6 @@ namespace {
 constexpr std::size_t kEntityLength = 128;
 constexpr std::size_t kSensorNameLength = 17;
 
-/// What is the same for all records of one export.
 /// The first sensor of the cache with each number: a repository may have 65,000, a log as many
 /// events.
 using SensorIndex = std::array<const IPMISDREntry*, 256>;
@@ -42,6 +41,7 @@ SensorIndex IndexSensors(const SDRCache* cache) {
     return index;
 }
 
+/// What is the same for all records of one export.
 struct Export {
     int node;
     TCPluginCallbacks* context;
