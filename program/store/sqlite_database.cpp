@@ -79,7 +79,8 @@ constexpr Dialect kDialect{
 
 class SqliteDatabase : public Database {
 public:
-    SqliteDatabase(const std::string& file, std::string uri) : uri_(std::move(uri)) {
+    // By way of the other constructor: what is open when this one throws is closed.
+    SqliteDatabase(const std::string& file, std::string uri) : SqliteDatabase(std::move(uri)) {
         MakeFile(file);
         if (sqlite_.sqlite3_open_v2(file.c_str(), &handle_, SQLITE_OPEN_READWRITE, nullptr) !=
             SQLITE_OK) {
@@ -123,6 +124,8 @@ public:
     }
 
 private:
+    explicit SqliteDatabase(std::string uri) : uri_(std::move(uri)) {}
+
     [[noreturn]] void Fail(const std::string& problem) const {
         throw Failure(kExitUsage, "the store " + uri_ + " cannot be used: " + problem +
                                       "; correct that, or name another file with --store");
