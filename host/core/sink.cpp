@@ -4,6 +4,7 @@
 #include <array>
 #include <chrono>
 #include <cstdio>
+#include <utility>
 
 namespace NQORTQR20 {
 
@@ -30,8 +31,8 @@ bool WholeInstanceSink::OpenInstance(std::string_view className) {
     return true;
 }
 
-bool WholeInstanceSink::AddProperty(std::string_view name, const PropertyValue& value) {
-    open_.properties.emplace_back(name, value);
+bool WholeInstanceSink::AddProperty(std::string_view name, PropertyValue value) {
+    open_.properties.emplace_back(name, std::move(value));
     return true;
 }
 

@@ -38,7 +38,7 @@ class InstanceSink {
 public:
     virtual ~InstanceSink() = default;
     virtual bool OpenInstance(std::string_view className) = 0;
-    virtual bool AddProperty(std::string_view name, const PropertyValue& value) = 0;
+    virtual bool AddProperty(std::string_view name, PropertyValue value) = 0;
     virtual bool CloseInstance() = 0;
 };
 
@@ -51,7 +51,7 @@ struct Instance {
 class WholeInstanceSink : public InstanceSink {
 public:
     bool OpenInstance(std::string_view className) override;
-    bool AddProperty(std::string_view name, const PropertyValue& value) override;
+    bool AddProperty(std::string_view name, PropertyValue value) override;
     bool CloseInstance() override;
 
 protected:

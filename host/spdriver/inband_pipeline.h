@@ -22,7 +22,10 @@ public:
     void Submit(ipmi::Command command, Handler handler) override;
     std::size_t Pending() const override { return queue_.size() + sent_.size(); }
     std::size_t Room() const override;
-    bool Dead() const override { return dead_; }
+    /// The BMC has fallen silent: it answered nothing at all for as long as one request may go
+    /// unanswered, and could not be reached anew within that time. What is pending and what is
+    /// submitted from then on is answered with nothing at once.
+    bool Dead() const { return dead_; }
     int Descriptor() const override { return device_->Descriptor(); }
     Clock::time_point NextTimer() const override;
     void Advance(Clock::time_point now) override;

@@ -2,7 +2,6 @@
 
 #include <chrono>
 #include <cstddef>
-#include <deque>
 #include <functional>
 #include <memory>
 #include <optional>
@@ -36,10 +35,6 @@ public:
     /// submits no more than that, so that a guess never stands before a request that somebody waits
     /// for.
     virtual std::size_t Room() const = 0;
-    /// The BMC has fallen silent: it answered nothing at all for as long as one request may go
-    /// unanswered, and could not be reached anew within that time. What is pending and what is
-    /// submitted from then on is answered with nothing at once.
-    virtual bool Dead() const = 0;
 
     /// What to wait on with poll(2) for input; -1 when Advance is to be called without waiting.
     virtual int Descriptor() const = 0;

@@ -18,7 +18,6 @@ public:
     }
     std::size_t Pending() const override { return queue_.size(); }
     std::size_t Room() const override { return queue_.empty() ? 1 : 0; }
-    bool Dead() const override { return false; }
     int Descriptor() const override { return -1; }
     Clock::time_point NextTimer() const override {
         return queue_.empty() ? Clock::time_point::max() : Clock::time_point::min();

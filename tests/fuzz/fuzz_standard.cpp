@@ -58,7 +58,7 @@ private:
 class NoSink : public NQORTQR20::InstanceSink {
 public:
     bool OpenInstance(std::string_view) override { return true; }
-    bool AddProperty(std::string_view, const NQORTQR20::PropertyValue& value) override {
+    bool AddProperty(std::string_view, NQORTQR20::PropertyValue value) override {
         const auto* real = std::get_if<double>(&value);
         if (real != nullptr && !std::isfinite(*real)) __builtin_trap();
         return true;

@@ -19,9 +19,9 @@ public:
     bool full = false;
     bool broken = false;
 
-    bool AddProperty(std::string_view name, const PropertyValue& value) override {
+    bool AddProperty(std::string_view name, PropertyValue value) override {
         if (broken) throw std::runtime_error("broken");
-        return !full && InstanceRecorder::AddProperty(name, value);
+        return !full && InstanceRecorder::AddProperty(name, std::move(value));
     }
 
 protected:

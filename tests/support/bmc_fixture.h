@@ -153,9 +153,9 @@ public:
     /// A property that the host refuses the next time that it is written.
     std::string refusedProperty;
 
-    bool AddProperty(std::string_view name, const NQORTQR20::PropertyValue& value) override {
+    bool AddProperty(std::string_view name, NQORTQR20::PropertyValue value) override {
         if (refusedProperty.empty() || name != refusedProperty) {
-            return WholeInstanceSink::AddProperty(name, value);
+            return WholeInstanceSink::AddProperty(name, std::move(value));
         }
         refusedProperty.clear();
         return false;

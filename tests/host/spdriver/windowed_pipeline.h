@@ -36,7 +36,6 @@ public:
     std::size_t Room() const override {
         return queue_.size() < conditions_.window ? conditions_.window - queue_.size() : 0;
     }
-    bool Dead() const override { return false; }
     int Descriptor() const override { return -1; }
     Clock::time_point NextTimer() const override { return Clock::time_point::min(); }
     void Advance(Clock::time_point) override {
