@@ -73,12 +73,6 @@ std::string Milliseconds(Clock::duration time) {
     return Format("%.2f ms", std::chrono::duration<double, std::milli>(time).count());
 }
 
-std::string Joined(const std::vector<int>& numbers) {
-    std::string text;
-    for (const int number : numbers) text += (text.empty() ? "" : ", ") + std::to_string(number);
-    return text;
-}
-
 /// Runs a pipeline until nothing is pending.
 void Run(RequestPipeline* pipeline) {
     constexpr std::chrono::milliseconds kMaxWait{100};
@@ -239,6 +233,12 @@ void TryClock(Controller* controller, Steps* steps) {
 }
 
 #ifdef IPMISEL_LAN
+
+std::string Joined(const std::vector<int>& numbers) {
+    std::string text;
+    for (const int number : numbers) text += (text.empty() ? "" : ", ") + std::to_string(number);
+    return text;
+}
 // --- Over the network --------------------------------------------------------------------------
 
 constexpr std::chrono::milliseconds kPatience{3000};
