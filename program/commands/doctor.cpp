@@ -233,13 +233,13 @@ void TryClock(Controller* controller, Steps* steps) {
 }
 
 #ifdef IPMISEL_LAN
+// --- Over the network --------------------------------------------------------------------------
 
 std::string Joined(const std::vector<int>& numbers) {
     std::string text;
     for (const int number : numbers) text += (text.empty() ? "" : ", ") + std::to_string(number);
     return text;
 }
-// --- Over the network --------------------------------------------------------------------------
 
 constexpr std::chrono::milliseconds kPatience{3000};
 constexpr std::string_view kLan = "lan:";
