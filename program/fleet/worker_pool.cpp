@@ -183,7 +183,8 @@ std::vector<WorkerEnd> WorkerPool::Wait(Clock::time_point until) {
     }
     const auto rest = std::max(until - Clock::now(), Clock::duration::zero());
     const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(rest);
-    const timespec wait{seconds.count(), std::chrono::nanoseconds(rest - seconds).count()};
+    const timespec wait{static_cast<time_t>(seconds.count()),
+                        static_cast<long>(std::chrono::nanoseconds(rest - seconds).count())};
     sigset_t none;
     sigemptyset(&none);
     const bool any = ppoll(waits.data(), waits.size(), &wait, &none) > 0;

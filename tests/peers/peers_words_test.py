@@ -120,7 +120,7 @@ class Words(unittest.TestCase):
             self.assertRegex(ours["Sentence"], rf"\b{name} ")
         elif phrase.startswith("OEM Event Data") and "MakerData" in ours:
             self.assertIn(phrase[-3:-1].lower(), ours["MakerData"])
-        elif ours["SensorType"] == "Event Logging Disabled" and "MakerData" in ours:
+        elif ours.get("SensorType") == "Event Logging Disabled" and "MakerData" in ours:
             return 0  # event data 3 tells how to read data 2, and there is none
         elif NOTHING.search(phrase) or ours["EventTypeCode"] == 0:
             return 0
