@@ -12,6 +12,7 @@ import unittest
 
 import equal_instances
 import guest
+from guest import SDRS, SEL
 
 BUILD = pathlib.Path(sys.argv[1]).resolve()
 CACHE = pathlib.Path(sys.argv[2]).resolve()
@@ -20,22 +21,6 @@ RACK_SERVER = pathlib.Path(__file__).parents[2] / "examples/rack-server.json"
 
 KCS_INTERNAL = ["-device", "ipmi-bmc-sim,id=bmc0", "-device", "isa-ipmi-kcs,bmc=bmc0"]
 LOG = "collect --from inband --format json --class QORSG_IPMILogRecord"
-
-def record(number: int, kind: int, body: str, name: str) -> bytes:
-    """A sensor data record: header, body to the byte before the ID string, ID string."""
-    rest = bytes.fromhex(body) + bytes([0xC0 | len(name)]) + name.encode()
-    return bytes([number, 0, 0x51, kind, len(rest)]) + rest
-
-
-# A full record: sensor 0x30, degrees C, M = 1; and a compact one, sensor 0x31.
-SDRS = [
-    record(1, 1, "2000 30 0301 7f68 0101 000000000000 80010000 0100 0000 0000" + "00" * 17,
-           "CPU1 Temp"),
-    record(2, 2, "2000 31 0401 6740 0d6f 000000000000 c00000" + "00" * 8, "Drive 1"),
-]
-# record ID, type 02, time, generator, revision, sensor type, number, event type, data 1 to 3
-SEL = [bytes.fromhex(f"{i:02x}00 02 00000000 2000 04 {event}") for i, event in enumerate(
-    ["01 30 01 59 50 45", "01 30 81 59 40 45", "0d 31 6f f0 ff ff", "0f 00 6f c2 01 ff"], 1)]
 
 
 def external(tcp: int) -> list[str]:
