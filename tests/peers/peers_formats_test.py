@@ -215,7 +215,8 @@ class ReadInABrowser(Folder):
              f"--user-data-dir={self.folder}/profile", "--enable-logging=stderr", "--dump-dom",
              "--host-resolver-rules=MAP * ~NOTFOUND", f"file://{page}"],
             capture_output=True, text=True, timeout=180)
-        complaints = re.findall("CONSOLE.*", done.stderr)
+        # The browser's own pages complain of a slow machine there too.
+        complaints = [line for line in re.findall("CONSOLE.*", done.stderr) if "source: chrome://" not in line]
         if not script:  # that it was refused is meant
             complaints = [line for line in complaints if "Content Security Policy" not in line]
         self.assertEqual(complaints, [])
