@@ -422,11 +422,18 @@ private:
             "UPDATE systems SET revision = revision + 1, gone = NULL,"
             " log_read = CASE WHEN $2 = 1 THEN $3 ELSE log_read END WHERE id = $1",
             system_, std::int64_t{visit_.complete && !stale_ ? 1 : 0}, visit_.finished);
-        db_.Query("DELETE FROM log_states WHERE system = $1", system_);
-        if (!usable) return;
+        // No row is ever taken out of the store: a collector need not have the right to.
+        constexpr std::int64_t kUnusable = -1;
+        if (!usable) {
+            db_.Query("UPDATE log_states SET records = $2 WHERE system = $1", system_, kUnusable);
+            return;
+        }
         db_.Query(
             "INSERT INTO log_states (system, guid, log_info, records, sensor_info,"
-            " sensor_records) VALUES ($1, $2, $3, $4, $5, $6)",
+            " sensor_records) VALUES ($1, $2, $3, $4, $5, $6)"
+            " ON CONFLICT (system) DO UPDATE SET guid = excluded.guid,"
+            " log_info = excluded.log_info, records = excluded.records,"
+            " sensor_info = excluded.sensor_info, sensor_records = excluded.sensor_records",
             system_, HexText(known->guid), HexText(known->logInfo),
             static_cast<std::int64_t>(known->log.size()), HexText(known->sensorInfo),
             RecordsText(known->sensorRecords));
@@ -547,8 +554,10 @@ std::optional<StoredSystem> Store::Find(const std::string& name) {
         std::copy(raw->begin(), raw->end(), known.log.emplace_back().begin());
     }
     // Another visit may have added events since.
-    const auto records = static_cast<std::size_t>(IntegerOf(state.at(2)));
-    if (known.log.size() == records) system.known = std::move(known);
+    const std::int64_t records = IntegerOf(state.at(2));
+    if (records >= 0 && known.log.size() == static_cast<std::size_t>(records)) {
+        system.known = std::move(known);
+    }
     return system;
 }
 

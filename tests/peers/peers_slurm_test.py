@@ -1,4 +1,4 @@
-"""The files of examples/fleet with a real Slurm: a controller, two nodes on this machine, munge.
+"""The files of examples/fleet with a real Slurm (a controller, two nodes on this machine, munge) and a real PostgreSQL.
 
 usage: peers_slurm_test.py PROGRAM SOURCE_FOLDER        (exit status 77: a facility is missing)
 """
@@ -18,9 +18,10 @@ PROGRAM = pathlib.Path(sys.argv[1]).resolve()
 SOURCE = pathlib.Path(sys.argv[2]).resolve()
 SIMULATOR = PROGRAM.parent / "ipmisel-simulator"
 FLEET = SOURCE / "examples/fleet"
-CONTROLLERS = 48
+CONTROLLERS = 200
 RECORDS = 20
 TASKS = 8
+KILLED = 3  # of the tasks
 CONFIGURATION = """ClusterName=test
 SlurmctldHost={host}(127.0.0.1)
 SlurmctldPort={ports[0]}
@@ -129,45 +130,89 @@ class Slurm(unittest.TestCase):
     def state(cls, name):
         return cls.node(name).partition(" State=")[2].split(" ")[0]
 
-    def test_a_job_array_reads_each_controller_once_also_when_a_task_is_run_again(self):
+    def server_of_postgresql(self):
+        """Its folder, which holds its socket; its owner is "owner"."""
+        folder = pathlib.Path(tempfile.mkdtemp(prefix="postgresql-"))
+        self.addCleanup(shutil.rmtree, folder, ignore_errors=True)
+        shutil.chown(folder, "postgres")
+        path = ":".join([*map(str, pathlib.Path("/usr/lib/postgresql").glob("*/bin")), os.environ["PATH"]])
+        tool = ["runuser", "-u", "postgres", "--", "env", f"PATH={path}", f"PGDATA={folder}/data"]
+        for command in (["initdb", "-A", "trust", "-U", "owner"],
+                        ["pg_ctl", "-w", "-l", f"{folder}/log", "-o", f"-F -k {folder} -c listen_addresses=", "start"]):
+            subprocess.run([*tool, *command], cwd="/", check=True, stdout=subprocess.DEVNULL)
+        self.addCleanup(subprocess.run, [*tool, "pg_ctl", "-m", "immediate", "stop"], cwd="/", stdout=subprocess.DEVNULL)
+        return folder
+
+    def processes_of_task(self, task):
+        """Of the batch script and what it has started."""
+        found = []
+        for process in pathlib.Path("/proc").glob("[0-9]*"):
+            try:
+                environment = (process / "environ").read_text(errors="replace").split("\0")
+                if {f"SLURM_ARRAY_TASK_ID={task}", f"SLURM_CONF={self.configuration}"} <= set(environment):
+                    found.append(int(process.name))
+            except OSError:
+                pass
+        return found
+
+    def test_a_job_array_stores_each_event_once_also_when_a_task_is_killed_and_run_again(self):
         password = self.folder / "password"
         password.write_text("secret\n")
         events = self.folder / "events"
         events.mkdir()
+        server = self.server_of_postgresql()
+        uri = f"postgresql://collector@/postgres?host={server}"
+
+        def sql(question, user="owner"):
+            return subprocess.run(["psql", "-qAt", "-v", "ON_ERROR_STOP=1", "-h", server, "-U", user, "postgres"],
+                                  input=question, capture_output=True, text=True, check=True).stdout.splitlines()
+
+        subprocess.run([PROGRAM, "check", "--store", uri.replace("collector", "owner")], stdout=subprocess.DEVNULL)
+        sql((FLEET / "roles.sql").read_text())
+        sql("CREATE ROLE collector LOGIN IN ROLE ipmisel_collector; CREATE ROLE reader LOGIN IN ROLE ipmisel_reader")
         simulator = subprocess.Popen([SIMULATOR, "--port", "0", "--controllers", str(CONTROLLERS), "--records",
-                                      str(RECORDS), "--delay", "100"], stdout=subprocess.PIPE, text=True)
+                                      str(RECORDS), "--delay", "50"], stdout=subprocess.PIPE, text=True)
         self.addCleanup(simulator.stdout.close)
         self.addCleanup(simulator.wait)
         self.addCleanup(simulator.kill)
         hosts = self.folder / "bmcs"
         hosts.write_text("".join(simulator.stdout.readline() for _ in range(CONTROLLERS)))
+        access = (f"@{hosts}", "--user", "root", "--password-file", str(password))
         begin = time.monotonic()
         job = self.slurm("sbatch", "--parsable", f"--array=1-{TASKS}", "-o", f"{self.folder}/out-%a",
-                         str(FLEET / "slurm-collect.sh"), f"@{hosts}", "--user", "root", "--password-file",
-                         str(password), "--jobs", "2", IPMISEL_OUTPUT=str(events)).strip()
-        running = ("squeue", "--noheader", "--array", "--states=R", "--job", f"{job}_3")
-        self.assertTrue(eventually(lambda: self.slurm(*running)))
-        self.slurm("scontrol", "requeue", f"{job}_3")
+                         str(FLEET / "slurm-collect.sh"), *access, "--jobs", "2", "--store", uri, "--new",
+                         IPMISEL_OUTPUT=str(events)).strip()
+        task = f"{job}_{KILLED}"
+
+        def visited():
+            return int(sql("SELECT COUNT(*) FROM visits", "reader")[0])
+
+        # Some controllers are stored then, and some are not.
+        self.assertTrue(eventually(lambda: self.processes_of_task(KILLED) and visited() >= CONTROLLERS // 5))
+        for process in self.processes_of_task(KILLED):
+            os.kill(process, signal.SIGKILL)
+        self.assertTrue(eventually(lambda: "JobState=FAILED" in self.slurm("scontrol", "show", "job", task)))
+        self.assertFalse((events / f"events-{KILLED}.ndjson").exists())
+        self.slurm("scontrol", "requeue", task)
         self.assertTrue(eventually(lambda: not self.slurm("squeue", "--noheader", "--job", job), 180),
                         self.slurm("squeue"))
         seconds = time.monotonic() - begin
-        keys, systems = [], []
-        for part in range(1, TASKS + 1):
-            told = (self.folder / f"out-{part}").read_text()
-            for line in (events / f"events-{part}.ndjson").read_text().splitlines():
-                event = json.loads(line)
-                if "summary" in event:
-                    self.assertTrue(event["summary"]["complete"], told)
-                    systems.append(event["system"])
-                else:
-                    keys.append(event["Key"])
-        alone = subprocess.run([PROGRAM, "collect", "--hosts", f"@{hosts}", "--user", "root", "--password-file",
-                                password, "--format", "events"], capture_output=True, text=True, timeout=120)
-        wanted = [json.loads(line) for line in alone.stdout.splitlines()]
-        self.assertEqual(sorted(keys), sorted(event["Key"] for event in wanted if "Key" in event))
-        self.assertEqual(len(set(keys)), CONTROLLERS * RECORDS)
-        self.assertEqual(sorted(systems), sorted(event["system"] for event in wanted if "summary" in event))
-        print(f"{CONTROLLERS} controllers, an array of {TASKS}, one task run again: {seconds:.1f} s", file=sys.stderr)
+        for number in range(1, TASKS + 1):
+            told = (self.folder / f"out-{number}").read_text()
+            lines = [json.loads(line) for line in (events / f"events-{number}.ndjson").read_text().splitlines()]
+            self.assertTrue(all(line["summary"]["complete"] for line in lines if "summary" in line), told)
+        alone = subprocess.run([PROGRAM, "collect", "--hosts", *access, "--format", "events"], capture_output=True,
+                               text=True, timeout=120)
+        wanted = [(event["system"], event["Key"]) for event in map(json.loads, alone.stdout.splitlines()) if "Key" in event]
+        keys = [tuple(row.split("|")) for row in
+                sql("SELECT s.name, e.key FROM events e JOIN systems s ON s.id = e.system", "reader")]
+        self.assertEqual(len(wanted), CONTROLLERS * RECORDS)
+        self.assertEqual(set(keys), set(wanted))
+        self.assertEqual(len(keys), len(wanted))
+        rows = {table: int(sql(f"SELECT COUNT(*) FROM {table}")[0]) for table in ("systems", "visits", "events", "parts",
+                                                                                "findings")}
+        print(f"{CONTROLLERS} controllers, an array of {TASKS}, one task killed and run again: {seconds:.1f} s, rows {rows}",
+              file=sys.stderr)
 
     def health(self, example):
         subprocess.run([FLEET / "slurm-health-check.sh", "--from", f"sim:{example}"], check=True, timeout=60,
@@ -199,6 +244,8 @@ if __name__ == "__main__":
     missing = [name for name in ("munged", "slurmctld", "slurmd", "sbatch") if shutil.which(name) is None]
     if missing:
         skip(f"{', '.join(missing)} missing (packages slurm-wlm, munge)")
+    if shutil.which("psql") is None or not list(pathlib.Path("/usr/lib/postgresql").glob("*/bin/initdb")):
+        skip("PostgreSQL missing (package postgresql)")
     if os.geteuid() != 0:
         skip("munged and slurmd are started as root")
     # The daemons are ours alone: what ends this test ends them.

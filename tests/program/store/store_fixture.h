@@ -62,8 +62,19 @@ public:
         const std::string schema = "t" + std::to_string(++schemas_);
         const std::string host = folder_.path();
         Run("psql -q -h " + host + " -d postgres -c 'CREATE SCHEMA " + schema + "'");
-        return "postgresql://" + user_ + "@/postgres?host=" + host + "&options=-csearch_path%3D" +
-               schema;
+        schema_ = schema;
+        return UriOf(user_);
+    }
+    /// The URI of the last such place, for another user.
+    std::string UriOf(const std::string& user) const {
+        return "postgresql://" + user + "@/postgres?host=" + folder_.path() +
+               "&options=-csearch_path%3D" + schema_;
+    }
+    /// Runs a file of SQL at the last such place, where every user may then look.
+    bool RunFile(const std::string& file) const {
+        return std::system(("psql -q -v ON_ERROR_STOP=1 -c 'GRANT USAGE ON SCHEMA " + schema_ +
+                            " TO PUBLIC' -f '" + file + "' '" + UriOf(user_) + "'")
+                               .c_str()) == 0;
     }
 
 private:
@@ -95,6 +106,7 @@ private:
 
     DatabaseFolder folder_;
     std::string user_;
+    std::string schema_;
     int schemas_ = 0;
 };
 

@@ -238,6 +238,66 @@ TEST_P(StoreOf, TheQuestionsOfTheDocumentAreAnswered) {
     EXPECT_EQ(questions, 10);
 }
 
+class StoreRoles : public StoreTest {};
+INSTANTIATE_TEST_SUITE_P(, StoreRoles, Values(true), StoreName);
+
+TEST_P(StoreRoles, EachMayDoItsWorkAndNothingElse) {
+    ipmisel::Store{uri};
+    const PostgresqlServer& server = *PostgresqlServer::Get();
+    ASSERT_TRUE(server.RunFile(IPMISEL_EXAMPLES "/fleet/roles.sql"));
+    ASSERT_TRUE(server.RunFile(IPMISEL_EXAMPLES "/fleet/roles.sql")) << "the second time";
+    for (const std::string role : {"reader", "operator", "collector"}) {
+        ipmisel::OpenDatabase(uri)->Query("DROP ROLE IF EXISTS test_" + role);
+        ipmisel::OpenDatabase(uri)->Query("CREATE ROLE test_" + role + " LOGIN IN ROLE ipmisel_" +
+                                          role);
+    }
+    // All that a collector writes: a log that grows, is cleared, and another controller's.
+    uri = server.UriOf("test_collector");
+    Controller bmc;
+    bmc.Grow();
+    const auto visit = [&] { EXPECT_EQ(Visit(bmc.Server()).exitStatus, 0); };
+    for (int i = 0; i < 2; ++i) visit();
+    bmc.Clear();
+    visit();
+    ipmisel::Store(uri).AddFailed("bmc", 1, 2, "no answer");
+    bmc.Replace(7);
+    bmc.Grow(true);
+    visit();
+    uri = server.UriOf("test_operator");
+    EXPECT_EQ(
+        Run({"ack", Column("SELECT key FROM findings WHERE gone IS NULL").at(0), "--store", uri})
+            .exitStatus,
+        0);
+    uri = server.UriOf("test_reader");
+    EXPECT_EQ(Run({"check", "--store", uri}).exitStatus, 0);
+    const struct {
+        const char *role, *sql;
+    } refused[] = {
+        {"reader", "INSERT INTO schema_versions (number) VALUES (2)"},
+        {"reader", "UPDATE findings SET acknowledged = 1"},
+        {"reader", "DELETE FROM visits"},
+        {"operator", "UPDATE findings SET severity = 'warning'"},
+        {"operator", "INSERT INTO events SELECT * FROM events"},
+        {"collector", "DELETE FROM events"},
+        {"collector", "DELETE FROM log_states"},
+        {"collector", "UPDATE events SET raw = ''"},
+        {"collector", "UPDATE events SET first_seen = 0"},
+        {"collector", "TRUNCATE acknowledgements"},
+        {"collector", "DROP TABLE acknowledgements"},
+        {"collector", "CREATE TABLE mine (number BIGINT)"},
+    };
+    for (const auto& c : refused) {
+        const auto database = ipmisel::OpenDatabase(server.UriOf(std::string("test_") + c.role));
+        try {
+            database->Query(c.sql);
+            ADD_FAILURE() << c.role << " may " << c.sql;
+        } catch (const ipmisel::Failure& failure) {
+            EXPECT_THAT(failure.what(),
+                        AnyOf(HasSubstr("permission denied"), HasSubstr("must be owner")));
+        }
+    }
+}
+
 TEST(Store, RefusesWhatItShouldNotUse) {
     const TemporaryFolder folder;
     const std::string file = (folder.path() / "new.db").string();
