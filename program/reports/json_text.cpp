@@ -13,11 +13,21 @@ namespace {
 
 constexpr auto kReplace = Json::error_handler_t::replace;
 
-/// Nothing to escape and nothing but ASCII, as nearly every text.
+/// Nothing but ASCII and nothing to escape but line feeds, as nearly every text.
 bool IsPlain(std::string_view text) {
     return std::all_of(text.begin(), text.end(), [](char c) {
-        return c >= ' ' && c <= '~' && c != '"' && c != '\\';  // a byte beyond ASCII is negative
+        // A byte beyond ASCII is negative.
+        return (c >= ' ' && c <= '~' && c != '"' && c != '\\') || c == '\n';
     });
+}
+
+void AppendPlain(std::string& out, std::string_view text) {
+    for (auto end = text.find('\n'); end != std::string_view::npos; end = text.find('\n')) {
+        out += text.substr(0, end);
+        out += "\\n";
+        text.remove_prefix(end + 1);
+    }
+    out += text;
 }
 
 std::string Escaped(char32_t c) {
@@ -27,12 +37,16 @@ std::string Escaped(char32_t c) {
     return Format("\\u%04x\\u%04x", 0xD800 + (rest >> 10), 0xDC00 + (rest & 0x3FF));
 }
 
-std::string Quoted(std::string_view text) {
-    if (IsPlain(text)) return '"' + std::string(text) + '"';
+void AppendQuoted(std::string& out, std::string_view text) {
+    if (IsPlain(text)) {
+        out += '"';
+        AppendPlain(out, text);
+        out += '"';
+        return;
+    }
     // The library leaves DEL, C1 and the marks of direction as they are, and has short forms for
     // some controls, of which only that of a line feed has ever stood in a report.
     const std::string json = Json(text).dump(-1, ' ', false, kReplace);
-    std::string out;
     for (std::string_view rest = json; !rest.empty();) {
         const Character character = FirstCharacter(rest);
         constexpr std::string_view kShort = "bfrt";
@@ -55,16 +69,15 @@ std::string Quoted(std::string_view text) {
         }
         rest.remove_prefix(character.length);
     }
-    return out;
 }
 
-void AppendValue(std::string& out, const std::string& text) { out += Quoted(text); }
+void AppendValue(std::string& out, const std::string& text) { AppendQuoted(out, text); }
 void AppendValue(std::string& out, std::int64_t number) { out += std::to_string(number); }
 void AppendValue(std::string& out, std::uint8_t byte) { out += std::to_string(byte); }
 /// The shortest text that reads back as the same number; 20 stands as 20.0.
 void AppendValue(std::string& out, double number) { out += Json(number).dump(); }
 void AppendValue(std::string& out, bool truth) { out += truth ? "true" : "false"; }
-void AppendValue(std::string& out, NQORTQR20::Time time) { out += Quoted(TimeText(time)); }
+void AppendValue(std::string& out, NQORTQR20::Time time) { AppendQuoted(out, TimeText(time)); }
 
 template <typename Element>
 void AppendValue(std::string& out, const std::vector<Element>& list) {
@@ -77,17 +90,25 @@ void AppendValue(std::string& out, const std::vector<Element>& list) {
 }
 
 void AppendValue(std::string& out, const NQORTQR20::ObjectPath& path) {
-    out += "{\"class\": " + Quoted(path.className) + ", \"keys\": {";
+    out += "{\"class\": ";
+    AppendQuoted(out, path.className);
+    out += ", \"keys\": {";
     for (std::size_t i = 0; i < path.keys.size(); ++i) {
         if (i > 0) out += ", ";
-        out += Quoted(path.keys[i].first) + ": " + Quoted(path.keys[i].second);
+        AppendQuoted(out, path.keys[i].first);
+        out += ": ";
+        AppendQuoted(out, path.keys[i].second);
     }
     out += "}}";
 }
 
 }  // namespace
 
-std::string JsonText(std::string_view text) { return Quoted(text); }
+std::string JsonText(std::string_view text) {
+    std::string out;
+    AppendQuoted(out, text);
+    return out;
+}
 
 std::string JsonLine(const Json& value) { return value.dump(-1, ' ', true, kReplace); }
 
@@ -96,14 +117,15 @@ std::string JsonProperties(const NQORTQR20::Instance& instance) {
     std::string out;
     for (const auto& [name, value] : instance.properties) {
         if (!out.empty()) out += ", ";
-        out += Quoted(name) + ": ";
+        AppendQuoted(out, name);
+        out += ": ";
         std::visit([&](const auto& each) { AppendValue(out, each); }, value);
     }
     return out;
 }
 
 std::string JsonInstance(const NQORTQR20::Instance& instance) {
-    return "{\"class\": " + Quoted(instance.className) + ", \"properties\": {" +
+    return "{\"class\": " + JsonText(instance.className) + ", \"properties\": {" +
            JsonProperties(instance) + "}}";
 }
 

@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <map>
@@ -17,37 +18,41 @@ namespace {
 // A longer line is read in pieces, each a line of its own.
 constexpr std::size_t kLongestPiece = 511;
 
-/// A small text file, read whole; larger ones are none of ours.
+/// A small text file; larger ones are none of ours.
 class TextFile {
 public:
-    explicit TextFile(const std::string& path) {
+    explicit TextFile(const std::string& path)
         // Not blocking: a pipe in the file's place must not hold the collection up.
-        const int file = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
-        if (file < 0) return;
-        read_ = ReadAll(file);
-        close(file);
+        : file_(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK)) {}
+    TextFile(const TextFile&) = delete;
+    TextFile& operator=(const TextFile&) = delete;
+    ~TextFile() {
+        if (file_ >= 0) close(file_);
     }
-    /// Nothing when the file cannot be read or is too large.
-    std::optional<std::string_view> Contents() const {
-        if (!read_) return std::nullopt;
-        return std::string_view(room_.data(), have_);
+
+    /// The first `most` bytes, or as many as there are, until it is read again. Nothing when the
+    /// file cannot be read or is too large.
+    std::optional<std::string_view> Read(std::size_t most = kMaxTextFile + 1) {
+        if (file_ < 0) return std::nullopt;
+        ssize_t count = 0;
+        do {
+            count = read(file_, room_.data(), std::min(most, room_.size()));
+        } while (count < 0 && errno == EINTR);
+        // Only its end cuts a plain file short.
+        if (count < 0 || static_cast<std::size_t>(count) == room_.size()) return std::nullopt;
+        return std::string_view(room_.data(), static_cast<std::size_t>(count));
+    }
+
+    /// All of it, from its start.
+    std::optional<std::string_view> ReadAgain() {
+        if (lseek(file_, 0, SEEK_SET) != 0) return std::nullopt;
+        return Read();
     }
 
 private:
-    bool ReadAll(int file) {
-        ssize_t count = 0;
-        do {
-            count = read(file, room_.data(), room_.size());
-        } while (count < 0 && errno == EINTR);
-        if (count < 0) return false;
-        have_ = static_cast<std::size_t>(count);  // all of it: only its end cuts a plain file short
-        return have_ < room_.size();
-    }
-
+    int file_;
     // Not set to zero: every text of every record comes through here.
     std::array<char, kMaxTextFile + 1> room_;
-    std::size_t have_ = 0;
-    bool read_ = false;
 };
 
 /// The first piece that shows `key`. A NUL hides the rest of its piece.
@@ -72,30 +77,8 @@ std::string_view FindPiece(std::string_view contents, std::string_view key) {
     }
 }
 
-/// What was found in the file, for as long as the bytes that are read are the same.
-class FoundTexts {
-public:
-    const std::string& Find(std::string_view contents, int number, std::size_t capacity) {
-        if (contents != contents_) {
-            contents_ = contents;
-            texts_.clear();
-        }
-        const auto [at, isNew] = texts_.try_emplace({number, capacity});
-        if (isNew) at->second = FindNumberedText(contents, number, capacity);
-        return at->second;
-    }
-
-private:
-    std::string contents_;
-    std::map<std::pair<int, std::size_t>, std::string> texts_;
-};
-
-}  // namespace
-
-std::string FindNumberedText(std::string_view contents, int number, std::size_t capacity) {
-    // Compatibility: the key counts anywhere in a line, so that 5 may find the line of 105
-    // (NumberedTexts.LookupRules).
-    const std::string_view piece = FindPiece(contents, std::to_string(number) + "=");
+/// The text of a piece, as it comes out of a buffer of `capacity` bytes.
+std::string TextOf(std::string_view piece, std::size_t capacity) {
     if (piece.empty() || capacity == 0) return {};
     std::string_view text = piece.substr(piece.find('=') + 1).substr(0, capacity - 1);
     // Compatibility: without a line end it is the last character that goes
@@ -106,6 +89,52 @@ std::string FindNumberedText(std::string_view contents, int number, std::size_t 
         text.remove_suffix(1);
     }
     return std::string(text);
+}
+
+/// The first piece with a number.
+std::string_view FindNumber(std::string_view contents, int number) {
+    // Compatibility: the key counts anywhere in a line, so that 5 may find the line of 105
+    // (NumberedTexts.LookupRules).
+    return FindPiece(contents, std::to_string(number) + "=");
+}
+
+/// What was found in the file, for as long as the bytes that are read are the same.
+class FoundTexts {
+public:
+    /// Empty when no line has the number; nothing when the file cannot be read.
+    std::optional<std::string_view> Find(TextFile& file, int number, std::size_t capacity) {
+        auto found = texts_.find({number, capacity});
+        const std::size_t needed = found == texts_.end() ? kMaxTextFile + 1 : found->second.end + 1;
+        std::optional<std::string_view> read = file.Read(needed);
+        if (read && *read != std::string_view(contents_).substr(0, needed)) {
+            if (found != texts_.end()) read = file.ReadAgain();
+            texts_.clear();
+            found = texts_.end();
+        }
+        if (!read) return std::nullopt;
+        if (found == texts_.end()) {
+            contents_ = *read;
+            const std::string_view piece = FindNumber(*read, number);
+            const std::size_t end =
+                piece.empty() ? read->size() : piece.data() + piece.size() - read->data();
+            found = texts_.insert({{number, capacity}, {TextOf(piece, capacity), end}}).first;
+        }
+        return found->second.text;
+    }
+
+private:
+    struct Text {
+        std::string text;
+        std::size_t end;  ///< of its piece: what stands behind it has no part in it
+    };
+    std::string contents_;
+    std::map<std::pair<int, std::size_t>, Text> texts_;
+};
+
+}  // namespace
+
+std::string FindNumberedText(std::string_view contents, int number, std::size_t capacity) {
+    return TextOf(FindNumber(contents, number), capacity);
 }
 
 std::optional<std::string> NumberedText(NQORTQR20::TCPluginCallbacks* context, int number,
@@ -126,20 +155,19 @@ std::optional<std::string> NumberedText(NQORTQR20::TCPluginCallbacks* context, i
     path.replace(name, std::string::npos, "ipmisel.INI");
     if (LogEnabled(kInfo)) WriteLog(kInfo, "Path found for ipmisel INI file: " + path);
 
-    const TextFile file(path);
-    const std::optional<std::string_view> contents = file.Contents();
-    if (!contents) {
+    TextFile file(path);
+    static thread_local FoundTexts found;
+    const std::optional<std::string_view> text = found.Find(file, number, capacity);
+    if (!text) {
         WriteLog(kWarning, Format("Could not open file %s. Did not obtain string #%d\n",
                                   path.c_str(), number));
         return std::nullopt;
     }
-    static thread_local FoundTexts found;
-    const std::string& text = found.Find(*contents, number, capacity);
-    if (text.empty()) {
+    if (text->empty()) {
         WriteLog(kError, Format("Could not find data_number %d", number));
         return std::nullopt;
     }
-    return text;
+    return std::string(*text);
 }
 
 std::string FetchText(NQORTQR20::TCPluginCallbacks* context, int number, std::size_t capacity) {

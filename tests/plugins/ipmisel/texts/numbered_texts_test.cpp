@@ -143,16 +143,26 @@ TEST(GetString, ReadsTheFileAnewAndKeepsNoDescriptor) {
     const auto descriptors = [] {
         return std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {});
     };
-    const TextFolder folder("1=before\n");
+    const TextFolder folder("");
     const NQORTQR20::PluginContext context(folder.path());
     IPMIMapping mapping;
-    char out[16];
     const auto open = descriptors();
-    EXPECT_EQ(mapping.GetString(context.get(), 1, out, sizeof out), 0);
-    folder.Write("ipmisel.INI", "1=after\n");
-    EXPECT_EQ(mapping.GetString(context.get(), 1, out, sizeof out), 0);
-    EXPECT_STREQ(out, "after");
-    EXPECT_NE(mapping.GetString(context.get(), 2, out, sizeof out), 0);
+    // Each change has effect at the next text, wherever in the file it is.
+    const std::pair<const char*, const char*> states[] = {
+        {"1=a\n", ""},         {"1=a\n5=b\n", "b"},        {"1=a\n5=b\n6=c\n", "b"},
+        {"1=a\n5=bb\n", "bb"}, {"1=a\n5=bb", "b"},         {"1=a\n5=bbc", "bb"},
+        {"5=0\n5=bb\n", "0"},  {"1=a\n5=bb\n6=d\n", "bb"}, {"1=a\n5=", ""},
+    };
+    for (const auto& [contents, five] : states) {
+        folder.Write("ipmisel.INI", contents);
+        for (const int number : {5, 1, 6, 5}) {
+            char out[16];
+            const int failed = mapping.GetString(context.get(), number, out, sizeof out);
+            EXPECT_EQ(out, ipmisel::FindNumberedText(contents, number, sizeof out)) << contents;
+            EXPECT_EQ(failed == 0, out[0] != '\0');
+            EXPECT_TRUE(number != 5 || out == std::string(five)) << contents << out;
+        }
+    }
     EXPECT_EQ(descriptors(), open);
 }
 
