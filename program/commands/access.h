@@ -1,12 +1,15 @@
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
 
 #include "host/spdriver/source.h"
+
+namespace CLI {
+class App;
+}
 
 namespace ipmisel {
 

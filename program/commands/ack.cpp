@@ -19,7 +19,7 @@ namespace {
 
 constexpr std::size_t kKeyLength = 32;
 
-struct Options {
+struct AckOptions {
     std::vector<std::string> keys;
     std::string store;
     std::string note;
@@ -31,7 +31,7 @@ std::string UserName() {
     return user != nullptr ? user->pw_name : std::to_string(geteuid());
 }
 
-int Acknowledge(const Options& options) {
+int Acknowledge(const AckOptions& options) {
     Store store(options.store);
     const auto now = std::chrono::duration_cast<std::chrono::seconds>(
         std::chrono::system_clock::now().time_since_epoch());
@@ -50,7 +50,7 @@ int Acknowledge(const Options& options) {
 Command AddAckCommand(CLI::App* program) {
     CLI::App* const command =
         program->add_subcommand("ack", "Acknowledge findings, until they come anew");
-    const auto options = std::make_shared<Options>();
+    const auto options = std::make_shared<AckOptions>();
     const CLI::Validator isKey(
         [](const std::string& text) {
             const bool good = text.size() == kKeyLength &&

@@ -15,7 +15,7 @@
 namespace ipmisel {
 namespace {
 
-struct Options {
+struct ClassesOptions {
     std::vector<std::string> plugins;
     bool schema = false;
 };
@@ -41,7 +41,7 @@ void Print(const std::string& text) {
 Command AddClassesCommand(CLI::App* program) {
     CLI::App* const command =
         program->add_subcommand("classes", "List the classes that can be collected");
-    const auto options = std::make_shared<Options>();
+    const auto options = std::make_shared<ClassesOptions>();
     AddPluginOption(command, &options->plugins);
     command->add_flag("--schema", options->schema, "The JSON Schema of their instances instead");
     return {command, [options] {

@@ -67,14 +67,14 @@ State StateOf(const SavedReport& saved) {
     return state;
 }
 
-struct Options {
+struct DiffOptions {
     std::vector<std::string> sides;  ///< files, or visits of the store
     std::optional<std::string> store;
     std::optional<std::string> system;
 };
 
 /// A visit by its number, or the last one of the system at a time.
-std::int64_t VisitNamed(Store& store, const std::string& text, const Options& options) {
+std::int64_t VisitNamed(Store& store, const std::string& text, const DiffOptions& options) {
     std::int64_t number = 0;
     const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
     if (error == std::errc() && end == text.data() + text.size()) return number;
@@ -92,7 +92,7 @@ std::int64_t VisitNamed(Store& store, const std::string& text, const Options& op
                                   text + "; give a later time, or another --system");
 }
 
-State StateOf(Store& store, const std::string& text, const Options& options) {
+State StateOf(Store& store, const std::string& text, const DiffOptions& options) {
     const auto stored = store.StateAt(VisitNamed(store, text, options));
     if (!stored) {
         throw Failure(kExitUsage, "the store has no visit " + text + "; take one from its visits");
@@ -158,7 +158,7 @@ private:
     bool different_ = false;
 };
 
-int Diff(const Options& options) {
+int Diff(const DiffOptions& options) {
     State before, after;
     if (options.store) {
         Store store(*options.store);
@@ -182,7 +182,7 @@ int Diff(const Options& options) {
 Command AddDiffCommand(CLI::App* program) {
     CLI::App* const command = program->add_subcommand(
         "diff", "Tell what changed between two saved reports, or two visits of a store");
-    const auto options = std::make_shared<Options>();
+    const auto options = std::make_shared<DiffOptions>();
     command
         ->add_option("FILE", options->sides,
                      "The earlier report of --format json, and the later one; with --store two "

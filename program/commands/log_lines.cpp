@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 
+#include <CLI/CLI.hpp>
 #include <algorithm>
 #include <cerrno>
 #include <iterator>

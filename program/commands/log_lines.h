@@ -1,6 +1,5 @@
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <cstdio>
 #include <functional>
 #include <memory>
@@ -11,6 +10,10 @@
 
 #include "host/core/host.h"
 #include "tqr/log.h"
+
+namespace CLI {
+class App;
+}
 
 namespace ipmisel {
 

@@ -1,5 +1,6 @@
 #include "program/commands/plugins.h"
 
+#include <CLI/CLI.hpp>
 #include <filesystem>
 #include <system_error>
 

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <memory>
 #include <span>
 #include <string>
@@ -8,6 +7,10 @@
 #include <vector>
 
 #include "host/core/plugin_set.h"
+
+namespace CLI {
+class App;
+}
 
 namespace ipmisel {
 

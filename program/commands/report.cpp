@@ -15,13 +15,13 @@
 namespace ipmisel {
 namespace {
 
-struct Options {
+struct SavedOptions {
     std::string file;
     ReportOptions report;
     std::vector<std::string> plugins;
 };
 
-int WriteSaved(const Options& options) {
+int WriteSaved(const SavedOptions& options) {
     const SavedReport saved(options.file);
     const FormatInfo& format = *FindFormat(options.report.format);
     ReportOutput output(options.report);
@@ -43,7 +43,7 @@ int WriteSaved(const Options& options) {
     return OutcomeOf(saved.End()).exitStatus;
 }
 
-int Report(const Options& options) {
+int Report(const SavedOptions& options) {
     if (!IsCapture(options.file)) return WriteSaved(options);
     CollectOptions replay;
     replay.access.sources = {"replay:" + options.file};
@@ -57,7 +57,7 @@ int Report(const Options& options) {
 Command AddReportCommand(CLI::App* program) {
     CLI::App* const command =
         program->add_subcommand("report", "Write a saved report or a capture in another format");
-    const auto options = std::make_shared<Options>();
+    const auto options = std::make_shared<SavedOptions>();
     command->add_option("FILE", options->file, "Report of --format json, or capture of --record")
         ->required()
         ->check(FileName());

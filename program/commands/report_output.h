@@ -1,6 +1,5 @@
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <cstddef>
 #include <memory>
 #include <optional>
@@ -10,6 +9,10 @@
 #include "program/reports/output_file.h"
 #include "program/reports/report.h"
 #include "program/reports/terminal.h"
+
+namespace CLI {
+class App;
+}
 
 namespace ipmisel {
 

@@ -77,7 +77,7 @@ constexpr std::string_view kThreshold[] = {
     "Upper Non-recoverable - going low", "Upper Non-recoverable - going high"};
 constexpr std::string_view kUsage[] = {"Transition to Idle", "Transition to Active",
                                        "Transition to Busy"};
-constexpr std::string_view kState[] = {"State Deasserted", "State Asserted"};
+constexpr std::string_view kDiscreteState[] = {"State Deasserted", "State Asserted"};
 constexpr std::string_view kPredictive[] = {"Predictive Failure deasserted",
                                             "Predictive Failure asserted"};
 constexpr std::string_view kLimit[] = {"Limit Not Exceeded", "Limit Exceeded"};
@@ -115,7 +115,7 @@ constexpr std::array<std::span<const std::string_view>, 13> kEntryCodes{
     std::span<const std::string_view>{},
     kThreshold,
     kUsage,
-    kState,
+    kDiscreteState,
     kPredictive,
     kLimit,
     kPerformance,
