@@ -20,6 +20,7 @@
 #include "program/commands/diff.h"
 #include "program/commands/doctor.h"
 #include "program/commands/failure.h"
+#include "program/commands/out_of_memory.h"
 #include "program/commands/report.h"
 #include "program/commands/watch.h"
 #include "program/fleet/worker.h"
@@ -68,7 +69,7 @@ void RefuseUnknownCommand(const std::vector<Command>& commands, int argc, char**
 
 std::string OwnError(const std::exception& error) {
     if (dynamic_cast<const std::bad_alloc*>(&error) != nullptr) {
-        return "out of memory; give the program more, or collect fewer classes at a time";
+        return std::string(kOutOfMemory) + "; " + kOutOfMemoryAdvice;
     }
     return std::string("ended by an error of its own: ") + error.what();
 }
@@ -128,6 +129,7 @@ int Run(int argc, char** argv) {
 
 int RunProgram(int argc, char** argv) {
     std::signal(SIGPIPE, SIG_IGN);  // a reader that leaves shows as a write error
+    PrepareForOutOfMemory();
     try {
         return Run(argc, argv);
     } catch (const Failure& failure) {

@@ -25,6 +25,7 @@
 #include "program/commands/failure.h"
 #include "program/commands/log_lines.h"
 #include "program/commands/named_files.h"
+#include "program/commands/out_of_memory.h"
 #include "program/commands/plugins.h"
 #include "program/commands/stop_signals.h"
 #include "program/commands/text_file.h"
@@ -383,6 +384,10 @@ Outcome CollectOutcome(const CollectOptions& options) {
     ReportOutput output(options.report);
     Outcome outcome = CollectTo(options, log, output);
     log.Finish();
+    if (HasRunOutOfMemory()) {
+        outcome.problem = std::string(kOutOfMemory) + ": " + outcome.problem;
+        outcome.advice = kOutOfMemoryAdvice;
+    }
     return outcome;
 }
 

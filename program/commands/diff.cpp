@@ -200,7 +200,11 @@ Command AddDiffCommand(CLI::App* program) {
         "  0  nothing changed\n"
         "  1  something did\n"
         "  2  wrong usage, or a report or store cannot be read\n");
-    return {command, [options] { return Diff(*options); }};
+    return {command, [options] { return Diff(*options); },
+            [](const Failure& failure) {
+                Say(failure.what());
+                return kExitUsage;  // whatever it is: 1 would say that they differ
+            }};
 }
 
 }  // namespace ipmisel

@@ -1,5 +1,7 @@
 #include "program/store/database.h"
 
+#include <exception>
+
 #include "program/commands/failure.h"
 #include "program/reports/terminal_text.h"
 
@@ -35,8 +37,8 @@ Transaction::~Transaction() {
     if (!open_) return;
     try {
         database_.Query("ROLLBACK");
-    } catch (const Failure&) {
-        // What broke the connection has undone it.
+    } catch (const std::exception&) {
+        // What broke the connection has undone it; so does its end.
     }
 }
 

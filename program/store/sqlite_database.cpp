@@ -8,6 +8,7 @@
 #include <chrono>
 #include <cstring>
 #include <map>
+#include <new>
 #include <thread>
 
 #include "program/commands/failure.h"
@@ -22,6 +23,7 @@ namespace {
 #define IPMISEL_SQLITE_FUNCTIONS(use)  \
     use(sqlite3_open_v2);              \
     use(sqlite3_close);                \
+    use(sqlite3_errcode);              \
     use(sqlite3_errmsg);               \
     use(sqlite3_busy_timeout);         \
     use(sqlite3_prepare_v2);           \
@@ -113,12 +115,8 @@ public:
                 row.push_back(Column(statement, i));
             }
         }
-        if (result != SQLITE_DONE) {
-            const std::string problem = sqlite_.sqlite3_errmsg(handle_);
-            sqlite_.sqlite3_reset(statement);
-            Fail(problem);
-        }
         sqlite_.sqlite3_reset(statement);
+        if (result != SQLITE_DONE) Fail();
         sqlite_.sqlite3_clear_bindings(statement);
         return rows;
     }
@@ -130,7 +128,11 @@ private:
         throw Failure(kExitUsage, "the store " + uri_ + " cannot be used: " + problem +
                                       "; correct that, or name another file with --store");
     }
-    [[noreturn]] void Fail() const { Fail(sqlite_.sqlite3_errmsg(handle_)); }
+    /// With what the last call found; to reset its statement leaves that as it is.
+    [[noreturn]] void Fail() const {
+        if (sqlite_.sqlite3_errcode(handle_) == SQLITE_NOMEM) throw std::bad_alloc();
+        Fail(sqlite_.sqlite3_errmsg(handle_));
+    }
 
     /// SQLite would make it with what the umask leaves.
     void MakeFile(const std::string& file) const {
@@ -150,11 +152,10 @@ private:
         for (;;) {
             sqlite3_stmt* const statement = Statement("PRAGMA journal_mode = WAL");
             const int result = sqlite_.sqlite3_step(statement);
-            const std::string problem = sqlite_.sqlite3_errmsg(handle_);
             sqlite_.sqlite3_reset(statement);
             if (result == SQLITE_ROW) return;
             const bool busy = result == SQLITE_BUSY || result == SQLITE_LOCKED;
-            if (!busy || std::chrono::steady_clock::now() > until) Fail(problem);
+            if (!busy || std::chrono::steady_clock::now() > until) Fail();
             std::this_thread::sleep_for(std::chrono::milliseconds(10));
         }
     }
@@ -195,6 +196,7 @@ private:
                 return std::int64_t{sqlite_.sqlite3_column_int64(statement, index)};
             default: {
                 const auto* const text = sqlite_.sqlite3_column_text(statement, index);
+                if (text == nullptr) throw std::bad_alloc();
                 const int bytes = sqlite_.sqlite3_column_bytes(statement, index);
                 return std::string(reinterpret_cast<const char*>(text),
                                    static_cast<std::size_t>(bytes));

@@ -85,6 +85,46 @@ TEST_F(Load, TwoSecondsAnAnswerEndAtTheDeadlineAndCanBeWatched) {
     EXPECT_THAT(ended.out, HasSubstr("deadline"));
 }
 
+TEST_F(Load, OutOfMemoryIsOneLineWhereverItIs) {
+#ifdef __SANITIZE_ADDRESS__
+    GTEST_SKIP() << "AddressSanitizer takes more address space than the limits leave";
+#endif
+    const std::string log = Write(Server(10000));
+    Json server = Server();
+    for (int i = 0; i < 50000; ++i) server["smbios"].push_back(std::string(100, '0'));
+    const std::string wide = "sim:" + folder.Write("wide.json", server.dump());
+    const std::string saved = (folder.path() / "saved").string();
+    const std::string capture = (folder.path() / "capture").string();
+    const std::string store = "sqlite:" + (folder.path() / "store").string();
+    const Ended good = Collect(log, {"--format", "json", "--output", saved, "--record", capture});
+    ASSERT_EQ(good.exitStatus, 0) << good.err;
+    const std::vector<std::string> commands[] = {
+        {"collect", "--from", wide, "--output", InPlace("report")},
+        {"collect", "--from", log, "--output", InPlace("report"), "--format", "html"},
+        {"collect", "--from", "replay:" + capture, "--output", InPlace("report"), "--log-level",
+         "error"},
+        {"collect", "--from", log, "--output", InPlace("report"), "--store", store},
+        {"check", "--from", wide},
+        {"diff", saved, saved}};
+    unsigned ranOut = 0;
+    for (const auto& command : commands) {
+        for (const char* kilobytes : {"18000", "25000", "33000", "46000"}) {
+            std::vector<std::string> run{"/bin/sh", "-c", "ulimit -v $0; exec \"$@\"", kilobytes,
+                                         IPMISEL_PROGRAM};
+            run.insert(run.end(), command.begin(), command.end());
+            const Ended ended = RunningProgram(folder.path().string(), run).Wait();
+            const std::string shown = ::testing::PrintToString(run) + ended.err + ended.out;
+            EXPECT_EQ(ended.signal, 0) << shown;
+            if (ended.err.find("memory") == std::string::npos) continue;
+            ++ranOut;
+            EXPECT_THAT(ended.exitStatus, ::testing::AnyOf(command[0] == "diff" ? 2 : 1, 3))
+                << shown;
+            EXPECT_EQ(std::count(ended.err.begin(), ended.err.end(), '\n'), 1) << shown;
+        }
+    }
+    EXPECT_GE(ranOut, std::size(commands));
+}
+
 class Memory : public MachineTest {};
 
 TEST_F(Memory, AHundredCollectionsLeaveNothingBehind) {

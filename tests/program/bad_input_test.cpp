@@ -161,24 +161,6 @@ TEST_F(BadInput, APluginThatIsCutShortIsRefused) {
     ExpectRefused(Good({"--plugin", pipe.string()}), 2, "it is no file");
 }
 
-TEST_F(BadInput, OutOfMemoryIsOneLine) {
-#ifdef __SANITIZE_ADDRESS__
-    GTEST_SKIP() << "AddressSanitizer takes more address space than the limit leaves";
-#endif
-    Json server = Server();
-    server["smbios"] = Json::array();
-    for (int i = 0; i < 100000; ++i) server["smbios"].push_back(std::string(500, '0'));
-    const std::string source = Write(server);
-    const Ended ended =
-        RunningProgram(folder.path().string(),
-                       {"/bin/sh", "-c", "ulimit -v 100000; exec \"$@\"", "sh", IPMISEL_PROGRAM,
-                        "collect", "--from", source, "--output", InPlace("report")})
-            .Wait();
-    EXPECT_EQ(ended.exitStatus, 3) << ended.signal;
-    EXPECT_THAT(ended.err, MatchesRegex("ipmisel: [^\n]*memory[^\n]*; [^\n]+\n"));
-    EXPECT_THAT(Left(), IsEmpty());
-}
-
 TEST_F(BadInput, NamesOf255BytesAreWritten) {
     const std::string name(255, 'n');
     EXPECT_EQ(Collect(Write(Server()), {"--output", InPlace(name)}).exitStatus, 0);
