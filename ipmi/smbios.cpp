@@ -192,4 +192,27 @@ std::optional<SmbiosMemoryDevice> ReadSmbiosMemoryDevice(Bytes structure) {  // 
     return device;
 }
 
+std::optional<SmbiosIpmiDevice> ReadSmbiosIpmiDevice(Bytes structure) {  // 7.39
+    constexpr std::size_t kLeast = 0x10;
+    constexpr std::size_t kInterfaceAt = 0x04;
+    constexpr std::size_t kAddressAt = 0x08;
+    constexpr std::size_t kModifierAt = 0x10;
+    constexpr std::uint8_t kOddAddress = 0x10;
+    const Bytes area = Formatted(structure, kSmbiosIpmiDevice, kLeast);
+    if (area.empty()) return std::nullopt;
+    SmbiosIpmiDevice device;
+    if (area[kInterfaceAt] <= static_cast<std::uint8_t>(SmbiosIpmiDevice::Interface::kSsif)) {
+        device.interface = static_cast<SmbiosIpmiDevice::Interface>(area[kInterfaceAt]);
+    }
+    ipmisel::ByteReader in(area.subspan(kAddressAt));
+    const std::uint64_t low = in.U32();
+    device.address = low | static_cast<std::uint64_t>(in.U32()) << 32;
+    if (device.interface == SmbiosIpmiDevice::Interface::kSsif) return device;
+    // Bit 0 is the space; the address's own bit 0 stands in the modifier.
+    device.isIo = (device.address & 1) != 0;
+    device.address &= ~std::uint64_t{1};
+    if (area.size() > kModifierAt && (area[kModifierAt] & kOddAddress) != 0) ++device.address;
+    return device;
+}
+
 }  // namespace ipmi

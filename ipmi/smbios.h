@@ -74,11 +74,20 @@ struct SmbiosMemoryDevice {
     bool isInstalled() const { return sizeMiB != 0U; }
 };
 
+/// Where the firmware says that the BMC's system interface is.
+struct SmbiosIpmiDevice {
+    enum class Interface : std::uint8_t { kUnknown, kKcs, kSmic, kBlockTransfer, kSsif };
+    Interface interface {};
+    bool isIo = false;          ///< in I/O space, else in memory
+    std::uint64_t address = 0;  ///< of SSIF its slave address, in bits 7 to 1
+};
+
 /// Each reads a structure of its type, string set included; empty for another type, and for one
 /// that ends before what is always there.
 std::optional<SmbiosSystem> ReadSmbiosSystem(std::span<const std::uint8_t> structure);
 std::optional<SmbiosProcessor> ReadSmbiosProcessor(std::span<const std::uint8_t> structure);
 std::optional<SmbiosSlot> ReadSmbiosSlot(std::span<const std::uint8_t> structure);
 std::optional<SmbiosMemoryDevice> ReadSmbiosMemoryDevice(std::span<const std::uint8_t> structure);
+std::optional<SmbiosIpmiDevice> ReadSmbiosIpmiDevice(std::span<const std::uint8_t> structure);
 
 }  // namespace ipmi

@@ -182,7 +182,7 @@ RmcpBmc::Session* RmcpBmc::Find(const Packet& managedId) {
 
 Packet RmcpBmc::Answer(const Packet& packet, bool busy) {
     if (packet.size() < kHeader || packet[3] != 0x07) return {};
-    if (packet[4] == 0x00) return Capabilities(packet);
+    if (packet[4] == 0x00) return Sessionless(packet);
     const Packet payload =
         Cut(packet, kHeader, packet[14] | static_cast<std::size_t>(packet[15]) << 8);
     switch (packet[5]) {
@@ -198,13 +198,27 @@ Packet RmcpBmc::Answer(const Packet& packet, bool busy) {
 }
 
 /// In a packet of IPMI 1.5, which wants no session.
-Packet RmcpBmc::Capabilities(const Packet& packet) const {
+Packet RmcpBmc::Sessionless(const Packet& packet) const {
     const Packet message = Cut(packet, 14);
-    if (message.size() < 9 || message[5] != 0x38) return {};
+    if (message.size() < 9) return {};
     const std::uint8_t status = options_.kg.empty() ? 0x04 : 0x24;
     const std::uint8_t versions = options_.deviations.noIpmi20 ? 0x01 : 0x03;
-    const Packet reply = Reply(message, {0, 1, 0x80, status, versions, 0, 0, 0, 0});
+    Packet data;
+    if (message[5] == 0x38) data = {0, 1, 0x80, status, versions, 0, 0, 0, 0};
+    if (message[5] == 0x54 && message[8] == 0x80) data = ListedSuites();  // the first answer
+    if (data.empty()) return {};
+    const Packet reply = Reply(message, data);
     return Join({Cut(packet, 0, 13), Number(static_cast<std::uint32_t>(reply.size()), 1), reply});
+}
+
+/// Records of a list by suite (22.15.2); no more of them than one answer holds.
+Packet RmcpBmc::ListedSuites() const {
+    Packet data;
+    if (!options_.listedSuites.empty()) data = {0, 1};
+    for (const std::uint8_t suite : options_.listedSuites) {
+        data = Join({data, {0xC0, suite, 0x00, 0x40, 0x80}});
+    }
+    return data;
 }
 
 Packet RmcpBmc::OpenSession(const Packet& payload) {
@@ -213,6 +227,9 @@ Packet RmcpBmc::OpenSession(const Packet& payload) {
     if (payload[12] != ours.authentication || payload[20] != ours.integrity ||
         payload[28] != ours.confidentiality) {
         return Setup(0x11, Join({tag, {0x11, 0, 0}, Cut(payload, 4, 4)}));
+    }
+    if (!options_.hasFreeSession) {
+        return Setup(0x11, Join({tag, {0x01, 0, 0}, Cut(payload, 4, 4)}));
     }
     if (sessions_.size() >= kMaxSessions) Expire();
     auto session = std::make_unique<Session>();
@@ -235,6 +252,9 @@ Packet RmcpBmc::Rakp2(const Packet& payload) {
     Packet known = Text(kUser);
     if (options_.deviations.paddedUserName) known.resize(kPaddedName);
     if (name != known) return Setup(0x13, Join({tag, {0x0D, 0, 0}, s->consoleId}));
+    if ((payload[24] & 0x0F) > options_.maxPrivilege) {
+        return Setup(0x13, Join({tag, {0x0A, 0, 0}, s->consoleId}));
+    }
     s->consoleRandom = Cut(payload, 8, 16);
     s->bmcRandom = Packet(16, static_cast<std::uint8_t>(sessionsOpened_));
     s->who = s->whoInRakp3 = Join({Cut(payload, 24, 1), Cut(payload, 27, 1), name});

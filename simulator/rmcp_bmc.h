@@ -39,6 +39,9 @@ public:
         /// more behind it (6.12.13).
         unsigned sequenceWindow = 15;
         RmcpDeviations deviations{};
+        std::vector<std::uint8_t> listedSuites{};  ///< told without a session; none: not told
+        std::uint8_t maxPrivilege = 4;             ///< that its user may have
+        bool hasFreeSession = true;
     };
 
     RmcpBmc(BmcDescription bmc, Options options);
@@ -66,7 +69,8 @@ private:
     struct Session;
     class Crypto;
 
-    Packet Capabilities(const Packet& packet) const;
+    Packet Sessionless(const Packet& packet) const;
+    Packet ListedSuites() const;
     Packet OpenSession(const Packet& payload);
     Packet Rakp2(const Packet& payload);
     Packet Rakp4(const Packet& payload);

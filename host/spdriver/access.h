@@ -14,11 +14,14 @@
 
 namespace NQORTQR20 {
 
+/// What a BMC took exception to when a session was to be opened.
+enum class Refusal { kOther, kUser, kPassword, kKey, kPrivilege };
+
 /// Why a source could not be opened; what() is one line for the user that says what to do.
 struct SourceError : std::runtime_error {
-    explicit SourceError(const std::string& line, bool forCredentials = false)
-        : std::runtime_error(line), credentials(forCredentials) {}
-    bool credentials;  ///< a BMC took exception to user, password or key
+    explicit SourceError(const std::string& line, Refusal what = Refusal::kOther)
+        : std::runtime_error(line), refusal(what) {}
+    Refusal refusal;  ///< of the first source
 };
 /// The sources are named wrongly: a kind that is not known, kinds that do not go together, or
 /// options that no BMC could be opened with.

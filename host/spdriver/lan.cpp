@@ -96,10 +96,10 @@ Source OpenLan(const std::vector<std::string>& places, const Access& access) {
     }
     Source source;
     source.facts.ipmiLan = true;
-    bool ofCredentials = false;
+    Refusal refusal = Refusal::kOther;
     for (Candidate& candidate : candidates) {
         if (const auto error = ErrorOf(candidate)) {
-            ofCredentials |= IsOfCredentials(*error);
+            if (source.unreachable.empty()) refusal = RefusalOf(*error);
             source.unreachable.push_back({candidate.name, Advice(candidate.name, *error)});
         } else {
             source.nodes.push_back({candidate.name, nullptr, std::move(candidate.session)});
@@ -110,7 +110,7 @@ Source OpenLan(const std::vector<std::string>& places, const Access& access) {
         for (const UnreachableNode& node : source.unreachable) {
             reasons += (reasons.empty() ? "" : "\n") + node.reason;
         }
-        throw SourceError(reasons, ofCredentials);
+        throw SourceError(reasons, refusal);
     }
     return source;
 }

@@ -118,6 +118,32 @@ TEST(Smbios, ReadsAProcessorAndASlot) {
     EXPECT_FALSE(ReadSmbiosSlot(without)->address);
 }
 
+TEST(Smbios, TellsWhereTheBmcIs) {
+    using enum SmbiosIpmiDevice::Interface;
+    // Interface, revision, slave address, NVRAM, base address, modifier, interrupt.
+    const struct {
+        std::initializer_list<std::uint8_t> fields;
+        SmbiosIpmiDevice::Interface interface;
+        bool isIo;
+        std::uint64_t address;
+    } cases[] = {
+        {{1, 0x20, 0x20, 0xFF, 0xA3, 0x0C, 0, 0, 0, 0, 0, 0, 0x00, 0}, kKcs, true, 0xCA2},
+        {{3, 0x20, 0x20, 0xFF, 0xE5, 0, 0, 0, 0, 0, 0, 0, 0x10, 0}, kBlockTransfer, true, 0xE5},
+        {{1, 0x20, 0x20, 0xFF, 0x00, 0x10, 0, 0xF0, 1, 0, 0, 0}, kKcs, false, 0x1F0001000},
+        {{4, 0x20, 0x20, 0xFF, 0x21, 0, 0, 0, 0, 0, 0, 0, 0x00, 0}, kSsif, false, 0x21},
+        {{9, 0x20, 0x20, 0xFF, 0xA3, 0x0C, 0, 0, 0, 0, 0, 0}, kUnknown, true, 0xCA2},
+    };
+    for (const auto& c : cases) {
+        const auto device = ReadSmbiosIpmiDevice(SmbiosStructure(38, c.fields, {}));
+        ASSERT_TRUE(device);
+        EXPECT_EQ(device->interface, c.interface);
+        EXPECT_EQ(device->isIo, c.isIo) << c.address;
+        EXPECT_EQ(device->address, c.address);
+    }
+    EXPECT_FALSE(
+        ReadSmbiosIpmiDevice(SmbiosStructure(38, {1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11}, {})));
+}
+
 TEST(Smbios, WhatFirmwareWritesForUnknownIsEmpty) {
     for (const std::string_view text :
          {"Not Specified", "NO DIMM", "unknown", "   ", "To Be Filled By O.E.M."}) {

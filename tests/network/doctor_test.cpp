@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <array>
 #include <cstdlib>
 #include <ctime>
@@ -54,12 +55,20 @@ Finding ExamineBmc(const ipmisim::RmcpBmc::Options& options,
 }
 
 TEST(Doctor, ABmcWithoutFaultIsWell) {
-    const Finding found = ExamineBmc({});
+    ipmisim::BmcDescription bmc = Bmc();
+    // A compact record: owner, LUN and number of the sensor after the header.
+    std::vector<std::uint8_t> sensor(32, 0);
+    std::copy_n(std::array<std::uint8_t, 8>{1, 0, 0x51, 2, 27, 0x20, 0, 0x31}.begin(), 8,
+                sensor.begin());
+    bmc.sdrRecords = {sensor};
+    const NetworkBmc peer(std::move(bmc), {.options = {.listedSuites = {3, 17}}});
+    const Finding found = Examine({peer.Place(), "--user", ipmisim::kUser});
     EXPECT_EQ(found.exitStatus, 0) << found.lines;
     EXPECT_THAT(found.lines,
                 AllOf(ContainsRegex("ok +session +opened in"),
-                      ContainsRegex("ok +cipher suites opened +17\n"),
-                      ContainsRegex("ok +privileges +user, operator, admin\n"),
+                      ContainsRegex("ok +cipher suite 17 +opens for user, operator, admin\n"),
+                      ContainsRegex("- +cipher suite 3 +listed, but the BMC opens no"),
+                      ContainsRegex("- +Get Sensor Reading +requested sensor"),
                       ContainsRegex("ok +sessions at a time +4 or more"),
                       ContainsRegex("ok +clock +[+-][0-9] s"), Not(HasSubstr("WRONG"))));
 }
@@ -76,6 +85,8 @@ TEST(Doctor, AKnownDeviationIsRecognisedByTheWorkaroundThatHelps) {
         {{.noIpmi20 = true}, "authcap"},
         {{.badChecksums = true}, "nochecksumcheck"},
         {{.numbers = Numbers::kStandStill}, "sessionnumbers"},
+        {{.numbers = Numbers::kZero}, "sessionnumbers"},
+        {{.longRakp2Code = true, .noPrivilege = true}, "sun20"},
     };
     for (const auto& c : cases) {
         const Finding found = ExamineBmc({.deviations = c.deviations});
@@ -94,7 +105,8 @@ TEST(Doctor, WhatIsRefusedIsSaidAndWhatToDo) {
         const char* password;
         const char* line;
     } cases[] = {
-        {{}, {}, "wrong", "session +[^\n]*wrong password"},
+        {{}, {}, "wrong", "session +[^\n]*wrong password(.|\n)*user or password +the password"},
+        {{.hasFreeSession = false}, {}, ipmisim::kPassword, "session +[^\n]*no free session"},
         {{}, {"--user", "nobody"}, ipmisim::kPassword, "session +[^\n]*does not know the user"},
         {{.kg = "another key"}, {}, ipmisim::kPassword, "session +[^\n]*--kg-file"},
         {{.cipherSuite = 2}, {}, ipmisim::kPassword, "session +[^\n]*--cipher-suite"},
@@ -142,6 +154,38 @@ TEST(Doctor, APlaceThatIsNotReachedIsStatusThree) {
     EXPECT_EQ(found.exitStatus, 3);
     EXPECT_THAT(found.lines, ContainsRegex("WRONG +port +[^\n]*no answer"));
     EXPECT_EQ(Examine({"lan:::1"}).exitStatus, 2);
+}
+
+TEST(Doctor, ASuiteOrAPrivilegeThatIsMissingIsNamed) {
+    const Finding user = ExamineBmc({.maxPrivilege = 3});
+    EXPECT_EQ(user.exitStatus, 4);
+    EXPECT_THAT(user.lines, AllOf(ContainsRegex("WRONG +privilege +[^\n]*--privilege operator"),
+                                  ContainsRegex("cipher suite 17 +opens for user, operator; not "
+                                                "for admin")));
+    const Finding open = ExamineBmc({.cipherSuite = 2, .listedSuites = {0, 2}},
+                                    {"--workaround", "authcap", "--cipher-suite", "2"});
+    EXPECT_EQ(open.exitStatus, 4);
+    EXPECT_THAT(open.lines, ContainsRegex("WRONG +cipher suite 0 +[^\n]*disable it"));
+}
+
+TEST(Doctor, MoreRequestsThanTheBmcCanTakeAreFound) {
+    const NetworkBmc peer(Bmc(), {.service = {.mostOutstanding = 4, .refusesWhenFull = true}});
+    const Finding found = Examine({peer.Place(), "--user", ipmisim::kUser});
+    EXPECT_THAT(found.lines, ContainsRegex("requests at a time +[124]: "));
+}
+
+TEST(Doctor, ABmcThatAnswersWithATimeoutHangs) {
+    ipmisim::BmcDescription bmc = Bmc();
+    bmc.faults.push_back({.netFn = 0x06,
+                          .command = 0x01,
+                          .call = {},
+                          .kind = ipmisim::Fault::Kind::kCompletionCode,
+                          .completionCode = 0xC3,
+                          .data = {}});
+    const NetworkBmc peer(std::move(bmc), {});
+    const Finding found = Examine({peer.Place(), "--user", ipmisim::kUser});
+    EXPECT_EQ(found.exitStatus, 3);
+    EXPECT_THAT(found.lines, ContainsRegex("WRONG +Get Device ID +timeout[^\n]*reset it"));
 }
 
 TEST(Doctor, WhatTheBmcLacksOrRefusesIsSaid) {

@@ -21,9 +21,11 @@ constexpr std::array kAdvice = std::to_array<Row>({
      "a time"},
     {OpeningError::kNetwork, "the system reports an error; check the network"},
     {OpeningError::kPortClosed,
-     "nobody listens there; check the address and the port, and that IPMI over LAN is enabled"},
+     "nobody listens there, or a firewall refuses; check the address and the port, and that IPMI "
+     "over LAN is enabled"},
     {OpeningError::kNoAnswer,
-     "no answer; check the address and the port, and that IPMI over LAN is enabled"},
+     "no answer; check the address and the port, the firewalls on the way, and that IPMI over LAN "
+     "is enabled"},
     {OpeningError::kNoIpmi20,
      "the BMC does not speak IPMI 2.0; enable it there, or try --workaround authcap"},
     {OpeningError::kNoCipherSuite,
@@ -38,7 +40,9 @@ constexpr std::array kAdvice = std::to_array<Row>({
     {OpeningError::kPrivilegeRefused,
      "the user may not have the privilege asked for; try --privilege operator, or --workaround "
      "opensesspriv"},
-    {OpeningError::kBusy, "the BMC is busy or has no free session; try again"},
+    {OpeningError::kBusy,
+     "the BMC is busy or has no free session; end the sessions of others, or try again in a "
+     "minute"},
     {OpeningError::kRefused,
      "the BMC refuses the session; try another --cipher-suite or a --workaround"},
     {OpeningError::kProtocolBroken,
@@ -57,6 +61,23 @@ constexpr bool IsInOrder() {
 static_assert(IsInOrder(), "a row for each error, in their order");
 
 }  // namespace
+
+NQORTQR20::Refusal RefusalOf(OpeningError error) {
+    using NQORTQR20::Refusal;
+    switch (error) {
+        case OpeningError::kUserUnknown:
+            return Refusal::kUser;
+        case OpeningError::kPasswordWrong:
+        case OpeningError::kSilentAtPassword:
+            return Refusal::kPassword;
+        case OpeningError::kKgWrong:
+            return Refusal::kKey;
+        case OpeningError::kPrivilegeRefused:
+            return Refusal::kPrivilege;
+        default:
+            return Refusal::kOther;
+    }
+}
 
 std::string Advice(const std::string& place, OpeningError error) {
     return place + ": " + std::string(kAdvice[static_cast<std::size_t>(error)].advice);

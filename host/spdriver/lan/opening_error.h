@@ -2,6 +2,8 @@
 
 #include <string>
 
+#include "host/spdriver/access.h"
+
 namespace tqrhost {
 
 /// Why a session with a BMC cannot be opened.
@@ -26,11 +28,8 @@ enum class OpeningError {
     kStopped,
 };
 
-/// User, password or key are not what the BMC has.
-constexpr bool IsOfCredentials(OpeningError error) {
-    return error == OpeningError::kUserUnknown || error == OpeningError::kPasswordWrong ||
-           error == OpeningError::kSilentAtPassword || error == OpeningError::kKgWrong;
-}
+/// What of the credentials is not what the BMC has, if it is that.
+NQORTQR20::Refusal RefusalOf(OpeningError error);
 
 /// One line for the user: what failed at `place` and what to do.
 std::string Advice(const std::string& place, OpeningError error);

@@ -7,6 +7,14 @@
 #include <utility>
 
 namespace tqrhost {
+namespace {
+
+/// The port is closed, or a firewall on the way or on this machine says no.
+bool IsRefusal(int error) {
+    return error == ECONNREFUSED || error == EHOSTUNREACH || error == EPERM || error == EACCES;
+}
+
+}  // namespace
 
 UdpSocket::UdpSocket(std::span<const Endpoint> endpoints) : rooms_(std::make_unique<Rooms>()) {
     OpeningError error = OpeningError::kNetwork;
@@ -51,7 +59,7 @@ void UdpSocket::Send(std::span<const rmcpplus::Packet> packets) {
         }
         const int sent = sendmmsg(fd_, messages.data(), static_cast<unsigned>(count), 0);
         if (sent < 0 && errno == EINTR) continue;
-        if (sent < 0 && errno == ECONNREFUSED) refused_ = true;
+        if (sent < 0 && IsRefusal(errno)) refused_ = true;
         // The refusal of an earlier packet is reported instead of sending the next one, once.
         packets = packets.subspan(sent > 0 ? static_cast<std::size_t>(sent) : 1);
     }
@@ -61,7 +69,7 @@ std::span<const ByteView> UdpSocket::Receive() {
     for (;;) {
         const int count = recvmmsg(fd_, rooms_->messages.data(), kBatch, MSG_DONTWAIT, nullptr);
         if (count < 0 && errno == EINTR) continue;
-        if (count < 0 && errno == ECONNREFUSED) refused_ = true;
+        if (count < 0 && IsRefusal(errno)) refused_ = true;
         if (count <= 0) return {};
         for (std::size_t i = 0; i < static_cast<std::size_t>(count); ++i) {
             rooms_->packets[i] = ByteView(rooms_->bytes[i]).first(rooms_->messages[i].msg_len);
