@@ -18,6 +18,11 @@ _ipmisel_takes() {
     sed -n "s/^  \(-[^ ]*,\)\{0,1\}$2 \([A-Z].*\)\$/\2/p" <<<"$1" | head -n 1
 }
 
+# The hosts of the configuration, and its groups as %NAME.
+_ipmisel_hosts() {
+    "${COMP_WORDS[0]}" config --hosts 2>/dev/null | head -n 1000
+}
+
 # The words that begin with $2 and may stand for what an option takes.
 _ipmisel_values() {
     local takes=$1 word=$2
@@ -29,6 +34,7 @@ _ipmisel_values() {
         ;;
     FILE*) compgen -f -- "$word" ;;
     CLASS*) compgen -W "$("${COMP_WORDS[0]}" classes 2>/dev/null | sed 's/ .*//')" -- "$word" ;;
+    LIST*) compgen -W "$(_ipmisel_hosts)" -- "$word" ;;
     SOURCE*) compgen -W "inband lan: sim: replay:" -- "$word" ;;
     esac
 }
@@ -39,7 +45,11 @@ _ipmisel() {
     COMPREPLY=()
     # The shell takes "sim:FILE" for three words.
     if [[ $word == : || $previous == : ]]; then
-        mapfile -t COMPREPLY < <(compgen -f -- "${word#:}")
+        if [[ $word == : && $previous == lan || ${COMP_WORDS[COMP_CWORD - 2]} == lan ]]; then
+            mapfile -t COMPREPLY < <(compgen -W "$(_ipmisel_hosts | grep -v '^%')" -- "${word#:}")
+        else
+            mapfile -t COMPREPLY < <(compgen -f -- "${word#:}")
+        fi
         return
     fi
     help=$(_ipmisel_help)
@@ -53,5 +63,9 @@ _ipmisel() {
     [[ $help == *Subcommands:* ]] &&
         commands=$(sed '1,/^Subcommands:/d' <<<"$help" | sed -n 's/^  \([a-z][a-z-]*\) .*/\1/p')
     mapfile -t COMPREPLY < <(compgen -W "$commands $options" -- "$word")
+    if [[ $help == *"  SOURCE "* ]]; then
+        mapfile -t -O ${#COMPREPLY[@]} COMPREPLY < <(_ipmisel_values SOURCE "$word")
+        [[ ${#COMPREPLY[@]} -eq 1 && $COMPREPLY == *: ]] && compopt -o nospace 2>/dev/null
+    fi
 }
 complete -o filenames -F _ipmisel ipmisel

@@ -12,6 +12,17 @@ function __ipmisel_help
     $program --help 2>/dev/null
 end
 
+function __ipmisel_hosts
+    $argv[1] config --hosts 2>/dev/null | head -n 1000
+end
+
+function __ipmisel_sources
+    printf '%s\n' inband lan: sim: replay:
+    if string match -q -- 'lan:*' (commandline -ct)
+        printf 'lan:%s\n' (__ipmisel_hosts $argv[1] | string match -v -- '%*')
+    end
+end
+
 function __ipmisel_complete
     set -l words (commandline -opc)
     set -l previous $words[-1]
@@ -28,14 +39,20 @@ function __ipmisel_complete
             case 'CLASS*'
                 $words[1] classes 2>/dev/null | string replace -r ' +' \t
                 return
+            case 'LIST*'
+                __ipmisel_hosts $words[1]
+                return
             case 'SOURCE*'
-                printf '%s\n' inband lan: sim: replay:
+                __ipmisel_sources $words[1]
                 return
             case '?*'
                 return
         end
     end
     string match -rg -- '^  (?:-.,)?(--[a-z-]+)' $help
+    if string match -q -- '  SOURCE *' $help
+        __ipmisel_sources $words[1]
+    end
     if set -l at (contains -i -- Subcommands: $help)
         string match -rg -- '^  ([a-z][a-z-]*) ' $help[(math $at + 1)..-1]
     end

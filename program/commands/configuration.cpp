@@ -9,6 +9,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <memory>
 #include <set>
 #include <sstream>
 #include <string_view>
@@ -247,6 +248,20 @@ std::string Configuration::Text() const {
     return text;
 }
 
+std::string Configuration::HostsText() const {
+    std::string text;
+    std::vector<std::string> lists;
+    for (const NamedGroup& named : groups_) {
+        lists.push_back("%" + named.name);
+        text += lists.back() + "\n";
+    }
+    const auto find = [this](const std::string& name) { return Group(name); };
+    for (const HostEntry& host : ParseHostLists(lists, find)) {
+        text += host.source.substr(host.source.find(':') + 1) + "\n";
+    }
+    return text;
+}
+
 std::vector<std::string> ConfigurationFiles() {
     std::vector<std::string> files;
     const char* const folder = std::getenv("XDG_CONFIG_HOME");
@@ -272,8 +287,11 @@ std::optional<HostGroup> FindConfiguredGroup(const std::string& name) {
 Command AddConfigCommand(CLI::App* program, std::function<Configuration()> configuration) {
     CLI::App* const command = program->add_subcommand(
         "config", "Print the options that files and environment give, and where each is from");
-    return {command, [configuration = std::move(configuration)] {
-                const std::string text = configuration().Text();
+    const auto hosts = std::make_shared<bool>(false);
+    command->add_flag("--hosts", *hosts, "Print the groups and their hosts alone, a line each");
+    return {command, [configuration = std::move(configuration), hosts] {
+                const std::string text =
+                    *hosts ? configuration().HostsText() : configuration().Text();
                 if (std::fwrite(text.data(), 1, text.size(), stdout) != text.size() ||
                     std::fflush(stdout) != 0) {
                     throw Failure(kExitUsage, std::string("cannot write the output: ") +

@@ -37,6 +37,10 @@ public:
     /// What holds, as a file of this kind that says where each line comes from.
     std::string Text() const;
 
+    /// What --hosts may name, a line each: the groups as %NAME, then every host of theirs, without
+    /// "lan:". Throws Failure.
+    std::string HostsText() const;
+
 private:
     struct NamedGroup {
         std::string origin, name;

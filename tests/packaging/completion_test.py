@@ -11,6 +11,7 @@ import shlex
 import shutil
 import subprocess
 import sys
+import tempfile
 import time
 import unittest
 
@@ -26,8 +27,12 @@ CASES = (
     (["ipmisel", "collect", "--format", "j"], {"json"}, {"table"}),
     (["ipmisel", "collect", "--class", "IPMI_E"], {"IPMI_Event", "IPMI_EventLog"}, {"QORSG_IPMIFRU"}),
     (["ipmisel", "collect", "--from", ""], {"inband", "lan:", "sim:", "replay:"}, {"--from"}),
+    (["ipmisel", "collect", "--hosts", ""], {"%rack7", "node1-bmc", "node2-bmc"}, {"--from"}),
+    (["ipmisel", "doctor", ""], {"inband", "lan:", "--user"}, {"--from"}),
     (["ipmisel", "collect", "--output", "READ"], {"README.md"}, {"--from"}),
 )
+# After a colon bash has three words, zsh offers what follows it, and fish the whole word.
+HOSTS = ("node1-bmc", "node2-bmc")
 
 
 def bash(words):
@@ -101,8 +106,19 @@ class Completion(unittest.TestCase):
                 self.assertLessEqual(expected, offered)
                 self.assertFalse(unexpected & offered)
 
+    @classmethod
+    def setUpClass(cls):
+        cls.configuration = tempfile.TemporaryDirectory()
+        pathlib.Path(cls.configuration.name, "ipmisel.conf").write_text("[group.rack7]\nhosts = \"node[1-2]-bmc\"\n")
+        ENVIRONMENT["XDG_CONFIG_HOME"] = cls.configuration.name
+
+    @classmethod
+    def tearDownClass(cls):
+        cls.configuration.cleanup()
+
     def test_bash(self):
         self.offers(bash, "bash")
+        self.assertEqual(bash(["ipmisel", "collect", "--from", "lan", ":", "no"]), list(HOSTS))
 
     def test_zsh(self):
         if shutil.which("zsh") is None:
@@ -110,11 +126,13 @@ class Completion(unittest.TestCase):
         zsh = Zsh()
         try:
             self.offers(zsh, "zsh")
+            self.assertLessEqual(set(HOSTS), set(zsh(["ipmisel", "doctor", "lan:"])))
         finally:
             zsh.close()
 
     def test_fish(self):
         self.offers(fish, "fish")
+        self.assertLessEqual({f"lan:{host}" for host in HOSTS}, set(fish(["ipmisel", "doctor", "lan:"])))
 
 
 if __name__ == "__main__":
