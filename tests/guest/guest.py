@@ -8,12 +8,14 @@ import contextlib
 import os
 import pathlib
 import re
+import select
 import shutil
 import socket
 import struct
 import subprocess
 import sys
 import tempfile
+import threading
 
 sys.path.insert(0, str(pathlib.Path(__file__).resolve().parents[2] / "bench"))
 from lan_peers import wait_for_bmc  # noqa: E402
@@ -119,7 +121,9 @@ mount -t proc proc /proc; mount -t sysfs sys /sys; mount -t devtmpfs dev /dev
 {modules}
 transactions() {{ find /sys/devices -name complete_transactions -exec cat {{}} + || echo 0; }}
 before=$(transactions)
-/opt/bin/ipmisel {arguments} >/tmp/out 2>/tmp/err </dev/null
+{{
+{commands}
+}} >/tmp/out 2>/tmp/err </dev/null
 echo "status $? $(($(transactions) - before))" >/tmp/status
 for part in status err out; do
     echo "@@@ begin $part"; base64 /tmp/$part; echo "@@@ end $part"
@@ -140,14 +144,15 @@ class Run:
         self.err, self.out = parts["err"], parts["out"]
 
 
-def run_guest(build, cache, arguments: str, devices: list[str], load_driver: bool = True) -> Run:
-    """Boots the guest with QEMU devices and runs the program with `arguments` in it."""
+def run_guest(build, cache, arguments: str, devices: list[str], load_driver: bool = True,
+              commands: str = "") -> Run:
+    """Boots the guest with QEMU devices and runs the program with `arguments` in it, or `commands` of its shell."""
     qemu = shutil.which("qemu-system-x86_64")
     if not qemu:
         raise Missing("no qemu-system-x86_64 (package qemu-system-x86)")
     image, modules = kernel(cache)
     load = "\n".join(f"insmod /modules/{module.name}" for module in modules)
-    script = INIT.format(modules=load + "\nsleep 1" if load_driver else "", arguments=arguments)
+    script = INIT.format(modules=load + "\nsleep 1" if load_driver else "", commands=commands or f"/opt/bin/ipmisel {arguments}")
     with tempfile.TemporaryDirectory() as folder:
         root = pathlib.Path(folder) / "initramfs"
         root.write_bytes(initramfs(build, modules, script))
@@ -157,6 +162,39 @@ def run_guest(build, cache, arguments: str, devices: list[str], load_driver: boo
         done = subprocess.run(command, stdin=subprocess.DEVNULL, capture_output=True, check=False,
                               timeout=BOOT_SECONDS)
     return Run(done.stdout.decode(errors="replace"))
+
+
+class FallingSilent:
+    """A BMC at a TCP port for virtual machines, that of another port until the doctor has been through all of its
+    commands so many times; from then on it takes what comes and answers nothing."""
+
+    LAST = bytes([0x04 << 2, 0x13])  # Get PEF Configuration Parameters, the last command but those of a sensor
+
+    def __init__(self, port: int, whole_runs: int):
+        self.target, self.left = port, whole_runs
+        self.listener = socket.create_server(("127.0.0.1", 0))
+        self.port = self.listener.getsockname()[1]
+
+    def __enter__(self):
+        threading.Thread(target=self.serve, daemon=True).start()
+        return self
+
+    def __exit__(self, *_):
+        self.listener.close()
+
+    def serve(self):
+        with contextlib.suppress(OSError):
+            machine, _ = self.listener.accept()
+            with machine, socket.create_connection(("127.0.0.1", self.target)) as bmc:
+                while True:
+                    for ready in select.select([machine, bmc], [], [])[0]:
+                        data = ready.recv(4096)
+                        if not data:
+                            return
+                        if self.left > 0:
+                            (bmc if ready is machine else machine).sendall(data)
+                        if ready is machine and self.LAST in data:
+                            self.left -= 1
 
 
 def free_port(kind=socket.SOCK_STREAM) -> int:

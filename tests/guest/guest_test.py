@@ -108,6 +108,39 @@ class InTheGuest(unittest.TestCase):
         self.assertEqual(run.status, 3, run.err)
         self.assertEqual(len(run.err.splitlines()), 1)
 
+    def test_the_doctor_names_each_piece_that_is_missing(self):
+        whole = r"ok +SMBIOS +announces the BMC \(type 38\) where the driver has it: kcs, i/o 0xca2"
+        found = {  # what the shell does before, the exit status, some of the lines
+            "no module": ("", 3, [r"WRONG +module ipmi_devintf +not loaded; modprobe", r"WRONG +device +no /dev/ipmi0"]),
+            "no interface": ("insmod /modules/ipmi_msghandler.ko; insmod /modules/ipmi_devintf.ko", 3,
+                             [r"ok +module ipmi_devintf", r"WRONG +module of the interface +not loaded"]),
+            "all": ("insmod /modules/ipmi_si.ko; sleep 1", 4,
+                    [r"ok +module of the interface", r"ok +device +/dev/ipmi0", whole, r"ok +Get Device ID +[0-9]",
+                     r"WRONG +clock +never set"]),  # of ipmi_sim, as over the network
+            "another address": ("cp -r /sys/firmware/dmi/tables /tmp/t; xxd -p /tmp/t/DMI | tr -d '\\n' | "
+                                "sed s/a30c0000000000/a90c0000000000/ | xxd -r -p >/tmp/DMI; mv /tmp/DMI /tmp/t/DMI; "
+                                "mount -o bind /tmp/t /sys/firmware/dmi/tables", 4,
+                                [r"WRONG +SMBIOS +.*kcs, i/o 0xca8, the driver has one at kcs, i/o 0xca2;"]),
+            "no SMBIOS": ("umount /sys/firmware/dmi/tables; mount -t tmpfs none /sys/firmware/dmi", 4,
+                          [r"WRONG +SMBIOS +announces no BMC", r"ok +Get Device ID"]),
+            "no device": ("umount /sys/firmware/dmi; mv /dev/ipmi0 /tmp/ipmi0", 3,
+                          [r"WRONG +device +no /dev/ipmi0: the driver found no BMC"]),
+            "no rights": ("mv /tmp/ipmi0 /dev/ipmi0; chmod 600 /dev/ipmi0; AS='su -s /bin/sh nobody -c'", 3,
+                          [r"WRONG +device +/dev/ipmi0: Permission denied; run as root"]),
+            "a silent BMC": ("AS='sh -c'", 3, [r"WRONG +Get Device ID +.*(hangs|no answer)"]),
+        }
+        commands = ("mkdir -p /etc; echo nobody:x:65534:65534::/:/bin/sh >/etc/passwd; AS='sh -c'\n"
+                    "examine() { echo \"== $1\"; $AS '/opt/bin/ipmisel doctor --timeout 10'; echo \"status $?\"; }\n")
+        commands += "".join(f"{before}\nexamine '{name}'\n" for name, (before, _, _) in found.items())
+        with guest.ipmi_sim(SEL, SDRS) as (_, tcp), guest.FallingSilent(tcp, whole_runs=3) as relay:
+            run = self.run_guest("", external(relay.port), load_driver=False, commands=commands)
+        parts = dict(part.split("\n", 1) for part in run.out.split("== ")[1:])
+        for name, (_, status, lines) in found.items():
+            with self.subTest(missing=name):
+                self.assertIn(f"status {status}", parts[name])
+                for line in lines:
+                    self.assertRegex(parts[name], line)
+
 
 if __name__ == "__main__":
     try:
