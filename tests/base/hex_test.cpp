@@ -27,6 +27,7 @@ TEST(Hex, ReadsNothingElse) {
          {"9", "09a", "0 9a", "0/", "0:", "0@", "0G", "0`", "0g", "g0", "+1"}) {
         EXPECT_EQ(ParseHex(text), std::nullopt) << text;
     }
+    EXPECT_EQ(ParseHex(std::string_view("0123").substr(0, 3)), std::nullopt);
 }
 
 }  // namespace ipmisel

@@ -14,7 +14,7 @@ using Bytes = std::vector<std::uint8_t>;
 
 const Bytes kSystem{1,   8,   0x10, 0,   1, 2,   9,   0,  // maker 1, product 2, version 9
                     'A', 'c', 'm',  'e', 0, 'S', '1', ' ', ' ', 0, 0};
-const Bytes kBare{32, 5, 0x11, 0, 7, 0, 0};
+const Bytes kBare{32, 4, 0x11, 0, 0, 0};  // no more than its header
 const Bytes kEnd{127, 4, 0x12, 0, 0, 0};
 
 Bytes Join(std::initializer_list<Bytes> parts) {
@@ -97,6 +97,10 @@ TEST(SmbiosEntryPoint, BothFormsAreReadAndDamageIsSeen) {
             EXPECT_FALSE(ReadSmbiosEntryPoint(std::span(good).first(at))) << at;
         }
     }
+    Bytes inner = second;  // the sum of its own part is wrong
+    ++inner[0x1C];
+    SetChecksum(inner, 4);
+    EXPECT_FALSE(ReadSmbiosEntryPoint(inner));
     Bytes old = EntryPoint2(0x40, 1);  // states one byte less than it has, as SMBIOS 2.1 did
     old[5] = 0x1E;
     SetChecksum(std::span(old).first(0x1E), 4);

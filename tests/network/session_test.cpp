@@ -108,6 +108,25 @@ TEST_F(Session, OneThatWasDroppedWhileIdleIsOpenedAnewAfterTheFirstSilence) {
     EXPECT_LT(took, 1.2);
 }
 
+TEST_F(Session, APasswordThatNoLongerHoldsIsNotTriedAgainAndAgain) {
+    unsigned logIns = 0;
+    bool changed = false;
+    NetworkBmc peer(bmc, {.send = [&](NetworkBmc&, ipmisim::Packet answer) {
+                        constexpr std::uint8_t kRakp2 = 0x13;
+                        if (changed && answer[4] == 6 && answer[5] == kRakp2) {
+                            ++logIns;
+                            ++answer.back();
+                        }
+                        return std::vector<ipmisim::Packet>{answer};
+                    }});
+    const auto session = Open(peer);
+    changed = true;
+    peer.bmc().Expire();
+    EXPECT_FALSE(Answers(session.get()));
+    EXPECT_GE(logIns, 1u);
+    EXPECT_LE(logIns, 2u);  // the packet may have been sent twice
+}
+
 TEST_F(Session, ABmcThatIsGoneCostsOneTimeoutHoweverMuchIsAskedOfIt) {
     options.timeoutSeconds = 1;
     auto peer = std::make_unique<NetworkBmc>(bmc, NetworkBmc::Character{});

@@ -90,9 +90,9 @@ TEST_F(SelExport, WritesThePropertiesOfEachRecordTypeInOrder) {
 }
 
 TEST_F(SelExport, EntityNamesAboveTheNumberedOnesReachOnlyTheMessage) {
-    AddSensor(0x31, 0x2C, 3, "Ambient");
+    AddSensor(0x31, 0x29, 3, "Ambient");  // the first of them
     AddSensor(0x32, 0x35, 3, "Ambient");
-    AddSensor(0x33, 0x0A, 1, "VRM 1");
+    AddSensor(0x33, 0x28, 1, "VRM 1");  // the last numbered one
     Add(SystemEvent(1, 0x01, 0x31));
     Add(SystemEvent(2, 0x01, 0x32, 0x81));
     Add(SystemEvent(3, 0x08, 0x33));
@@ -106,10 +106,10 @@ TEST_F(SelExport, EntityNamesAboveTheNumberedOnesReachOnlyTheMessage) {
         const char* sensor;
         std::string message;
     } cases[] = {
-        {"", "3", "Temperature", "Ambient", "IO module 3 (Temperature - Ambient): Assertion: "},
+        {"", "3", "Temperature", "Ambient", "Processing blade 3 (Temperature - Ambient): Assertion: "},
         {"", "3", "Temperature", "Ambient", " 3 (Temperature - Ambient): Deassertion: "},
-        {"Power supply", "1", "Power Supply", "VRM 1",
-         "Power supply 1 (Voltage Regulator Module - VRM 1): Assertion: "},
+        {"Battery", "1", "Power Supply", "VRM 1",
+         "Battery 1 (Voltage Regulator Module - VRM 1): Assertion: "},
         {"", "", "Fan", "", "  (Fan - ): Assertion: "},  // no such sensor
     };
     for (std::size_t i = 0; i < std::size(cases); ++i) {

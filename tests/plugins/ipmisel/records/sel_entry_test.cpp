@@ -122,12 +122,16 @@ TEST_F(SelEntry, RawDataIsInWireOrderAndNeedsItsRoom) {
 
 TEST_F(SelEntry, OemRecordsHandTheirBytesOn) {
     Scan();
-    const std::uint8_t bytes[] = {0xA1, 0xA2, 0xA3, 0x64, 0xB3, 0xC2, 0x04, 0x0C, 0x87, 0xD3};
-    char out[kRoom];
-    mapping.GetOEMxC0(nullptr, bytes + 4, out, kRoom);
-    EXPECT_EQ(Text(&IPMISELEntry::GetOEMxC0), out);
-    mapping.GetOEMxE0(nullptr, bytes, out, kRoom);
-    EXPECT_EQ(Text(&IPMISELEntry::GetOEMxE0), out);
+    const std::string all = "OEM data: A1 A2 A3 64 B3 C2 04 0C 87 6F D1 D2 D3";
+    EXPECT_EQ(Text(&IPMISELEntry::GetOEMxC0),
+              "Manufacturer ID: 311987 (0x04C2B3). OEM data: 0C 87");
+    EXPECT_EQ(Text(&IPMISELEntry::GetOEMxC1),
+              "Manufacturer ID: 311987 (0x04C2B3). OEM data: 0C 87 6F D1");
+    EXPECT_EQ(Text(&IPMISELEntry::GetOEMxE0), "OEM data: A1 A2 A3 64 B3 C2 04 0C 87 D3");
+    for (const auto copy :
+         {&IPMISELEntry::GetOEMxE1, &IPMISELEntry::GetOEMxE2, &IPMISELEntry::GetOEMxE3}) {
+        EXPECT_EQ(Text(copy), all);
+    }
     log.Clear();
     EXPECT_EQ(entry.GetOEMxE3(nullptr, nullptr, 0, &mapping), 1U);
     EXPECT_THAT(log.Lines(4), ElementsAre("IPMISELEntry::GetOEMxE3() function entered."));

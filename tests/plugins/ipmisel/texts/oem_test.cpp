@@ -8,17 +8,17 @@
 
 namespace {
 
-constexpr std::array<std::uint8_t, 13> kBytes{0x57, 0x01, 0x00, 'D', 'i',  's', 'k',
+constexpr std::array<std::uint8_t, 13> kBytes{0x57, 0x01, 0x02, 'D', 'i',  's', 'k',
                                               0x00, 'a',  'b',  'c', 0x7F, 0x80};
 
 TEST(OemRecord, LosesNothing) {
     using Operation =
         int (IPMIMapping::*)(NQORTQR20::TCPluginCallbacks*, const std::uint8_t*, char*, unsigned);
-    const char* const all = "OEM data: 57 01 00 44 69 73 6B 00 61 62 63 7F 80. Text: \"Disk\"";
+    const char* const all = "OEM data: 57 01 02 44 69 73 6B 00 61 62 63 7F 80. Text: \"Disk\"";
     const std::tuple<Operation, const char*> cases[] = {
-        {&IPMIMapping::GetOEMxC0, "Manufacturer ID: 343 (0x000157). OEM data: 44 69"},
-        {&IPMIMapping::GetOEMxC1, "Manufacturer ID: 343 (0x000157). OEM data: 44 69 73 6B"},
-        {&IPMIMapping::GetOEMxE0, "OEM data: 57 01 00 44 69 73 6B 00 61 62. Text: \"Disk\""},
+        {&IPMIMapping::GetOEMxC0, "Manufacturer ID: 131415 (0x020157). OEM data: 44 69"},
+        {&IPMIMapping::GetOEMxC1, "Manufacturer ID: 131415 (0x020157). OEM data: 44 69 73 6B"},
+        {&IPMIMapping::GetOEMxE0, "OEM data: 57 01 02 44 69 73 6B 00 61 62. Text: \"Disk\""},
         {&IPMIMapping::GetOEMxE1, all},
         {&IPMIMapping::GetOEMxE2, all},
         {&IPMIMapping::GetOEMxE3, all},
