@@ -37,4 +37,4 @@ build_packages=(g++ cmake ninja-build pkg-config libssl-dev libcli11-dev nlohman
 test_packages=(googletest libfreeipmi-dev openipmi python3)
 peer_packages=(ipmitool freeipmi-tools file fish zsh jq sqlite3 postgresql python3-jsonschema python3-pyghmi prometheus prometheus-node-exporter
                rsyslog tidy chromium)
-package_packages=(debhelper fakeroot help2man lintian lowdown)
+package_packages=(debhelper dh-python fakeroot help2man lintian lowdown)
