@@ -23,7 +23,6 @@
 #include "program/commands/out_of_memory.h"
 #include "program/commands/report.h"
 #include "program/commands/watch.h"
-#include "program/fleet/worker.h"
 #include "program/reports/terminal_text.h"
 
 namespace ipmisel {
@@ -31,8 +30,8 @@ namespace {
 
 /// In the order of the help.
 constexpr Command (*kCommands[])(CLI::App* program) = {
-    AddCollectCommand, AddReportCommand, AddDiffCommand,    AddCheckCommand, AddWatchCommand,
-    AddAckCommand,     AddDoctorCommand, AddClassesCommand, AddWorkerCommand};
+    AddCollectCommand, AddReportCommand, AddDiffCommand,   AddCheckCommand,
+    AddWatchCommand,   AddAckCommand,    AddDoctorCommand, AddClassesCommand};
 
 /// Letters to put in, take out or change to make one word the other.
 std::size_t Distance(std::string_view a, std::string_view b) {
@@ -58,7 +57,6 @@ void RefuseUnknownCommand(const std::vector<Command>& commands, int argc, char**
     for (const Command& command : commands) {
         const std::string name = command.arguments->get_name();
         if (name == argv[1]) return;
-        if (command.arguments->get_group().empty()) continue;  // is none for users
         known += (known.empty() ? "" : ", ") + name;
         if (near.empty() && Distance(word, name) <= 2) near = name;
     }
@@ -82,7 +80,6 @@ int Run(int argc, char** argv) {
     for (const auto add : kCommands) commands.push_back(add(&app));
     std::vector<Command> configurable;
     for (const Command& command : commands) {
-        if (command.arguments->get_group().empty()) continue;  // not for users
         command.arguments->add_flag("--no-config")
             ->description("Take no option from files or the environment");
         configurable.push_back(command);

@@ -114,6 +114,8 @@ public:
     /// Runs an exported function `int name(TCPluginCallbacks*, fdriIOHandle*)` with an output of
     /// its own; empty when the plug-in exports none of that name.
     std::optional<int> RunExporter(const char* name, InstanceSink& sink);
+    /// Its file stays in memory when the object is gone, and is loaded again at no cost.
+    void KeepLoaded() const;
 
 private:
     struct Impl;

@@ -301,6 +301,10 @@ Plugin::Plugin(const std::filesystem::path& file) : impl_(std::make_unique<Impl>
     }
 }
 
+void Plugin::KeepLoaded() const {
+    dlopen(impl_->file.c_str(), RTLD_NOW | RTLD_NOLOAD | RTLD_NODELETE);
+}
+
 const std::vector<ClassInfo>& Plugin::Classes() const { return impl_->classes; }
 
 void Plugin::CheckNeededFiles() const {

@@ -34,6 +34,8 @@ Source OpenInbandDevice(const std::vector<std::filesystem::path>& devices, Syste
 /// BMCs over the network, each HOST, HOST:PORT, [ADDRESS] or [ADDRESS]:PORT. The sessions are
 /// opened together.
 Source OpenLan(const std::vector<std::string>& places, const Access& access);
+/// Loads what every session needs.
+void PrepareLan();
 #endif
 
 }  // namespace tqrhost

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "host/spdriver/kinds.h"
+#include "host/spdriver/lan/crypto.h"
 #include "host/spdriver/lan/lan_place.h"
 #include "host/spdriver/lan/lan_session.h"
 #include "host/spdriver/lan/name_lookup.h"
@@ -113,6 +114,22 @@ Source OpenLan(const std::vector<std::string>& places, const Access& access) {
         throw SourceError(reasons, refusal);
     }
     return source;
+}
+
+void PrepareLan() {
+    try {
+        for (const Hmac::Digest digest : {Hmac::Digest::kSha1, Hmac::Digest::kSha256}) {
+            Hmac hmac(digest);
+            hmac.SetKey(AesCbc::Block{});
+            hmac.Compute({AesCbc::Block{}});
+        }
+        AesCbc::Block block{};
+        AesCbc cipher(block);
+        cipher.Encrypt(block, block, block);
+        cipher.Decrypt(block, block, block);
+    } catch (const CryptoError&) {
+        // Told when a session is opened.
+    }
 }
 
 }  // namespace tqrhost

@@ -77,4 +77,10 @@ Source OpenSources(const std::vector<std::string>& sources, const SourceOptions&
     return kind.open(places, access);
 }
 
+void PrepareSources() {
+#ifdef IPMISEL_LAN
+    tqrhost::PrepareLan();
+#endif
+}
+
 }  // namespace NQORTQR20

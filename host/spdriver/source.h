@@ -55,6 +55,9 @@ struct Source {
 /// that is not built in.
 Source OpenSources(const std::vector<std::string>& sources, const SourceOptions& options);
 
+/// Loads what any session over the network needs, for processes that are copied from this one.
+void PrepareSources();
+
 /// Makes the nodes and facts of a source the machine that SPLibrary and the core speak of; until
 /// the next call, or CloseMachine.
 void OpenMachine(Source source);

@@ -42,6 +42,11 @@ std::unique_ptr<NQORTQR20::PluginSet> LoadPlugins(const std::vector<std::string>
     });
 }
 
+void KeepPluginsLoaded(const std::vector<std::string>& files) {
+    const auto loaded = LoadPlugins(files);
+    for (const auto& plugin : loaded->Plugins()) plugin->KeepLoaded();
+}
+
 std::vector<std::string> ClassesToCollect(const std::vector<std::string>& named,
                                           std::span<const std::string_view> ofFormat,
                                           const NQORTQR20::PluginSet& plugins) {

@@ -19,6 +19,8 @@ void AddPluginOption(CLI::App* command, std::vector<std::string>* files);
 
 /// The plug-ins of the program's own folder, and these files. Throws Failure.
 std::unique_ptr<NQORTQR20::PluginSet> LoadPlugins(const std::vector<std::string>& files);
+/// The same, so that they are loaded faster in processes that are copied from this one.
+void KeepPluginsLoaded(const std::vector<std::string>& files);
 
 /// The classes to collect: those that are named, else those of the format that there are, else the
 /// default ones; the files that their plug-ins need are there. Throws Failure.

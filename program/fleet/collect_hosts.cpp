@@ -15,6 +15,7 @@
 #include "program/commands/plugins.h"
 #include "program/commands/stop_signals.h"
 #include "program/fleet/fleet_report.h"
+#include "program/fleet/fork_server.h"
 #include "program/fleet/host_list.h"
 #include "program/fleet/host_options.h"
 #include "program/fleet/worker.h"
@@ -71,8 +72,9 @@ std::string AsNamed(const CollectOptions& options, const HostsOptions& hosts) {
 
 class Collection {
 public:
-    Collection(const CollectOptions& common, std::size_t jobs, FleetReport& report)
-        : report_(report), pool_(jobs, PassLogLine) {
+    Collection(ForkServer& server, const CollectOptions& common, std::size_t jobs,
+               FleetReport& report)
+        : report_(report), pool_(server, jobs, PassLogLine) {
         if (common.progress) progress_.emplace();
     }
 
@@ -145,9 +147,11 @@ private:
 
 /// Collects from the controllers that are meant, as `common` says, into a report.
 Outcome CollectInto(FleetReport& report, const CollectOptions& common, const HostsOptions& hosts) {
+    // Before there is a password in memory.
+    ForkServer server([&] { PrepareWorkers(common); }, RunWorker);
     HostPlan plan(common, hosts);
     const StopSignals signals;
-    return Collection(common, hosts.jobs, report).Run(plan.hosts, &plan.own);
+    return Collection(server, common, hosts.jobs, report).Run(plan.hosts, &plan.own);
 }
 
 }  // namespace

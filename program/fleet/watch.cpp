@@ -16,6 +16,7 @@
 #include "program/commands/stop_signals.h"
 #include "program/fleet/event_stream.h"
 #include "program/fleet/fleet_report.h"
+#include "program/fleet/fork_server.h"
 #include "program/fleet/service_notifier.h"
 #include "program/fleet/watch_schedule.h"
 #include "program/fleet/worker.h"
@@ -62,7 +63,8 @@ public:
     explicit Watcher(const WatchOptions& options)
         : options_(options),
           schedule_(std::chrono::seconds(options.everySeconds)),
-          pool_(options.hosts.jobs, PassLogLine) {
+          server_([&] { PrepareWorkers(options.collect); }, RunWorker),
+          pool_(server_, options.hosts.jobs, PassLogLine) {
         options_.collect.report.format = WorkerFormat("json");
         options_.collect.report.classes = {std::string(kControllerClass), std::string(kEventClass)};
         Load();
@@ -169,15 +171,17 @@ private:
     std::map<std::string, Watched> controllers_;  ///< by source
     std::size_t started_ = 0;
     std::map<std::size_t, std::string> underWay_;  ///< source by worker
+    ForkServer server_;
     WorkerPool pool_;
 };
 
 }  // namespace
 
 int Watch(const WatchOptions& options) {
+    Watcher watcher(options);
     const StopSignals signals;
     const ReloadSignal reload;
-    Watcher(options).Run();
+    watcher.Run();
     return kExitCollected;
 }
 

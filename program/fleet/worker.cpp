@@ -4,23 +4,23 @@
 #include <sys/prctl.h>
 #include <unistd.h>
 
-#include <CLI/CLI.hpp>
 #include <array>
 #include <cerrno>
 #include <csignal>
-#include <memory>
 #include <new>
 #include <utility>
 
+#include "host/spdriver/source.h"
 #include "program/commands/failure.h"
+#include "program/commands/plugins.h"
 #include "program/reports/json_text.h"
 #include "program/reports/terminal_text.h"
+#include "program/store/database.h"
 
 namespace ipmisel {
 namespace {
 
-constexpr const char* kNoRequest =
-    "a worker is started by \"ipmisel collect --hosts\" alone; use that";
+constexpr const char* kNoRequest = "a worker got no request; collect again";
 
 /// A member that may be left out, under its key.
 template <typename Member>
@@ -79,28 +79,17 @@ std::string ReadRequest() {
     }
 }
 
-WorkerResult CollectAsAsked() {
+WorkerResult CollectAsAsked(const CollectOptions& options) {
     try {
-        return {CollectOutcome(ParseRequest(ReadRequest())), true};
+        return {CollectOutcome(options), true};
     } catch (const Failure& failure) {
         return {{failure.exitStatus, failure.what(), ""}};
     } catch (const std::bad_alloc&) {
         return {{kExitPassFailed, "out of memory", "collect from fewer at a time with --jobs"}};
+    } catch (const std::exception& error) {
+        return {
+            {kExitPassFailed, std::string("ended by an error of its own: ") + error.what(), ""}};
     }
-}
-
-int Work(const std::string& name) {
-    // Whoever started it may be killed at any time; nobody would take the report then.
-    prctl(PR_SET_PDEATHSIG, SIGTERM);
-    pollfd reader{kWorkerResult, 0, 0};
-    if (poll(&reader, 1, 0) != 0) throw Failure(kExitUsage, kNoRequest);  // it is gone already
-    SayFor(name);
-    const WorkerResult result = CollectAsAsked();
-    const std::string message = WriteWorkerResult(result);
-    if (write(kWorkerResult, message.data(), message.size()) < 0) {
-        throw Failure(kExitUsage, kNoRequest);
-    }
-    return result.outcome.exitStatus;
 }
 
 }  // namespace
@@ -146,13 +135,28 @@ std::optional<WorkerResult> ParseWorkerResult(const std::string& message) {
     }
 }
 
-Command AddWorkerCommand(CLI::App* program) {
-    CLI::App* const command =
-        program->add_subcommand(kWorkerCommand, "Collect from one controller of a list");
-    command->group("");
-    const auto name = std::make_shared<std::string>();
-    command->add_option("NAME", *name, "Of the controller")->required();
-    return {command, [name] { return Work(*name); }};
+int RunWorker(const std::string& name) {
+    SayFor(name);
+    // Whoever wrote it is the parent by then, which may be killed at any time; nobody would take
+    // the report then.
+    const CollectOptions options = ParseRequest(ReadRequest());
+    prctl(PR_SET_PDEATHSIG, SIGTERM);
+    pollfd reader{kWorkerResult, 0, 0};
+    if (poll(&reader, 1, 0) != 0) return kExitUsage;  // it is gone already
+    const WorkerResult result = CollectAsAsked(options);
+    const std::string message = WriteWorkerResult(result);
+    if (write(kWorkerResult, message.data(), message.size()) < 0) return kExitUsage;
+    return result.outcome.exitStatus;
+}
+
+void PrepareWorkers(const CollectOptions& options) {
+    NQORTQR20::PrepareSources();
+    try {
+        KeepPluginsLoaded(options.plugins);
+        if (options.store) LoadDatabaseLibrary(*options.store);
+    } catch (const Failure&) {
+        // The first worker has the same to tell.
+    }
 }
 
 }  // namespace ipmisel

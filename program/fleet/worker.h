@@ -4,19 +4,15 @@
 #include <string>
 
 #include "program/commands/collect.h"
-#include "program/commands/command.h"
 
-// A worker is a process of this program that collects from one controller for another process of
-// it. It reads what it is to do, secrets included, from standard input, so that they stand neither
+// A worker is a process that collects from one controller for another process of this program. It
+// reads what it is to do, secrets included, from standard input, so that they stand neither
 // in its arguments nor in its environment; writes the report to standard output and its log lines
 // to standard error; and in the end says on a further descriptor how it went. Either message is one
 // CBOR object (RFC 8949): neither passwords nor names of files need be UTF-8.
 
 namespace ipmisel {
 
-/// The name of the command that makes a process a worker, and its argument is the name under which
-/// its log lines stand.
-inline constexpr const char* kWorkerCommand = "worker";
 /// Where a worker says how it went.
 inline constexpr int kWorkerResult = 3;
 /// Neither message is longer.
@@ -34,7 +30,10 @@ std::string WriteWorkerResult(const WorkerResult& result);
 /// Empty when it is no such message.
 std::optional<WorkerResult> ParseWorkerResult(const std::string& message);
 
-/// The command itself, which the help does not show.
-Command AddWorkerCommand(CLI::App* program);
+/// The work itself, to be run in a process of its own; the exit status. Log lines stand under the
+/// name. Throws Failure.
+int RunWorker(const std::string& name);
+/// Loads what all workers of a collection need, as far as it can be; they tell what cannot.
+void PrepareWorkers(const CollectOptions& options);
 
 }  // namespace ipmisel

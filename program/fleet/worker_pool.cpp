@@ -2,7 +2,6 @@
 
 #include <fcntl.h>
 #include <poll.h>
-#include <spawn.h>
 #include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -11,7 +10,6 @@
 #include <array>
 #include <cerrno>
 #include <csignal>
-#include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <optional>
@@ -51,45 +49,6 @@ FileDescriptor NamelessFile() {
     if (!file.IsOpen()) Fail("make a temporary file", error ? error.value() : errno);
     unlink(name.c_str());
     return file;
-}
-
-/// What the workers find in their environment: all but the secrets, which are handed over.
-std::vector<char*> WorkerEnvironment() {
-    std::vector<char*> variables;
-    for (char** variable = environ; *variable != nullptr; ++variable) {
-        const std::string_view text(*variable);
-        if (text.starts_with("IPMISEL_PASSWORD=") || text.starts_with("IPMISEL_KG=")) continue;
-        variables.push_back(*variable);
-    }
-    variables.push_back(nullptr);
-    return variables;
-}
-
-/// Starts the program once more, with these as its descriptors 0 to 3.
-pid_t Spawn(const std::string& name, const std::array<int, 4>& descriptors) {
-    static_assert(kWorkerResult == 3);
-    posix_spawn_file_actions_t actions;
-    posix_spawn_file_actions_init(&actions);
-    for (std::size_t i = 0; i < descriptors.size(); ++i) {
-        posix_spawn_file_actions_adddup2(&actions, descriptors[i], static_cast<int>(i));
-    }
-    posix_spawnattr_t attributes;
-    posix_spawnattr_init(&attributes);
-    posix_spawnattr_setflags(&attributes, POSIX_SPAWN_SETPGROUP | POSIX_SPAWN_SETSIGMASK);
-    posix_spawnattr_setpgroup(&attributes, 0);
-    sigset_t none;
-    sigemptyset(&none);
-    posix_spawnattr_setsigmask(&attributes, &none);
-    std::string program = "ipmisel", command = kWorkerCommand, worker = name;
-    char* const arguments[] = {program.data(), command.data(), worker.data(), nullptr};
-    std::vector<char*> environment = WorkerEnvironment();
-    pid_t process = -1;
-    const int error = posix_spawn(&process, "/proc/self/exe", &actions, &attributes, arguments,
-                                  environment.data());
-    posix_spawn_file_actions_destroy(&actions);
-    posix_spawnattr_destroy(&attributes);
-    if (error != 0) Fail("start a worker", error);
-    return process;
 }
 
 /// Reads what there is; false at the end.
@@ -143,8 +102,9 @@ struct WorkerPool::Worker {
     }
 };
 
-WorkerPool::WorkerPool(std::size_t jobs, std::function<void(std::string_view line)> log)
-    : jobs_(jobs), log_(std::move(log)) {
+WorkerPool::WorkerPool(ForkServer& server, std::size_t jobs,
+                       std::function<void(std::string_view line)> log)
+    : server_(server), jobs_(jobs), log_(std::move(log)) {
     RaiseFileLimit();
 }
 
@@ -152,14 +112,14 @@ WorkerPool::~WorkerPool() = default;
 
 void WorkerPool::Start(std::size_t id, const std::string& name, const std::string& request,
                        Clock::time_point limit) {
-    // In this order no descriptor is in the way of another, also where 0 to 2 were not open.
     Pipe requests, logs, results;
     auto worker = std::make_unique<Worker>();
     worker->id = id;
     worker->limit = limit;
     worker->report = NamelessFile();
-    worker->process =
-        Spawn(name, {requests.out.get(), worker->report.get(), logs.in.get(), results.in.get()});
+    static_assert(kWorkerResult == 3);
+    worker->process = server_.Start(
+        name, {requests.out.get(), worker->report.get(), logs.in.get(), results.in.get()});
     worker->result = std::move(results.out);
     worker->log = std::move(logs.out);
     for (const FileDescriptor* file : {&worker->result, &worker->log}) {

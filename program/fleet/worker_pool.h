@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "program/fleet/file_descriptor.h"
+#include "program/fleet/fork_server.h"
 #include "program/fleet/worker.h"
 
 namespace ipmisel {
@@ -30,7 +31,9 @@ public:
     using Clock = std::chrono::steady_clock;
 
     /// `log` gets what the workers write to standard error, in whole lines without the line feed.
-    WorkerPool(std::size_t jobs, std::function<void(std::string_view line)> log);
+    /// The server outlives the object.
+    WorkerPool(ForkServer& server, std::size_t jobs,
+               std::function<void(std::string_view line)> log);
     /// Kills those that still run.
     ~WorkerPool();
     WorkerPool(const WorkerPool&) = delete;
@@ -51,6 +54,7 @@ private:
 
     WorkerEnd End(Worker& worker);
 
+    ForkServer& server_;
     std::size_t jobs_;
     std::function<void(std::string_view)> log_;
     std::vector<std::unique_ptr<Worker>> workers_;

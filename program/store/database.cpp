@@ -18,12 +18,23 @@ const std::string& TextOf(const SqlValue& value) {
     return text == nullptr ? kNone : *text;
 }
 
+namespace {
+
+constexpr std::string_view kSqlite = "sqlite:";
+constexpr std::string_view kPostgresql = "postgresql://";
+
+}  // namespace
+
+void LoadDatabaseLibrary(const std::string& uri) {
+    if (uri.starts_with(kSqlite)) LoadSqlite();
+    if (uri.starts_with(kPostgresql)) LoadPostgresql();
+}
+
 std::unique_ptr<Database> OpenDatabase(const std::string& uri) {
-    constexpr std::string_view kSqlite = "sqlite:";
     if (uri.starts_with(kSqlite) && uri.size() > kSqlite.size()) {
         return OpenSqlite(uri.substr(kSqlite.size()), uri);
     }
-    if (uri.starts_with("postgresql://")) return OpenPostgresql(uri);
+    if (uri.starts_with(kPostgresql)) return OpenPostgresql(uri);
     throw Failure(kExitUsage,
                   "there is no store of the kind that --store names; give sqlite:FILE "
                   "or postgresql://HOST/DATABASE");

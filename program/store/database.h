@@ -46,9 +46,15 @@ public:
 /// `postgresql://...`. Throws Failure.
 std::unique_ptr<Database> OpenDatabase(const std::string& uri);
 
+/// Loads the library that a store of this URI needs, for processes that are copied from this one.
+/// Throws Failure.
+void LoadDatabaseLibrary(const std::string& uri);
+
 /// The one and the other; `uri` is for messages.
 std::unique_ptr<Database> OpenSqlite(const std::string& file, const std::string& uri);
 std::unique_ptr<Database> OpenPostgresql(const std::string& uri);
+void LoadSqlite();
+void LoadPostgresql();
 
 /// Undone when it goes out of scope without Commit.
 class Transaction {

@@ -218,6 +218,8 @@ private:
 
 }  // namespace
 
+void LoadPostgresql() { Library::Get(); }
+
 std::unique_ptr<Database> OpenPostgresql(const std::string& uri) {
     return std::make_unique<PostgresqlDatabase>(uri);
 }

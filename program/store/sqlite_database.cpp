@@ -212,6 +212,8 @@ private:
 
 }  // namespace
 
+void LoadSqlite() { Library::Get(); }
+
 std::unique_ptr<Database> OpenSqlite(const std::string& file, const std::string& uri) {
     return std::make_unique<SqliteDatabase>(file, uri);
 }

@@ -157,8 +157,9 @@ class Fleet(unittest.TestCase):
         """The worker processes, once there are so many."""
         for _ in range(1000):
             children = pathlib.Path(f"/proc/{pid}/task/{pid}/children").read_text().split()
-            if len(children) == count and all("worker" in arguments(child) for child in children):
-                return [int(child) for child in children]
+            workers = [int(child) for child in children if arguments(child).startswith("ipmisel worker ")]
+            if len(workers) == count:
+                return workers
             time.sleep(0.01)
         self.fail("no workers")
 
