@@ -3,14 +3,17 @@
 
 usage: make_pages.py PROGRAM FOLDER      pages in FOLDER/man1, man5 and man7; needs lowdown and help2man
 
-A document's first heading goes, its other headings go up by one level, links become their text. Of each
-command that PROGRAM lists there is a page, made of what the command says with --help.
+A document's first heading goes, its other headings go up by one level, a link to another page becomes its name,
+any other its text, and a table of more columns than a terminal holds becomes a list. Of each command that PROGRAM
+lists there is a page, made of what the command says with --help.
 """
+import email.utils
 import pathlib
 import re
 import subprocess
 import sys
 
+PACKAGING = pathlib.Path(__file__).resolve().parents[1]
 DOCS = pathlib.Path(__file__).resolve().parents[2] / "docs"
 # Document, name of the page, section, and what whatis says.
 DOCUMENTS = (
@@ -19,12 +22,50 @@ DOCUMENTS = (
     ("configuration.md", "ipmisel.conf", 5, "options and groups of hosts in a file"),
     ("severity-rules.md", "ipmisel-severity-rules", 5, "the file of the user's own severities"),
     ("fleet.md", "ipmisel-fleet", 7, "collecting from many controllers"),
+    ("formats.md", "ipmisel-formats", 7, "the formats of a report, key by key"),
+    ("store.md", "ipmisel-store", 7, "a database of what was collected"),
     ("capture.md", "ipmisel-capture", 5, "a capture of every exchange with a BMC"),
 )
+# Of a table: more columns, or a longer word in a cell, and it does not fit a terminal.
+MAX_COLUMNS, MAX_WORD = 3, 24
+
+
+def release_date():
+    """Of the package's first entry: a page is the same in every build."""
+    entry = re.search(r"^ -- .*>  (.*)$", (PACKAGING / "debian/changelog").read_text(), re.MULTILINE)
+    return email.utils.parsedate_to_datetime(entry[1]).date().isoformat()
 
 
 def run(*command, **options):
     return subprocess.run(command, check=True, text=True, stdout=subprocess.PIPE, **options).stdout
+
+
+def cells(row):
+    return [cell.strip() for cell in re.split(r"(?<!\\)\|", row.strip().strip("|"))]
+
+
+def narrow(match):
+    """A table as definitions of its first column, where it has one other or is too wide for a terminal."""
+    head, _, *rows = match[0].rstrip("\n").split("\n")
+    names = cells(head)
+    if 2 < len(names) <= MAX_COLUMNS and max(map(len, match[0].split())) <= MAX_WORD:
+        return match[0]
+    listed = ""
+    for row in map(cells, rows):
+        facts = [f"{name}: {cell}" for name, cell in zip(names[1:], row[1:]) if cell]
+        if len(names) == 2:
+            facts = row[1:]
+        listed += f"{row[0]}\n: {'; '.join(facts)}\n\n"
+    return listed
+
+
+def reference(match):
+    """What a link is on a page."""
+    text, document = match[1], match[2].split("#")[0]
+    for name, page, section, _ in DOCUMENTS:
+        if document == name and (DOCS / name).exists():
+            return f"{page}({section})" if text == name else f"{text} ({page}({section}))"
+    return text
 
 
 def markdown_of_page(text, name, what):
@@ -37,18 +78,22 @@ def markdown_of_page(text, name, what):
             line = line[1:].upper()
         elif not in_code and line.startswith("###"):
             line = line[1:]
+        if not in_code and not line.startswith("    "):
+            line = re.sub(r"\[([^\]]*)\]\((?!https?:)([^)]*)\)", reference, line)
         lines.append(line)
-    # A link to another document leads nowhere from a page.
-    rest = re.sub(r"\[([^\]]*)\]\((?!https?:)[^)]*\)", r"\1", "\n".join(lines))
+    rest = re.sub(r"^\|.*\n\| ?-.*\n(?:\|.*\n)*", narrow, "\n".join(lines) + "\n", flags=re.MULTILINE)
     return f"# NAME\n\n{name} - {what}\n\n# DESCRIPTION\n{rest}"
 
 
 def document_page(path, name, section, what, version):
-    # Without a date of its own the page is the same in every build.
-    metadata = [f"-Mtitle={name}", f"-Msection={section}", f"-Msource=ipmisel {version}", "-Mdate="]
+    metadata = [f"-Mtitle={name}", f"-Msection={section}", f"-Msource=ipmisel {version}", f"-Mdate={release_date()}"]
     page = run("lowdown", "-s", "-Tman", *metadata, input=markdown_of_page(path.read_text(), name, what))
-    # whatis wants a heading on the line of its request.
-    return re.sub(r"^\.(S[HS])\n", r".\1 ", page, flags=re.MULTILINE).replace(
+    # The font of code has a name that every formatter knows.
+    page = page.replace("\\fC", "\\f(CR")
+    # whatis wants a heading on the line of its request, and no paragraph begins twice.
+    page = re.sub(r"^\.(S[HS])\n", r".\1 ", page, flags=re.MULTILINE)
+    page = re.sub(r"^(\.S[HS] (?!NAME).*)\n\.[LP]P\n", r"\1\n", page, flags=re.MULTILINE)
+    return page.replace(
         ".SH NAME\n.LP\n", ".ad l\n.SH NAME\n").replace(f"{name} - {what}", f"{name} \\- {what}", 1)
 
 
@@ -63,7 +108,7 @@ def command_page(program, command, what, version):
     page = run("help2man", "-N", "--no-discard-stderr", "-n", what, f"--version-string={version}",
                f"{program} {command}")
     # help2man has no word for the command of a program.
-    page = re.sub(r"^\.TH .*$", f'.TH ipmisel\\\\-{command} 1 "" "ipmisel {version}"', page, 1, re.MULTILINE)
+    page = re.sub(r"^\.TH .*$", f'.TH ipmisel\\\\-{command} 1 "{release_date()}" "ipmisel {version}"', page, 1, re.MULTILINE)
     return page.replace(f"ipmisel {command} \\-", f"ipmisel\\-{command} \\-", 1)
 
 

@@ -40,6 +40,9 @@ with tempfile.TemporaryDirectory() as folder:
                        "libspdriver.so", "libtqrcore.so"], "lib/ipmisel")
     expect([path.name for path in (prefix / "lib").iterdir()], ["ipmisel"], "lib")
 
+    for completion in ("bash-completion/completions/ipmisel", "zsh/site-functions/_ipmisel",
+                       "fish/vendor_completions.d/ipmisel.fish"):
+        expect((prefix / "share" / completion).is_file(), True, completion)
     documents = prefix / "share/doc/ipmisel"
     for document in documents.rglob("*.md"):
         for link in re.findall(r"\]\(([^)#:]+)(?:#[^)]*)?\)", document.read_text()):
