@@ -8,6 +8,7 @@ difference of the median processor times by the difference of the records. Runs 
 that did not print every record ends the comparison.
 """
 import statistics
+import subprocess
 import sys
 
 import lan_peers
@@ -15,15 +16,24 @@ import lan_peers
 PEERS = ["ipmitool", "ipmi-sel"]
 
 
+def described_classes(program):
+    """`--class` for each class of the plug-in of the event log that a collection has by itself."""
+    listed = subprocess.run([program, "classes"], capture_output=True, text=True, check=True).stdout
+    return [word for line in listed.splitlines()
+            if line.startswith("QORSG_") and "only when named" not in line
+            for word in ("--class", line.split()[0])]
+
+
 def contenders(program, port):
     """Name to command, and whether its lines are the records."""
     commands = lan_peers.commands(program, port)
     own = commands.pop("ipmisel")
     at = own.index("--class")
-    described, rest = own[:at], own[at + 2:]
-    return {"ipmisel, described classes": ([*described, *rest], False),
+    every, rest = own[:at], own[at + 2:]
+    return {"ipmisel, described classes": ([*every, *described_classes(program), *rest], False),
             "ipmisel, event log": (own, True),
-            "ipmisel, IPMI_Event": ([*described, "--class", "IPMI_Event", *rest], True),
+            "ipmisel, IPMI_Event": ([*every, "--class", "IPMI_Event", *rest], True),
+            "ipmisel, every class": ([*every, *rest], False),
             **{name: (command, True) for name, command in commands.items()}}
 
 
