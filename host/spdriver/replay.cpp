@@ -8,6 +8,7 @@
 #include <memory>
 #include <nlohmann/json.hpp>
 #include <optional>
+#include <span>
 #include <string>
 #include <unordered_map>
 #include <utility>
@@ -27,6 +28,7 @@ namespace {
 
 using ipmisel::JsonValue;
 using NQORTQR20::TCIMDateTime;
+using Bytes = std::span<const std::uint8_t>;
 
 constexpr std::uint32_t kVersion = 1;
 constexpr std::uint32_t kMaxNodes = 1024;
@@ -85,17 +87,22 @@ public:
     explicit ReplayTransport(std::shared_ptr<ReplayClock> clock) : clock_(std::move(clock)) {}
     void Add(const RequestFrame& request, const std::optional<Response>& response) {
         const auto number = static_cast<std::uint32_t>(recorded_.size());
-        Recorded& recorded = recorded_.emplace_back();
-        recorded.at = bytes_.size();
-        if (response) {
-            recorded.length = static_cast<std::uint32_t>(response->size());
-            bytes_.insert(bytes_.end(), response->begin(), response->end());
-        }
-        const auto [answers, isNew] = answers_.try_emplace(KeyOf(request), Answers{number, number});
+        const auto [found, isNew] = answers_.try_emplace(KeyOf(request), Answers{number, number});
+        Recorded recorded;
         if (!isNew) {
-            recorded_[answers->second.last].next = number;
-            answers->second.last = number;
+            Recorded& previous = recorded_[std::exchange(found->second.last, number)];
+            previous.next = number;
+            recorded.at = previous.at;
+            recorded.length = previous.length;
         }
+        // Of two plug-ins that were given the same, the bytes stand once.
+        const Bytes bytes = response ? Bytes(*response) : Bytes();
+        if (!std::ranges::equal(bytes, BytesOf(recorded))) {
+            recorded.at = bytes_.size();
+            recorded.length = static_cast<std::uint32_t>(bytes.size());
+            bytes_.insert(bytes_.end(), bytes.begin(), bytes.end());
+        }
+        recorded_.push_back(recorded);
     }
     std::optional<Response> Exchange(const RequestFrame& request) override {
         const auto found = answers_.find(KeyOf(request));
@@ -110,8 +117,8 @@ public:
         if (!answers.spent) answers.next = recorded.next;
         clock_->Answered(request.code() == ipmi::kGetSelTime);
         if (recorded.length == 0) return std::nullopt;
-        const auto begin = bytes_.begin() + static_cast<std::ptrdiff_t>(recorded.at);
-        return Response(begin, begin + recorded.length);
+        const Bytes bytes = BytesOf(recorded);
+        return Response(bytes.begin(), bytes.end());
     }
     /// Those with which the recording ends and which this pass has not asked.
     std::vector<ipmi::Command> LaterInfos() const {
@@ -139,6 +146,10 @@ private:
         bool given = false;
         bool spent = false;  ///< the last one was given
     };
+
+    Bytes BytesOf(const Recorded& recorded) const {
+        return Bytes(bytes_).subspan(recorded.at, recorded.length);
+    }
 
     /// Short enough, mostly, to need no memory of its own.
     static std::string KeyOf(const RequestFrame& request) {
