@@ -90,6 +90,11 @@ int Run(int argc, char** argv) {
         return std::find_if(commands.begin(), commands.end(),
                             [](const Command& command) { return command.arguments->parsed(); });
     };
+    if (argc < 2) {
+        throw Failure(kExitUsage,
+                      "no command is named; ipmisel collect reads this machine, "
+                      "ipmisel --help lists the others");
+    }
     RefuseUnknownCommand(commands, argc, argv);
     try {
         app.parse(argc, argv);

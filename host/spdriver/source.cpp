@@ -46,7 +46,7 @@ const Kind& FindKind(const std::string& source) {
         if (k.open != nullptr) known += (known.empty() ? "" : ", ") + std::string(k.usage);
     }
     const std::string line =
-        "this build has no source \"" + source + "\"; name one of " + known + " with --from";
+        "there is no source \"" + source + "\" here; name one of " + known + " with --from";
     if (kind != std::end(kKinds)) throw SourceError(line);
     throw SourceUsageError(line);
 }

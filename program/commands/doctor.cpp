@@ -41,6 +41,7 @@ int ExamineOther(const AccessOptions& access, Steps* steps) {
         return kExitNoSource;
     }
     if (!TryCommands(&*controller, steps)) return kExitNoSource;
+    TryLog(&*controller, steps);
     TrySensorRecords(&*controller, steps);
     // The clock of a simulated server or a capture stands.
     if (inband) TryClock(&*controller, steps);

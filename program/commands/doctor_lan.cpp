@@ -310,6 +310,7 @@ int ExamineLan(AccessOptions access, Steps* steps) {
         if (!session.controller) return kExitNoSource;
     }
     if (!TryCommands(&*session.controller, steps)) return kExitNoSource;
+    TryLog(&*session.controller, steps);
     TrySensorRecords(&*session.controller, steps);
     TryClock(&*session.controller, steps);
     TrySuites(access, probe.cipherSuites, steps);

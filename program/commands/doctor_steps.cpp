@@ -7,6 +7,7 @@
 #include <cstdio>
 #include <cstring>
 #include <ctime>
+#include <set>
 #include <span>
 #include <vector>
 
@@ -192,6 +193,40 @@ bool TryCommands(Controller* controller, Steps* steps) {
         }
     }
     return true;
+}
+
+void TryLog(Controller* controller, Steps* steps) {
+    constexpr std::string_view kWhat = "event log";
+    constexpr std::size_t kMaxRecords = 256;
+    constexpr const char* kAdvice = "; the report will be partial: try again after a BMC reset";
+    std::set<std::uint16_t> seen;
+    std::uint16_t id = ipmi::kFirstRecordId;
+    const auto began = Clock::now();
+    while (seen.size() < kMaxRecords && id != ipmi::kLastRecordId) {
+        const ipmi::Command command = ipmi::GetSelEntry(id);
+        const auto answer = controller->Exchange(command);
+        const std::string record =
+            seen.empty() ? "the first record" : Format("record %04x", unsigned{id});
+        const std::uint8_t completion = answer ? answer->front() : ipmi::kCompleted;
+        if (seen.empty() && completion == ipmi::kNotPresent) return;  // empty, and said so
+        std::string problem;
+        if (!answer) {
+            problem = "no answer";
+        } else if (completion != ipmi::kCompleted) {
+            problem = ipmi::CompletionCodeText(command.code(), completion);
+        } else if (answer->size() < 3) {
+            problem = "a short answer";
+        } else if (!seen.insert(id).second) {
+            problem = "comes again: the log runs in a circle";
+        }
+        if (!problem.empty()) {
+            steps->Bad(kWhat, record + ": " + problem + kAdvice);
+            return;
+        }
+        id = ByteReader(std::span(*answer).subspan(1)).U16();
+    }
+    const std::string text = Format("%zu records read, ", seen.size());
+    steps->Good(kWhat, text + Milliseconds((Clock::now() - began) / seen.size()) + " each");
 }
 
 void TrySensorRecords(Controller* controller, Steps* steps) {

@@ -57,6 +57,8 @@ void RunPipeline(NQORTQR20::RequestPipeline* pipeline);
 /// Each command that a report is made of, once; what a sensor is asked for with the first sensor of
 /// the repository. False when the BMC does not work at all.
 bool TryCommands(Controller* controller, Steps* steps);
+/// The first records of the event log one after the other, as far as they can be read.
+void TryLog(Controller* controller, Steps* steps);
 /// Whether sensor records come whole.
 void TrySensorRecords(Controller* controller, Steps* steps);
 /// The BMC's clock against this machine's.

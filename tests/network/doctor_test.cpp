@@ -68,6 +68,7 @@ TEST(Doctor, ABmcWithoutFaultIsWell) {
                 AllOf(ContainsRegex("ok +session +opened in"),
                       ContainsRegex("ok +cipher suite 17 +opens for user, operator, admin\n"),
                       ContainsRegex("- +cipher suite 3 +listed, but the BMC opens no"),
+                      Not(HasSubstr("event log")),  // which is empty
                       ContainsRegex("- +Get Sensor Reading +requested sensor"),
                       ContainsRegex("ok +sessions at a time +4 or more"),
                       ContainsRegex("ok +clock +[+-][0-9] s"), Not(HasSubstr("WRONG"))));
@@ -186,6 +187,12 @@ TEST(Doctor, ABmcThatAnswersWithATimeoutHangs) {
     const Finding found = Examine({peer.Place(), "--user", ipmisim::kUser});
     EXPECT_EQ(found.exitStatus, 3);
     EXPECT_THAT(found.lines, ContainsRegex("WRONG +Get Device ID +timeout[^\n]*reset it"));
+}
+
+TEST(Doctor, ARecordThatTheBmcDoesNotGiveIsNamed) {
+    const Finding found = Examine({"sim:" IPMISEL_EXAMPLES "/broken-bmc.json"});
+    EXPECT_EQ(found.exitStatus, 4);
+    EXPECT_THAT(found.lines, ContainsRegex("WRONG +event log +record 0005: no answer;"));
 }
 
 TEST(Doctor, WhatTheBmcLacksOrRefusesIsSaid) {

@@ -77,7 +77,7 @@ TEST_F(BadInput, WrongUsage) {
     ExpectRefused({"colect"}, 2,
                   "no command \"colect\"; did you mean collect? There are collect, ");
     ExpectRefused({"frobnicate"}, 2, "no command \"frobnicate\"; There are collect, ");
-    ExpectRefused({"collect", "--from", "tape:0"}, 2, "this build has no source \"tape:0\"");
+    ExpectRefused({"collect", "--from", "tape:0"}, 2, "there is no source \"tape:0\"");
     ExpectRefused({"collect", "--from", "sim:"}, 2, "names no place");
 }
 

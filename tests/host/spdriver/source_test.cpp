@@ -42,14 +42,14 @@ constexpr const char* kServer = R"({
 
 TEST(Sources, WhatIsOfNoKindOrCannotBeJoinedIsRefused) {
     EXPECT_THAT(Refusal({}), HasSubstr("no source"));
-    EXPECT_THAT(Refusal({"usb:0"}), AllOf(StartsWith("this build has no source \"usb:0\""),
+    EXPECT_THAT(Refusal({"usb:0"}), AllOf(StartsWith("there is no source \"usb:0\""),
                                           HasSubstr("sim:FILE, replay:FILE")));
-    EXPECT_THAT(Refusal({"inband:x"}), StartsWith("this build has no source"));
+    EXPECT_THAT(Refusal({"inband:x"}), StartsWith("there is no source"));
     EXPECT_THAT(Refusal({"sim:"}), HasSubstr("write it as sim:FILE"));
     EXPECT_THAT(Refusal({"sim:a", "sim:b"}), HasSubstr("\"sim:a\" stands alone"));
     EXPECT_THAT(Refusal({"sim:/nonexistent"}), HasSubstr("cannot be read"));
 #ifndef IPMISEL_LAN
-    EXPECT_THAT(Refusal({"lan:h"}), StartsWith("this build has no source \"lan:h\""));
+    EXPECT_THAT(Refusal({"lan:h"}), StartsWith("there is no source \"lan:h\""));
 #endif
 }
 
