@@ -15,8 +15,9 @@ namespace {
 constexpr std::size_t kNameWidth = 12;      // of what the report itself names
 constexpr std::size_t kPropertyWidth = 24;  // of a property that a plug-in names
 constexpr std::size_t kNoColumn = 99;
-/// From here on an event has its reading, its sensor and its number in columns of their own.
-constexpr std::size_t kWide = 120;
+/// From here on an event has its reading, its sensor and its number in columns of their own. With
+/// less, most events would take two lines for it.
+constexpr std::size_t kWide = 160;
 /// Below it the day stands on a line of its own, before its events.
 constexpr std::size_t kNarrow = 100;
 

@@ -84,7 +84,7 @@ Time      Severity  Part         What happened
                                  high; 80.5 degrees C, limit
                                  69
 )"));
-    look = {140, true};
+    look = {160, true};
     EXPECT_THAT(Print({hot}),
                 testing::HasSubstr("1       2026-03-09 02:31:45  \x1b[1;31mcritical\x1b[0m  open   "
                                    "Processor 1  CPU1 Temp  upper critical high  80.5 degrees "
