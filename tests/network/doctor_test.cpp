@@ -192,7 +192,7 @@ TEST(Doctor, ABmcThatAnswersWithATimeoutHangs) {
 TEST(Doctor, ARecordThatTheBmcDoesNotGiveIsNamed) {
     const Finding found = Examine({"sim:" IPMISEL_EXAMPLES "/broken-bmc.json"});
     EXPECT_EQ(found.exitStatus, 4);
-    EXPECT_THAT(found.lines, ContainsRegex("WRONG +event log +record 0005: no answer;"));
+    EXPECT_THAT(found.lines, ContainsRegex("WRONG +event log +record 0004: no answer;"));
 }
 
 TEST(Doctor, WhatTheBmcLacksOrRefusesIsSaid) {

@@ -73,7 +73,7 @@ TEST_F(BadInput, WrongUsage) {
                   "cannot write " + InPlace("none/report") + ": No such file or directory");
     ExpectRefused({"collect", "--from", source, "--output", place.path().string()}, 2,
                   "Is a directory");
-    ExpectRefused({}, 2, "subcommand");
+    ExpectRefused({}, 2, "no command is named");
     ExpectRefused({"colect"}, 2,
                   "no command \"colect\"; did you mean collect? There are collect, ");
     ExpectRefused({"frobnicate"}, 2, "no command \"frobnicate\"; There are collect, ");
