@@ -19,7 +19,7 @@ namespace {
 int ExamineOther(const AccessOptions& access, Steps* steps) {
     const bool inband = access.Sources().front() == "inband";
     if (inband) ExamineDriver(steps);
-    std::optional<Controller> controller;
+    std::optional<DoctorController> controller;
     try {
         controller.emplace(OpenSource(access));
     } catch (const Failure& failure) {

@@ -36,7 +36,7 @@ constexpr double kAttemptSeconds = 3;  ///< for one of several ways to open a se
 
 /// A session that was opened, or why it was not.
 struct Attempt {
-    std::optional<Controller> controller;
+    std::optional<DoctorController> controller;
     std::string problem;
     Refusal refusal = Refusal::kOther;
 

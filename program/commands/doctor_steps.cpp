@@ -51,7 +51,7 @@ std::vector<ReadCommand> ReadCommands() {
 
 /// The first sensor of the repository that the BMC itself owns and that has a reading; the
 /// beginning of each record is enough for it.
-std::optional<ipmi::SensorKey> FindSensor(Controller* controller) {
+std::optional<ipmi::SensorKey> FindSensor(DoctorController* controller) {
     constexpr unsigned kMaxRecords = 64;
     constexpr std::uint8_t kKeyEnd = 8;
     std::uint16_t id = ipmi::kFirstRecordId;
@@ -91,7 +91,7 @@ bool IsOutOfOrder(std::uint8_t completion) {
 }
 
 /// One read of those above. False when the BMC does not work at all.
-bool TryCommand(Controller* controller, const ReadCommand& read, bool* emptyLog, Steps* steps) {
+bool TryCommand(DoctorController* controller, const ReadCommand& read, bool* emptyLog, Steps* steps) {
     const ipmi::CommandCode code = read.command.code();
     const std::string name(ipmi::CommandName(code));
     const auto began = Clock::now();
@@ -172,7 +172,7 @@ void RunPipeline(RequestPipeline* pipeline) {
     }
 }
 
-std::optional<Response> Controller::Exchange(const ipmi::Command& command) {
+std::optional<Response> DoctorController::Exchange(const ipmi::Command& command) {
     const NQORTQR20::SourceNode& node = source_.nodes.front();
     if (node.transport) return node.transport->Exchange(NQORTQR20::RequestFrame(command));
     std::optional<Response> answer;
@@ -182,7 +182,7 @@ std::optional<Response> Controller::Exchange(const ipmi::Command& command) {
     return answer;
 }
 
-bool TryCommands(Controller* controller, Steps* steps) {
+bool TryCommands(DoctorController* controller, Steps* steps) {
     bool emptyLog = false;
     for (const ReadCommand& read : ReadCommands()) {
         if (!TryCommand(controller, read, &emptyLog, steps)) return false;
@@ -195,7 +195,7 @@ bool TryCommands(Controller* controller, Steps* steps) {
     return true;
 }
 
-void TryLog(Controller* controller, Steps* steps) {
+void TryLog(DoctorController* controller, Steps* steps) {
     constexpr std::string_view kWhat = "event log";
     constexpr std::size_t kMaxRecords = 256;
     constexpr const char* kAdvice = "; the report will be partial: try again after a BMC reset";
@@ -229,7 +229,7 @@ void TryLog(Controller* controller, Steps* steps) {
     steps->Good(kWhat, text + Milliseconds((Clock::now() - began) / seen.size()) + " each");
 }
 
-void TrySensorRecords(Controller* controller, Steps* steps) {
+void TrySensorRecords(DoctorController* controller, Steps* steps) {
     constexpr std::string_view kWhat = "sensor records";
     const ipmi::Command command = ipmi::GetSdr(ipmi::kFirstRecordId);
     const auto began = Clock::now();
@@ -249,7 +249,7 @@ void TrySensorRecords(Controller* controller, Steps* steps) {
     }
 }
 
-void TryClock(Controller* controller, Steps* steps) {
+void TryClock(DoctorController* controller, Steps* steps) {
     constexpr std::string_view kWhat = "clock";
     constexpr long long kTolerated = 60;
     const auto answer = controller->Exchange(ipmi::GetSelTime());

@@ -34,9 +34,9 @@ private:
 };
 
 /// One BMC that is open.
-class Controller {
+class DoctorController {
 public:
-    explicit Controller(NQORTQR20::Source source) : source_(std::move(source)) {}
+    explicit DoctorController(NQORTQR20::Source source) : source_(std::move(source)) {}
 
     bool There() const { return !source_.nodes.empty(); }
     const NQORTQR20::MachineFacts& Facts() const { return source_.facts; }
@@ -56,12 +56,12 @@ void RunPipeline(NQORTQR20::RequestPipeline* pipeline);
 
 /// Each command that a report is made of, once; what a sensor is asked for with the first sensor of
 /// the repository. False when the BMC does not work at all.
-bool TryCommands(Controller* controller, Steps* steps);
+bool TryCommands(DoctorController* controller, Steps* steps);
 /// The first records of the event log one after the other, as far as they can be read.
-void TryLog(Controller* controller, Steps* steps);
+void TryLog(DoctorController* controller, Steps* steps);
 /// Whether sensor records come whole.
-void TrySensorRecords(Controller* controller, Steps* steps);
+void TrySensorRecords(DoctorController* controller, Steps* steps);
 /// The BMC's clock against this machine's.
-void TryClock(Controller* controller, Steps* steps);
+void TryClock(DoctorController* controller, Steps* steps);
 
 }  // namespace ipmisel
