@@ -1,6 +1,7 @@
 #include "program/commands/check.h"
 
 #include <CLI/CLI.hpp>
+#include <chrono>
 #include <map>
 #include <memory>
 #include <optional>
@@ -27,6 +28,7 @@ struct CheckOptions {
     std::vector<std::string> files;
     std::optional<std::string> store;
     std::vector<std::string> systems;  ///< of the store; none: all
+    double maxAgeSeconds = 86400;      ///< of a visit of the store
     CollectOptions collect;
     HostsOptions hosts;
 };
@@ -53,8 +55,11 @@ std::vector<SystemSummary> Saved(const std::vector<std::string>& files) {
 }
 
 /// What is open in a store and not acknowledged, as it was at the last visits.
-std::vector<SystemSummary> Stored(const std::string& uri, const std::vector<std::string>& names) {
+std::vector<SystemSummary> Stored(const std::string& uri, const std::vector<std::string>& names,
+                                  double maxAgeSeconds) {
     Store store(uri);
+    const auto now = std::chrono::duration_cast<std::chrono::seconds>(
+        std::chrono::system_clock::now().time_since_epoch());
     std::vector<SystemSummary> systems;
     std::map<std::string, std::size_t> index;
     for (const StoredVisit& visit : store.LastVisits(names)) {
@@ -65,6 +70,11 @@ std::vector<SystemSummary> Stored(const std::string& uri, const std::vector<std:
         if (!visit.complete) {
             const int status = visit.kind == "failed" ? kExitNoSource : kExitPart;
             system.outcome = {status, visit.problem, ""};
+        }
+        if (static_cast<double>(now.count() - visit.finished) > maxAgeSeconds) {
+            system.outcome = {kExitNoSource,
+                              "not visited since " + NQORTQR20::TimeText({visit.finished}),
+                              "see that it is still collected from"};
         }
     }
     for (const StoredFinding& stored : store.OpenFindings(names)) {
@@ -90,7 +100,8 @@ std::vector<SystemSummary> Stored(const std::string& uri, const std::vector<std:
 }
 
 int Check(CheckOptions options) {
-    if (options.store) return Print(CheckSystems(Stored(*options.store, options.systems)));
+    if (options.store)
+        return Print(CheckSystems(Stored(*options.store, options.systems, options.maxAgeSeconds)));
     const bool live = !options.collect.access.sources.empty() || !options.hosts.lists.empty();
     if (!options.files.empty()) {
         if (live) {
@@ -124,6 +135,13 @@ Command AddCheckCommand(CLI::App* program) {
     command->add_option("--system", options->systems, "A system of the store; else all")
         ->type_name("NAME")
         ->allow_extra_args(false)
+        ->needs(store);
+    command
+        ->add_option("--max-age", options->maxAgeSeconds,
+                     "Seconds after which a last visit of the store tells nothing any more")
+        ->type_name("SECONDS")
+        ->capture_default_str()
+        ->check(Seconds(365 * kSecondsPerDay))
         ->needs(store);
     AddAccessOptions(command, &options->collect.access);
     for (const char* other : {"FILE", "--from"}) store->excludes(command->get_option(other));

@@ -23,6 +23,7 @@
 #include "program/reports/progress.h"
 #include "program/reports/terminal.h"
 #include "program/reports/terminal_text.h"
+#include "program/store/store.h"
 
 namespace ipmisel {
 namespace {
@@ -74,7 +75,7 @@ class Collection {
 public:
     Collection(ForkServer& server, const CollectOptions& common, std::size_t jobs,
                FleetReport& report)
-        : report_(report), pool_(server, jobs, PassLogLine) {
+        : report_(report), store_(common.store), pool_(server, jobs, PassLogLine) {
         if (common.progress) progress_.emplace();
     }
 
@@ -118,6 +119,7 @@ private:
             Say(name + ": " + outcome.problem +
                 (outcome.advice.empty() ? "" : "; " + outcome.advice));
         }
+        if (end.lost && store_) StoreLostVisit(*store_, name, end);
         Add({end.id, source, name, std::move(end.result), std::move(end.report)});
     }
     void Add(const ControllerEnd& end) {
@@ -137,6 +139,7 @@ private:
     }
 
     FleetReport& report_;
+    std::optional<std::string> store_;
     FleetOutcome outcome_;
     std::optional<ProgressLine> progress_;
     std::size_t done_ = 0, failed_ = 0;
@@ -169,6 +172,17 @@ void StartWorker(WorkerPool* pool, std::size_t id, const CollectOptions& options
     const auto limit =
         Clock::now() + std::chrono::duration_cast<Clock::duration>(deadline) + kTimeToEnd;
     pool->Start(id, options.names.front(), WriteWorkerRequest(options), limit);
+}
+
+void StoreLostVisit(const std::string& uri, const std::string& name, const WorkerEnd& end) {
+    const auto now = std::chrono::duration_cast<std::chrono::seconds>(
+                         std::chrono::system_clock::now().time_since_epoch())
+                         .count();
+    try {
+        Store(uri).AddFailed(name, now, now, end.result.outcome.problem);
+    } catch (const Failure& failure) {
+        Say(failure.what());
+    }
 }
 
 void PassLogLine(std::string_view line) {

@@ -34,6 +34,8 @@ struct HostPlan {
 /// Starts a worker with these options, as HostOptions gives them, and kills it some time after its
 /// deadline.
 void StartWorker(WorkerPool* pool, std::size_t id, const CollectOptions& options);
+/// Stores that the visit failed of a worker that could not do so itself.
+void StoreLostVisit(const std::string& uri, const std::string& name, const WorkerEnd& end);
 /// Hands a worker's line on to standard error.
 void PassLogLine(std::string_view line);
 

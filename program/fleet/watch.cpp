@@ -138,6 +138,9 @@ private:
         if (place == controllers_.end()) return;  // no longer in the lists
         Watched& controller = place->second;
         TellProblem(end.result.outcome, &controller);
+        if (end.lost && options_.collect.store) {
+            StoreLostVisit(*options_.collect.store, controller.options.names.front(), end);
+        }
         if (wasRead) TakeEvents(source, end, &controller);
     }
     /// Once, and when it is over, not at each visit.

@@ -178,7 +178,10 @@ WorkerEnd WorkerPool::End(Worker& worker) {
     const auto result = ParseWorkerResult(worker.message);
     if (result && WIFEXITED(status)) {
         end.result = *result;
-    } else if (worker.killed) {
+        return end;
+    }
+    end.lost = true;
+    if (worker.killed) {
         end.result.outcome = {kExitPart, "did not end at its deadline and was killed",
                               "read this controller alone to see where it hangs"};
     } else {

@@ -21,6 +21,7 @@ struct WorkerEnd {
     std::size_t id;  ///< as it was started
     WorkerResult result;
     FileDescriptor report;  ///< what it wrote to standard output, a file without a name
+    bool lost = false;      ///< it has not said how it went
 };
 
 /// Workers that run at the same time, each a process in a process group of its own: a terminal's

@@ -92,9 +92,9 @@ std::optional<PropertyValue> ValueOf(const Json& json) {
     }
 }
 
-Instance InstanceOf(const Json& json) {
-    Instance instance{TextAt(json, "class"), {}};
-    for (const auto& [name, value] : ObjectAt(json, "properties").items()) {
+Instance InstanceOf(std::string className, const Json& properties) {
+    Instance instance{std::move(className), {}};
+    for (const auto& [name, value] : properties.items()) {
         if (auto known = ValueOf(value)) {
             instance.properties.emplace_back(name, std::move(*known));
         }
@@ -213,7 +213,19 @@ SavedReport::SavedReport(std::string name, std::function<std::unique_ptr<std::is
 }
 
 void SavedReport::ForEach(const std::function<void(const Instance&)>& take) const {
-    Parse(name_, *open_(), [&take](const Json& json) { take(InstanceOf(json)); });
+    Parse(name_, *open_(), [&take](const Json& json) {
+        take(InstanceOf(TextAt(json, "class"), ObjectAt(json, "properties")));
+    });
+}
+
+Instance ParseInstance(std::string className, const std::string& properties) {
+    const Json json = Json::parse(properties, nullptr, false);
+    return InstanceOf(std::move(className), json.is_object() ? json : Json::object());
+}
+
+NQORTQR20::NodeCompleteness ParseCompleteness(const std::string& object) {
+    const Json json = Json::parse(object, nullptr, false);
+    return CompletenessOf(json.is_object() ? json : Json::object());
 }
 
 bool IsCapture(const std::string& file) {

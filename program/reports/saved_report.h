@@ -28,6 +28,11 @@ private:
     ReportEnd end_;
 };
 
+/// An instance of which the properties stand in a text as JsonProperties writes them, with braces;
+/// and a node's object of `completeness`. What is no such text says nothing.
+NQORTQR20::Instance ParseInstance(std::string className, const std::string& properties);
+NQORTQR20::NodeCompleteness ParseCompleteness(const std::string& object);
+
 /// Whether a file is a capture of --record, by its beginning.
 bool IsCapture(const std::string& file);
 

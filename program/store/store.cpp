@@ -113,6 +113,12 @@ private:
     }
 
     void WriteSystem() {
+        // It could not be visited until now, and says now who it is.
+        db_.Query(
+            "UPDATE systems SET identity = $2, guid = $3 WHERE name = $1 AND identity = ''"
+            " AND revision = 0 AND NOT EXISTS"
+            " (SELECT 1 FROM systems o WHERE o.name = $1 AND o.identity = $2)",
+            SqlText(visit_.name), SqlText(visit_.Identity()), SqlText(visit_.guid));
         const auto rows = db_.Query(
             "INSERT INTO systems (name, identity, guid, manufacturer, product, serial, source,"
             " first_seen, last_seen, revision) VALUES ($1, $2, $3, $4, $5, $6, $7, $8, $8, 0)"
@@ -593,10 +599,17 @@ void Store::AddUnchanged(const StoredSystem& system, std::int64_t started, std::
 void Store::AddFailed(const std::string& name, std::int64_t started, std::int64_t finished,
                       const std::string& problem) {
     Transaction transaction(*database_);
-    const auto rows = database_->Query(
+    auto rows = database_->Query(
         "UPDATE systems SET revision = revision"
         " WHERE name = $1 AND gone IS NULL RETURNING id",
         SqlText(name));
+    if (rows.empty()) {
+        rows = database_->Query(
+            "INSERT INTO systems (name, identity, guid, manufacturer, product, serial, source,"
+            " first_seen, last_seen, revision) VALUES ($1, '', '', '', '', '', '', $2, $2, 0)"
+            " ON CONFLICT (name, identity) DO UPDATE SET gone = NULL RETURNING id",
+            SqlText(name), finished);
+    }
     for (const SqlRow& row : rows) {
         CountVisit(*database_, IntegerOf(row.at(0)), "failed", started, finished, SqlText(problem));
     }

@@ -117,7 +117,8 @@ public:
     std::vector<std::string> Add(const Visit& visit, const std::optional<StoredSystem>& before);
     /// Stores that a controller was found as it was.
     void AddUnchanged(const StoredSystem& system, std::int64_t started, std::int64_t finished);
-    /// Stores that a controller could not be visited, where its name is known.
+    /// Stores that a controller could not be visited; one that never was is a system without an
+    /// identity until it is.
     void AddFailed(const std::string& name, std::int64_t started, std::int64_t finished,
                    const std::string& problem);
 
@@ -136,7 +137,7 @@ public:
     /// What was known when a visit had been stored; empty when there is none of that number.
     std::optional<StoredState> StateAt(std::int64_t visit);
 
-    Database& database() { return *database_; }
+    Database& database() const { return *database_; }
 
 private:
     std::unique_ptr<Database> database_;

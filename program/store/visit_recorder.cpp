@@ -33,6 +33,20 @@ std::string PropertiesOf(const NQORTQR20::Instance& instance) {
     return "{" + JsonProperties(instance) + "}";
 }
 
+/// What of a controller holds for the moment only.
+constexpr std::string_view kMomentary[] = {
+    "SelfTest",         "Time",    "ClockOffsetSeconds", "ClockUncertaintySeconds",
+    "UTCOffsetMinutes", "PowerOn", "LastPowerEvent",     "PowerFaults",
+    "ChassisIntrusion"};
+
+NQORTQR20::Instance Without(NQORTQR20::Instance instance,
+                            std::span<const std::string_view> properties) {
+    std::erase_if(instance.properties, [&](const auto& property) {
+        return std::find(properties.begin(), properties.end(), property.first) != properties.end();
+    });
+    return instance;
+}
+
 std::optional<std::int64_t> SecondsOf(const MaybeTime& time) {
     return time ? std::optional(time->seconds) : std::nullopt;
 }
@@ -144,7 +158,7 @@ void VisitRecorder::Record(const NQORTQR20::Instance& instance, Visit* visit) {
             {"firmware", "Controller", controller.controllerManufacturer, "", "", "",
              controller.firmware +
                  (controller.auxiliaryRevision.empty() ? "" : " " + controller.auxiliaryRevision),
-             "{}"});
+             PropertiesOf(Without(instance, kMomentary))});
     }
 }
 

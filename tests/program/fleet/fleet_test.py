@@ -138,8 +138,9 @@ class Fleet(unittest.TestCase):
 
     def test_a_worker_that_is_killed_is_told_and_the_others_go_on(self):
         with Controllers(4, "--records", "2", "--delay", "300") as all_of_them:
-            with subprocess.Popen(self.command(all_of_them.sources, "--format", "ndjson"), stdout=subprocess.PIPE,
-                                  stderr=subprocess.PIPE, text=True, env=self.environment) as run:
+            uri = "sqlite:" + self.folder.name + "/store.db"
+            with subprocess.Popen(self.command(all_of_them.sources, "--format", "ndjson", "--store", uri),
+                                  stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True, env=self.environment) as run:
                 workers = self.workers(run.pid, 4)
                 name = all_of_them.names[1]
                 victim = next(pid for pid in workers if name in arguments(pid))
@@ -152,6 +153,7 @@ class Fleet(unittest.TestCase):
                 if "summary" in line:
                     complete[line["system"]] = line["summary"]["complete"]
             self.assertEqual(complete, {each: each != name for each in all_of_them.names})
+            self.assertRegex(self.check("--store", uri, "--system", name).stdout, "UNKNOWN - its worker was ended by Killed")
 
     def workers(self, pid, count):
         """The worker processes, once there are so many."""

@@ -238,6 +238,74 @@ TEST_P(StoreOf, TheQuestionsOfTheDocumentAreAnswered) {
     EXPECT_EQ(questions, 10);
 }
 
+TEST_P(StoreOf, AReportHasEveryEventThatWasEverInALog) {
+    const auto report = [&](std::vector<std::string> more) {
+        const std::string out = (folder.path() / "report").string();
+        std::filesystem::remove(out);
+        more.insert(more.begin(), {"report", "--store", uri, "--output", out});
+        Result result = Run(more);
+        result.out = ReadText(out);
+        return result;
+    };
+    bmc.Grow(true);
+    bmc.Grow(true);
+    Visit(bmc.Server());
+    std::vector<std::string> raws = RawsOf(bmc.log);
+    bmc.Clear();
+    bmc.Grow(true);
+    Visit(bmc.Server());
+    raws.push_back(Raw(bmc.log.at(0)));
+    Visit(bmc.Server(), {"--name", "other"});
+    const Result ofOne = report({"--format", "events", "--system", "bmc"});
+    EXPECT_EQ(ofOne.exitStatus, 0) << ofOne.err;
+    EXPECT_EQ(ofOne.Raws(), raws);
+    for (const Json& event : ofOne.Events()) {
+        EXPECT_EQ(event["system"], "bmc");
+        EXPECT_EQ(event["guid"], "ffeeddcc-bbaa-9988-7766-554433221100");
+    }
+    // What is true now is told of all of them, and in every format.
+    const Json ofAll = Json::parse(report({"--format", "json"}).out);
+    std::vector<std::string> nodes;
+    for (const Json& instance : ofAll["instances"]) {
+        nodes.push_back(instance["class"].get<std::string>() +
+                        instance["properties"]["Node"].dump());
+    }
+    EXPECT_THAT(nodes,
+                ElementsAre("IPMI_Controller1", "IPMI_Event1", "IPMI_Event1", "IPMI_Event1",
+                            "IPMI_Finding1", "IPMI_Controller2", "IPMI_Event2", "IPMI_Finding2"));
+    EXPECT_EQ(ofAll["complete"], true);
+    for (const char* const format : {"table", "html", "csv", "otlp", "prometheus", "ndjson"}) {
+        EXPECT_THAT(report({"--format", format}).out, Not(IsEmpty())) << format;
+    }
+    ipmisel::Store(uri).AddFailed("other", 1, 2, "no answer");
+    const Result inPart = report({"--format", "json"});
+    EXPECT_EQ(inPart.exitStatus, 4);
+    EXPECT_THAT(inPart.out, HasSubstr("when it was not read: no answer"));
+    EXPECT_EQ(report({"--system", "nobody"}).exitStatus, 2);
+}
+
+TEST_P(StoreOf, ACheckTellsOfWhatIsNotOrNoLongerVisited) {
+    const auto told = [&](std::vector<std::string> more) {
+        more.insert(more.begin(), {"check", "--store", uri});
+        ::testing::internal::CaptureStdout();
+        const int status = Run(more).exitStatus;
+        return std::pair(status, ::testing::internal::GetCapturedStdout());
+    };
+    const std::int64_t now = std::time(nullptr);
+    ipmisel::Store(uri).AddFailed("bmc", now, now, "no answer");  // never seen before
+    EXPECT_EQ(told({}).first, 3);
+    EXPECT_THAT(told({"--system", "bmc"}).second, HasSubstr("no answer"));
+    bmc.Grow(false);
+    const Result visit = Visit(bmc.Server());
+    EXPECT_EQ(visit.err, "");  // is no other controller
+    EXPECT_THAT(Column("SELECT name FROM systems"), SizeIs(1));
+    EXPECT_EQ(told({}).first, 0);
+    ipmisel::Store(uri).database().Query("UPDATE visits SET finished = $1", now - 7200);
+    EXPECT_EQ(told({}).first, 0);
+    EXPECT_EQ(told({"--max-age", "3600"}).first, 3);
+    EXPECT_THAT(told({"--max-age", "3600"}).second, HasSubstr("not visited since"));
+}
+
 class StoreRoles : public StoreTest {};
 INSTANTIATE_TEST_SUITE_P(, StoreRoles, Values(true), StoreName);
 
