@@ -92,6 +92,22 @@ class InTheGuest(unittest.TestCase):
         self.assertEqual(
             equal_instances.differences(report["instances"], replayed, "replay of the guest"), [])
 
+    def test_a_record_costs_one_command(self):
+        log = [bytes([i, 0]) + SEL[i % len(SEL)][2:] for i in range(1, 201)]
+        sensors = [bytes([i, 0]) + SDRS[i % len(SDRS)][2:] for i in range(1, 41)]
+        with guest.ipmi_sim(log, []) as (_, tcp):
+            run = self.run_guest(LOG, external(tcp))
+        self.assertEqual(len(json.loads(run.out)["instances"]), len(log))
+        self.assertIn(run.transactions, range(len(log), len(log) + 24))
+        # QEMU's own BMC gives whole sensor records, ipmi_sim only parts.
+        with tempfile.NamedTemporaryFile() as file:
+            file.write(b"".join(sensors))
+            file.flush()
+            run = self.run_guest(LOG, ["-device", f"ipmi-bmc-sim,id=bmc0,sdrfile={file.name}",
+                                       *KCS_INTERNAL[2:]])
+        self.assertEqual(json.loads(run.out)["completeness"][0]["sensors"]["read"], len(sensors))
+        self.assertIn(run.transactions, range(len(sensors), len(sensors) + 24))
+
     def test_an_empty_log_is_whole(self):
         run = self.run_guest(LOG, KCS_INTERNAL)
         self.assertEqual(run.status, 0, run.err)
