@@ -89,12 +89,18 @@ TEST_F(Collecting, FormatsAndPlacesAgree) {
 
     const std::string file = InPlace("report");
     place.Write("report", "what was there before");
-    // What stands there keeps its mode; a new file is the user's alone.
+    // What stands there keeps its mode and owner; a new file is the user's alone.
+    struct stat old {
+    }, kept{};
+    EXPECT_TRUE(chown(file.c_str(), 12345, 23456) == 0 || errno == EPERM);
     std::filesystem::permissions(file, std::filesystem::perms(0664));
+    EXPECT_EQ(stat(file.c_str(), &old), 0);
     const mode_t before = umask(0);
     EXPECT_EQ(Collect(source, {"--output", file}).out, "");
     EXPECT_EQ(ReadText(file), table.out);
-    EXPECT_EQ(std::filesystem::status(file).permissions(), std::filesystem::perms(0664));
+    EXPECT_EQ(stat(file.c_str(), &kept), 0);
+    EXPECT_EQ(std::tuple(kept.st_mode, kept.st_uid, kept.st_gid),
+              std::tuple(old.st_mode, old.st_uid, old.st_gid));
     std::filesystem::remove(file);
     Collect(source,
             {"--output", file, "--record", InPlace("capture"), "--log-file", InPlace("log")});
