@@ -34,6 +34,7 @@ enum fdrClassMark : std::uint32_t {
     kReadsSensors = 8,   ///< the sensor repository has to be read for it
     kWrittenAtEnd = 16,  ///< written when the pass is over: what is asked for after it takes a pass
                          ///< of its own
+    kInbandOnly = 32,    ///< empty where the controller is reached over the network
 };
 
 struct fdrClassInfo {

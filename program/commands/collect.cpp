@@ -271,6 +271,7 @@ Outcome CollectTo(const CollectOptions& options, LogLines& log, ReportOutput& ou
         wanted = ClassesToCollect(source.classes, {}, *plugins);
     }
     for (const NQORTQR20::UnreachableNode& node : source.unreachable) Say(node.reason);
+    if (options.alone && source.facts.ipmiLan) TellInbandOnly(options.report.classes, *plugins);
     const std::vector<SystemInfo> systems = SystemsOf(source, options);
     for (const SystemInfo& system : systems) settings.systemNames.push_back(system.name);
     NQORTQR20::SetPluginSettings(std::move(settings));

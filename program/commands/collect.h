@@ -22,6 +22,7 @@ struct CollectOptions {
     std::vector<std::string> names;  ///< of the systems, as their sources follow each other
     std::optional<std::string> severities;
     bool progress = true;              ///< on standard error, where that is a terminal
+    bool alone = true;                 ///< not one of many, all of which are told once
     std::optional<std::string> store;  ///< URI of the store that the systems are visited for
     bool onlyNew = false;              ///< report only the events that the store does not have
 };

@@ -6,6 +6,7 @@
 
 #include "program/commands/arguments.h"
 #include "program/commands/failure.h"
+#include "program/reports/terminal_text.h"
 
 namespace ipmisel {
 namespace {
@@ -67,6 +68,17 @@ std::vector<std::string> ClassesToCollect(const std::vector<std::string>& named,
     if (wanted.empty()) wanted = plugins.DefaultClasses();
     WithPlugins([&] { plugins.CheckNeededFiles(wanted); });
     return wanted;
+}
+
+void TellInbandOnly(const std::vector<std::string>& named, const NQORTQR20::PluginSet& plugins) {
+    std::string names;
+    for (const std::string& name : named) {
+        if (!plugins.FindClass(name)->Is(NQORTQR20::kInbandOnly)) continue;
+        names += (names.empty() ? "" : ", ") + name;
+    }
+    if (names.empty()) return;
+    Say("over the network there is no " + names +
+        "; leave that out, or collect it with --from inband on the machine itself");
 }
 
 }  // namespace ipmisel

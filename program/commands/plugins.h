@@ -28,4 +28,7 @@ std::vector<std::string> ClassesToCollect(const std::vector<std::string>& named,
                                           std::span<const std::string_view> ofFormat,
                                           const NQORTQR20::PluginSet& plugins);
 
+/// Says which of the classes that are named a controller on the network does not give.
+void TellInbandOnly(const std::vector<std::string>& named, const NQORTQR20::PluginSet& plugins);
+
 }  // namespace ipmisel

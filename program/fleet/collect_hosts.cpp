@@ -230,6 +230,7 @@ int CollectHosts(const CollectOptions& options, const HostsOptions& hosts) {
         head.classes = plugins->Classes();
         head.wanted = ClassesToCollect(options.report.classes, format.classes, *plugins);
         head.named = !options.report.classes.empty();
+        TellInbandOnly(options.report.classes, *plugins);
     }
     common.report.format = WorkerFormat(format.name);
     const bool lines = common.report.format == format.name && format.name != "json";

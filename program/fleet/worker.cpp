@@ -40,7 +40,7 @@ std::string Message(const Json& json) {
 
 CollectOptions ParseRequest(const std::string& message) {
     CollectOptions options;
-    options.progress = false;
+    options.progress = options.alone = false;
     try {
         const Json json = Json::from_cbor(message);
         options.access.sources = {json.at("source").get<std::string>()};

@@ -338,7 +338,11 @@ private:
         }
         if (last.empty()) last = "nothing";
         const Outcome outcome = OutcomeOf(end);
-        last += outcome.problem.empty() ? ". Complete." : "; " + outcome.problem + ".";
+        if (!outcome.problem.empty()) {
+            last += "; " + outcome.problem + ".";
+        } else {
+            last += headed ? ". Event log and sensors are complete." : ". Complete.";
+        }
         PrintWrapped("Collected: " + last);
     }
 

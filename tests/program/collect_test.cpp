@@ -113,6 +113,19 @@ TEST_F(Collecting, FormatsAndPlacesAgree) {
     EXPECT_THAT(Left(), ElementsAre("report"));
 }
 
+TEST_F(Collecting, WhatThereIsNotIsToldAndNotCalledComplete) {
+    Json server = Server();
+    server["ipmi_lan"] = true;
+    server["bmcs"][0]["faults"] = {{{"netfn", "0a"}, {"command", "10"}, {"completion_code", "ff"}}};
+    const std::string source = Write(server);
+    const Ended ended = Collect(source, {"--class", "QORSG_IPMIFRU", "--class", "IPMI_FRU"});
+    EXPECT_EQ(ended.exitStatus, 0);
+    EXPECT_THAT(ended.err, MatchesRegex("ipmisel: over the network there is no QORSG_IPMIFRU; "
+                                        "[^\n]+\n"));
+    EXPECT_THAT(ended.out, EndsWith("Event log and sensors are complete.\n"));
+    EXPECT_EQ(Collect(source).err, "");  // nobody asked for it by name
+}
+
 TEST_F(Collecting, ClassesComeInTheirOrderOrTheUsers) {
     const std::vector<std::string> listed = Lines(Run({"classes"}).out);
     ASSERT_THAT(listed, SizeIs(Ge(9U)));

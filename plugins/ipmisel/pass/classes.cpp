@@ -87,14 +87,14 @@ constexpr fdrClassInfo Class(const char* name, const char* description, std::uin
 }
 
 constexpr fdrClassInfo kClasses[] = {
-    Class(ipmisel::kBmcFirmwareClass, "firmware of the management controller", kByDefault,
-          kBmcFirmware),
-    Class(ipmisel::kCpldFirmwareClass, "CPLD versions", kByDefault, kPartFirmware),
-    Class(ipmisel::kFpgaFirmwareClass, "FPGA revisions", kByDefault, kPartFirmware),
-    Class(ipmisel::kBackplaneFirmwareClass, "backplane controller firmware", kByDefault,
-          kPartFirmware),
+    Class(ipmisel::kBmcFirmwareClass, "firmware of the management controller",
+          kByDefault | kInbandOnly, kBmcFirmware),
+    Class(ipmisel::kCpldFirmwareClass, "CPLD versions", kByDefault | kInbandOnly, kPartFirmware),
+    Class(ipmisel::kFpgaFirmwareClass, "FPGA revisions", kByDefault | kInbandOnly, kPartFirmware),
+    Class(ipmisel::kBackplaneFirmwareClass, "backplane controller firmware",
+          kByDefault | kInbandOnly, kPartFirmware),
     Class(ipmisel::kFruClass, "inventory of field-replaceable units",
-          kByDefault | kReadsSensors | kWrittenAtEnd, kFru),
+          kByDefault | kReadsSensors | kWrittenAtEnd | kInbandOnly, kFru),
     Class(ipmisel::kLogRecordClass, "the system event log, decoded",
           kByDefault | kPerLogRecord | kReadsLog | kReadsSensors, kLogRecord, "SourceNode"),
     Class(ipmisel::kAuxDebugClass, "debug entries of the auxiliary log",

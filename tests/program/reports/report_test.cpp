@@ -116,7 +116,7 @@ Time                 Severity  Part         What happened
 Not read
   Read FRU Data 0005: no response
 
-Collected: 1 IPMI_Event, 1 IPMI_Finding. Complete.
+Collected: 1 IPMI_Event, 1 IPMI_Finding. Event log and sensors are complete.
 )");
 }
 
