@@ -4,6 +4,8 @@
 #include <array>
 #include <utility>
 
+#include "base/bytes.h"
+
 namespace ipmi {
 
 namespace {
@@ -88,11 +90,11 @@ struct SpecificCode {
 
 // Codes that mean something for one command only, from the clauses of those commands.
 constexpr std::array kSpecificCodes = std::to_array<SpecificCode>({
-    {kReadFruData, 0x81, "FRU device busy"},
-    {kGetSelInfo, 0x81, "SEL erase in progress"},
-    {kGetSelEntry, 0x81, "SEL erase in progress"},
-    {kReserveSel, 0x81, "SEL erase in progress"},
-    {kGetPefConfigurationParameters, 0x80, "parameter not supported"},
+    {kReadFruData, kFruDeviceBusy, "FRU device busy"},
+    {kGetSelInfo, kSelEraseInProgress, "SEL erase in progress"},
+    {kGetSelEntry, kSelEraseInProgress, "SEL erase in progress"},
+    {kReserveSel, kSelEraseInProgress, "SEL erase in progress"},
+    {kGetPefConfigurationParameters, kParameterNotSupported, "parameter not supported"},
     {kSendMessage, 0x80, "invalid session handle"},
     {kSendMessage, 0x81, "lost arbitration"},
     {kSendMessage, 0x82, "bus error"},
@@ -148,6 +150,18 @@ Command GetSelEntry(std::uint16_t recordId, std::uint8_t offset, std::uint8_t co
                     std::uint16_t reservation) {
     return MakeCommand(kGetSelEntry, {Low(reservation), High(reservation), Low(recordId),
                                       High(recordId), offset, count});
+}
+
+std::optional<RecordRead> RecordRead::Parse(std::span<const std::uint8_t> data) {
+    constexpr std::size_t kLength = 6;
+    if (data.size() != kLength) return std::nullopt;
+    ipmisel::ByteReader in(data);
+    RecordRead read;
+    read.reservation = in.U16();
+    read.recordId = in.U16();
+    read.offset = in.U8();
+    read.count = in.U8();
+    return read;
 }
 
 Command GetSdr(std::uint16_t recordId, std::uint8_t offset, std::uint8_t count,

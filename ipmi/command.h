@@ -1,7 +1,11 @@
 #pragma once
 
+#include <algorithm>
 #include <compare>
+#include <cstddef>
 #include <cstdint>
+#include <optional>
+#include <span>
 #include <string_view>
 #include <vector>
 
@@ -18,6 +22,8 @@ constexpr std::uint8_t kNetFnApplication = 0x06;
 constexpr std::uint8_t kNetFnFirmware = 0x08;
 constexpr std::uint8_t kNetFnStorage = 0x0A;
 constexpr std::uint8_t kNetFnTransport = 0x0C;
+/// From here on network functions are for groups and vendors to define.
+constexpr std::uint8_t kFirstOemNetFn = 0x2E;
 
 /// The controller itself: its slave address on the IPMB and the LUN of its standard commands.
 constexpr std::uint8_t kBmcAddress = 0x20;
@@ -116,6 +122,25 @@ Command ReserveSdrRepository();
 Command GetSdr(std::uint16_t recordId, std::uint8_t offset = 0, std::uint8_t count = kWholeRecord,
                std::uint16_t reservation = kNoReservation);
 
+/// What Get SEL Entry and Get SDR ask for.
+struct RecordRead {
+    std::uint16_t reservation = kNoReservation;
+    std::uint16_t recordId = kFirstRecordId;
+    std::uint8_t offset = 0;
+    std::uint8_t count = 0;
+
+    /// From the data of the request; empty when there are more or fewer than it has.
+    static std::optional<RecordRead> Parse(std::span<const std::uint8_t> data);
+    bool IsOfFirst() const { return recordId == kFirstRecordId; }
+    bool IsOfWhole() const { return offset == 0 && count == kWholeRecord; }
+};
+/// Where the record stands in the answer to them: behind completion code and next record ID.
+constexpr std::size_t kRecordAt = 3;
+/// What such an answer, from the completion code on, has of the record.
+inline std::span<const std::uint8_t> RecordIn(std::span<const std::uint8_t> answer) {
+    return answer.subspan(std::min(kRecordAt, answer.size()));
+}
+
 /// Sensors stand at the LUN that their record gives.
 Command GetSensorReading(std::uint8_t number, std::uint8_t lun = kBmcLun);
 Command GetSensorThresholds(std::uint8_t number, std::uint8_t lun = kBmcLun);
@@ -131,7 +156,9 @@ Command ReadFruData(std::uint8_t device, std::uint16_t offset, std::uint8_t coun
 
 /// Completion codes, table 5-2.
 constexpr std::uint8_t kCompleted = 0x00;
-constexpr std::uint8_t kFruDeviceBusy = 0x81;  ///< of the FRU commands (34.2)
+constexpr std::uint8_t kParameterNotSupported = 0x80;  ///< of the PEF parameters (30.4)
+constexpr std::uint8_t kSelEraseInProgress = 0x81;     ///< of the commands of the log (31.2)
+constexpr std::uint8_t kFruDeviceBusy = 0x81;          ///< of the FRU commands (34.2)
 constexpr std::uint8_t kNodeBusy = 0xC0;
 constexpr std::uint8_t kInvalidCommand = 0xC1;
 constexpr std::uint8_t kInvalidForLun = 0xC2;

@@ -31,12 +31,6 @@ bool ReadName(Bytes record, std::size_t at, std::string* name) {
     return TypeLength::FromByte(record[at]).Bytes() <= rest.size();
 }
 
-// Where the ID string of each type of record begins, from 0.
-constexpr std::size_t kFullName = 47;
-constexpr std::size_t kCompactName = 31;
-constexpr std::size_t kEventOnlyName = 16;
-constexpr std::size_t kLocatorName = 15;
-
 void ReadKey(ByteReader* in, Sensor* sensor) {
     sensor->key.owner = in->U8();
     const std::uint8_t where = in->U8();
@@ -122,17 +116,17 @@ bool ReadSensor(Bytes bytes, SdrRecord* record) {
         const std::uint8_t share = in.U8();
         const std::uint8_t modifier = in.U8();
         if (in.ok()) record->sharing = ReadSharing(share, modifier);
-        whole = ReadName(bytes, kEventOnlyName, &sensor.name);
+        whole = ReadName(bytes, kEventOnlyNameAt, &sensor.name);
     } else {
         if (!ReadCommon(&in, &sensor)) return false;
         if (sensor.type == SdrType::kFull) {
             sensor.analog = ReadAnalog(bytes, sensor);
-            whole = ReadName(bytes, kFullName, &sensor.name);
+            whole = ReadName(bytes, kFullNameAt, &sensor.name);
         } else {
             const std::uint8_t share = in.U8();
             const std::uint8_t modifier = in.U8();
             if (in.ok()) record->sharing = ReadSharing(share, modifier);
-            whole = ReadName(bytes, kCompactName, &sensor.name);
+            whole = ReadName(bytes, kCompactNameAt, &sensor.name);
         }
     }
     record->body = std::move(sensor);
@@ -170,7 +164,7 @@ template <typename Locator>
 bool ReadNamedEntity(ByteReader in, Bytes bytes, Locator locator, SdrRecord* record) {
     locator.entity = ReadEntity(&in);
     if (!in.ok()) locator.entity = {};
-    const bool whole = ReadName(bytes, kLocatorName, &locator.name);
+    const bool whole = ReadName(bytes, kLocatorNameAt, &locator.name);
     record->body = std::move(locator);
     return whole;
 }
@@ -307,7 +301,7 @@ std::optional<SdrRecord> SdrRecord::Parse(std::span<const std::uint8_t> bytes) {
     if (!header) return std::nullopt;
     SdrRecord record;
     record.header = *header;
-    const std::size_t claimed = kSdrHeaderLength + header->length;
+    const std::size_t claimed = header->RecordLength();
     record.whole =
         ReadBody(bytes.first(std::min(bytes.size(), claimed)), &record) && bytes.size() >= claimed;
     return record;

@@ -28,6 +28,12 @@ constexpr std::size_t kMaxSdrLength = kSdrHeaderLength + 0xFF;
 /// The last offset that a part can be read from: Get SDR has one byte for it (clause 33.12).
 constexpr std::size_t kMaxSdrOffset = 0xFF;
 
+/// Where the ID string begins, type/length byte first (tables 43-1 to 43-3, 43-6 to 43-8).
+constexpr std::size_t kFullNameAt = 47;
+constexpr std::size_t kCompactNameAt = 31;
+constexpr std::size_t kEventOnlyNameAt = 16;
+constexpr std::size_t kLocatorNameAt = 15;
+
 enum class SdrType : std::uint8_t {
     kFull = 0x01,
     kCompact = 0x02,
@@ -48,6 +54,7 @@ struct SdrHeader {
     SdrType type{};
     std::uint8_t length = 0;  ///< of what follows
 
+    std::size_t RecordLength() const { return kSdrHeaderLength + length; }
     static std::optional<SdrHeader> Parse(std::span<const std::uint8_t> bytes);
 };
 

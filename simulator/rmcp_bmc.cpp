@@ -11,6 +11,8 @@
 #include <stdexcept>
 #include <string_view>
 
+#include "ipmi/command.h"
+
 namespace ipmisim {
 namespace {
 
@@ -204,8 +206,12 @@ Packet RmcpBmc::Sessionless(const Packet& packet) const {
     const std::uint8_t status = options_.kg.empty() ? 0x04 : 0x24;
     const std::uint8_t versions = options_.deviations.noIpmi20 ? 0x01 : 0x03;
     Packet data;
-    if (message[5] == 0x38) data = {0, 1, 0x80, status, versions, 0, 0, 0, 0};
-    if (message[5] == 0x54 && message[8] == 0x80) data = ListedSuites();  // the first answer
+    const ipmi::CommandCode command{ipmi::kNetFnApplication, message[5]};
+    if (command == ipmi::kGetChannelAuthenticationCapabilities) {
+        data = {0, 1, 0x80, status, versions, 0, 0, 0, 0};
+    } else if (command == ipmi::kGetChannelCipherSuites && message[8] == 0x80) {
+        data = ListedSuites();  // the first answer
+    }
     if (data.empty()) return {};
     const Packet reply = Reply(message, data);
     return Join({Cut(packet, 0, 13), Number(static_cast<std::uint32_t>(reply.size()), 1), reply});
@@ -323,13 +329,14 @@ Packet RmcpBmc::Execute(const Packet& packet, bool busy) {
     if (message.size() < 7) return {};
     const auto netFn = static_cast<std::uint8_t>(message[1] >> 2);
     const Packet data = Cut(message, 6, message.size() - 7);
-    if (netFn == 0x06 && message[5] == 0x3B && !data.empty()) {
-        return Answered(message, {0, data[0]});
+    const ipmi::CommandCode command{netFn, message[5]};
+    if (command == ipmi::kSetSessionPrivilegeLevel && !data.empty()) {
+        return Answered(message, {ipmi::kCompleted, data[0]});
     }
-    if (netFn == 0x06 && message[5] == 0x3C) return Answered(message, {0});
+    if (command == ipmi::kCloseSession) return Answered(message, {ipmi::kCompleted});
     ++requests_;
-    if (busy) return Answered(message, {0xC0});
-    const auto response = bmc_.Execute(netFn, message[1] & 3, message[5], data);
+    if (busy) return Answered(message, {ipmi::kNodeBusy});
+    const auto response = bmc_.Execute(netFn, message[1] & 3, command.number, data);
     return response ? Answered(message, *response) : Packet();
 }
 

@@ -70,7 +70,7 @@ Bytes ReadRecord(const Records& records, const Index& index, std::uint16_t id, s
     const auto part =
         count == ipmi::kWholeRecord ? rest : rest.first(std::min<std::size_t>(count, rest.size()));
     Bytes answer{kCompleted};
-    answer.reserve(3 + part.size());
+    answer.reserve(ipmi::kRecordAt + part.size());
     AppendU16(&answer, position + 1 < records.size() ? U16At(records[position + 1], 0)
                                                      : ipmi::kLastRecordId);
     answer.insert(answer.end(), part.begin(), part.end());
@@ -285,15 +285,14 @@ std::optional<Bytes> SimulatedBmc::ReserveSdrRepository(const Request&) {
 }
 
 std::optional<Bytes> SimulatedBmc::GetSdr(const Request& request) {
-    constexpr std::size_t kMaxPart = 22;         // of a controller that gives no whole records
-    constexpr std::size_t kCompletionAndId = 3;  // what stands before the part in an answer
+    constexpr std::size_t kMaxPart = 22;  // of a controller that gives no whole records
     const auto data = request.data;
     const std::uint8_t offset = data[4];
     if (offset != 0 && (sdrReservation_ == 0 || U16At(data, 0) != sdrReservation_)) {
         return Bytes{ipmi::kReservationCanceled};
     }
     Bytes answer = ReadRecord(description_.sdrRecords, sdrIndex_, U16At(data, 2), offset, data[5]);
-    if (!description_.wholeSdr && answer.size() > kCompletionAndId + kMaxPart) {
+    if (!description_.wholeSdr && ipmi::RecordIn(answer).size() > kMaxPart) {
         return Bytes{ipmi::kCannotReturnBytes};
     }
     return answer;
@@ -301,14 +300,15 @@ std::optional<Bytes> SimulatedBmc::GetSdr(const Request& request) {
 
 std::optional<Bytes> SimulatedBmc::GetSelInfo(const Request&) {
     const auto& entries = description_.selEntries;
-    const auto newest = std::find_if(entries.rbegin(), entries.rend(), [](const auto& entry) {
-        const ipmi::RecordKind kind = ipmi::KindOfRecord(entry[2]);
-        return kind == ipmi::RecordKind::kSensorEvent || kind == ipmi::RecordKind::kOemTimestamped;
-    });
-    const std::uint32_t newestTime =
-        newest == entries.rend()
-            ? kNoTime
-            : U16At(*newest, 3) | static_cast<std::uint32_t>(U16At(*newest, 5)) << 16;
+    std::uint32_t newestTime = kNoTime;
+    for (auto entry = entries.rbegin(); entry != entries.rend(); ++entry) {
+        const auto record = ipmi::ParseSelRecord(*entry);
+        if (record && (record->kind == ipmi::RecordKind::kSensorEvent ||
+                       record->kind == ipmi::RecordKind::kOemTimestamped)) {
+            newestTime = record->time;
+            break;
+        }
+    }
     constexpr std::uint8_t kOverflow = 0x80;
     const std::size_t left = (0xFFFF - Count16(entries.size())) * ipmi::kSelRecordSize;
     return RepositoryInfo(

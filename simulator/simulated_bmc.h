@@ -10,6 +10,9 @@
 #include <utility>
 #include <vector>
 
+#include "ipmi/command.h"
+#include "ipmi/sel_info.h"
+
 namespace ipmisim {
 
 using Bytes = std::vector<std::uint8_t>;
@@ -35,7 +38,7 @@ struct FixedReply {
 
 /// How a sensor is found: owner and LUN as a sensor record has them, and its number.
 struct SensorAddress {
-    std::uint8_t owner = 0x20;
+    std::uint8_t owner = ipmi::kBmcAddress;
     std::uint8_t lun = 0;
     std::uint8_t number = 0;
     auto operator<=>(const SensorAddress&) const = default;
@@ -53,7 +56,7 @@ struct SimulatedSensor {
 struct BmcDescription {
     std::optional<Bytes> deviceId;  ///< Get Device ID data; completion code 0xC1 without
     unsigned latencyMicroseconds = 0;
-    std::uint8_t selVersion = 0x51;
+    std::uint8_t selVersion = ipmi::kSelVersion;
     std::vector<std::array<std::uint8_t, 16>> selEntries;
     std::optional<std::uint32_t> selTime;       ///< seconds since 1970; the machine's clock without
     std::optional<std::uint16_t> selFreeBytes;  ///< what is left to 65,535 records without
@@ -61,7 +64,7 @@ struct BmcDescription {
     std::optional<std::uint32_t> selLastErase;     ///< unspecified without
     bool selOverflow = false;
     std::optional<std::int16_t> utcOffsetMinutes;  ///< 0xC1 without
-    std::uint8_t sdrVersion = 0x51;
+    std::uint8_t sdrVersion = ipmi::kSelVersion;
     std::vector<Bytes> sdrRecords;
     bool wholeSdr = true;  ///< answers whole records; else 0xCA for more than 22 bytes
     std::map<SensorAddress, SimulatedSensor> sensors;

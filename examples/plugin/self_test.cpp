@@ -15,14 +15,15 @@ constexpr const char* kClass = "EXAMPLE_SelfTest";
 
 /// Sends Get Self Test Results to a node; false when no result came.
 bool ReadSelfTest(SPLibrary& node, unsigned char* result, unsigned char* detail) {
-    // Request: 0x01, responder address, NetFn App, LUN, command; no data.
-    // Reply: completion code in byte 4; from byte 8 the completion code again and the data.
-    unsigned char buffer[64] = {0x01, 0x20, 0x06, 0x00, 0x04};
+    constexpr unsigned char kNetFnApplication = 0x06;
+    constexpr unsigned char kGetSelfTestResults = 0x04;
+    unsigned char buffer[64] = {};
+    frame::LayOutRequest(buffer, kNetFnApplication, 0, kGetSelfTestResults);
     int length = 0;
     if (!node.sendIPMICommand(buffer, &length, sizeof buffer, true)) return false;
-    if (buffer[4] != 0 || length < 2) return false;
-    *result = buffer[9];
-    *detail = buffer[10];
+    if (buffer[frame::kCompletionCodeAt] != 0 || length < 2) return false;
+    *result = buffer[frame::kResponseDataAt];
+    *detail = buffer[frame::kResponseDataAt + 1];
     return true;
 }
 

@@ -6,7 +6,9 @@
 #include "base/bytes.h"
 #include "base/text.h"
 #include "host/spdriver/stop.h"
+#include "ipmi/sdr_record.h"
 #include "ipmi/sel_info.h"
+#include "ipmi/sel_record.h"
 
 namespace tqrhost {
 namespace {
@@ -17,15 +19,11 @@ constexpr const char* kSensorsChanged = "the sensor repository has changed while
 
 constexpr std::size_t kMaxFaults = 1000;
 
-// Answers, completion code included: version and count; next record ID and one byte of a record;
-// the count of FRU bytes.
+// Answers, completion code included: version and count; the count of FRU bytes; a reservation.
 constexpr std::size_t kInfoAnswer = 4;
 constexpr std::size_t kFruAnswer = 2;
+constexpr std::size_t kReservationAnswer = 3;
 constexpr std::size_t kCountAt = 2;
-constexpr std::size_t kRecordAt = 3;
-constexpr std::size_t kSelEntryLength = 16;
-// The length of a sensor record counts what follows its header (IPMI 2.0, clause 43).
-constexpr std::size_t kSdrHeaderLength = 5;
 
 const char* StopText(StopReason reason) {
     return reason == StopReason::kDeadline ? "deadline" : "interrupted";
@@ -67,7 +65,8 @@ void CompletenessTracker::Note(const RequestFrame& request,
             break;
         case ipmi::kReserveSdrRepository.number:
             FinishWalk(&sensors_);
-            if (const std::string problem = ProblemOf(response, 3); !problem.empty()) {
+            if (const std::string problem = ProblemOf(response, kReservationAnswer);
+                !problem.empty()) {
                 AddFault({"Reserve SDR Repository", "", problem, true});
             }
             break;
@@ -165,44 +164,43 @@ void CompletenessTracker::FinishWalk(Source* source) {
 
 std::size_t CompletenessTracker::WholeAnswer(const Source& source, std::uint16_t record,
                                              std::uint8_t offset, std::uint8_t count) {
-    std::size_t length = source.isLog ? kSelEntryLength : 1;
+    std::size_t length = source.isLog ? ipmi::kSelRecordSize : 1;
     if (!source.isLog && source.record == record && source.recordLength > offset) {
         length = source.recordLength - offset;
     } else if (!source.isLog && count != ipmi::kWholeRecord) {
-        length = std::min<std::size_t>(count, kSdrHeaderLength);
+        length = std::min<std::size_t>(count, ipmi::kSdrHeaderLength);
     }
-    return kRecordAt +
+    return ipmi::kRecordAt +
            (count == ipmi::kWholeRecord ? length : std::min<std::size_t>(count, length));
 }
 
 void CompletenessTracker::NoteRecord(Source* source, const RequestFrame& request,
                                      const std::optional<Response>& response) {
-    ipmisel::ByteReader in(request.data());
-    in.U16();
-    const std::uint16_t record = in.U16();
-    const std::uint8_t offset = in.U8();
-    const std::uint8_t count = in.U8();
+    const ipmi::RecordRead read =
+        ipmi::RecordRead::Parse(request.data()).value_or(ipmi::RecordRead());
+    const std::uint16_t record = read.recordId;
+    const std::uint8_t offset = read.offset;
     source->account->asked = true;
-    const bool wantedWhole = !source->isLog && offset == 0 && count == ipmi::kWholeRecord;
+    const bool wantedWhole = !source->isLog && read.IsOfWhole();
     // A controller may refuse whole records; it is asked for parts then.
     if (wantedWhole && response && ipmi::RefusesSoManyBytes(response->front())) return;
     // An empty log or repository has no first record.
     if (response && response->front() == ipmi::kNotPresent && source->account->announced == 0u)
         return;
     if (offset == 0) {
-        if (record == 0) FinishWalk(source);
+        if (read.IsOfFirst()) FinishWalk(source);
+        const auto header =
+            response ? ipmi::SdrHeader::Parse(ipmi::RecordIn(*response)) : std::nullopt;
         source->record = record;
-        source->recordLength = 0;
+        source->recordLength = header ? header->RecordLength() : 0;
         source->cutAt = 0;
-        if (response && response->size() >= kRecordAt + kSdrHeaderLength) {
-            source->recordLength =
-                kSdrHeaderLength + response->at(kRecordAt + kSdrHeaderLength - 1);
-        }
     }
-    const std::string problem = ProblemOf(response, WholeAnswer(*source, record, offset, count));
+    const std::string problem =
+        ProblemOf(response, WholeAnswer(*source, record, offset, read.count));
     if (!problem.empty()) {
         AddFault({source->readCommand, ipmisel::Format("%04x", record), problem, true});
-        if (wantedWhole && source->recordLength > 0) source->cutAt = response->size() - kRecordAt;
+        if (wantedWhole && source->recordLength > 0)
+            source->cutAt = ipmi::RecordIn(*response).size();
         return;
     }
     if (offset != 0) {
@@ -211,13 +209,13 @@ void CompletenessTracker::NoteRecord(Source* source, const RequestFrame& request
     }
     // The first and the last record can be asked for without their IDs; each counts once.
     std::uint16_t own = record;
-    if ((record == ipmi::kFirstRecordId || record == ipmi::kLastRecordId) &&
-        response->size() >= kRecordAt + 2) {
-        own =
-            static_cast<std::uint16_t>(response->at(kRecordAt) | response->at(kRecordAt + 1) << 8);
+    if (record == ipmi::kFirstRecordId || record == ipmi::kLastRecordId) {
+        ipmisel::ByteReader in(ipmi::RecordIn(*response));
+        const std::uint16_t id = in.U16();
+        if (in.ok()) own = id;
     }
     CountRecord(source, own);
-    if (record == 0) source->walk.fromFirst = true;
+    if (read.IsOfFirst()) source->walk.fromFirst = true;
     ++source->walk.count;
     // An ID with a byte of 0xFF ends the one walk or the other.
     const bool lowEnds = !source->isLog && response->at(1) == 0xFF;
@@ -227,7 +225,7 @@ void CompletenessTracker::NoteRecord(Source* source, const RequestFrame& request
 void CompletenessTracker::NoteRest(Source* source, std::uint16_t record, std::uint8_t offset,
                                    const Response& response) {
     if (source->cutAt == 0 || source->cutAt != offset) return;
-    source->cutAt += response.size() - kRecordAt;
+    source->cutAt += ipmi::RecordIn(response).size();
     if (source->cutAt < source->recordLength) return;
     const auto cut =
         std::find_if(account_.faults.rbegin(), account_.faults.rend(),

@@ -1,34 +1,28 @@
 #include "host/spdriver/controller_memory.h"
 
 #include <algorithm>
+#include <span>
 
 #include "base/bytes.h"
 
 namespace tqrhost {
 namespace {
 
-constexpr std::size_t kReadLength = 6;  // reservation, record, offset, count
-
 /// A read of a record or of a part of it.
 std::optional<Response> AnswerRead(const RecordStore* store,
                                    const std::optional<Response>& reservation,
                                    const ipmi::Command& command) {
-    if (store == nullptr || command.data.size() != kReadLength) return std::nullopt;
-    ipmisel::ByteReader in(command.data);
-    const std::uint8_t reserved[] = {in.U8(), in.U8()};
-    const std::uint16_t id = in.U16();
-    const std::size_t offset = in.U8();
-    const std::size_t count = in.U8();
+    const auto read = ipmi::RecordRead::Parse(command.data);
+    if (store == nullptr || !read) return std::nullopt;
     // Parts are read under the one reservation that was ever given; what a controller says to
     // another one, or to a place past the end, is its own affair.
-    const bool mayReadParts =
-        reservation && reservation->size() >= 3 &&
-        std::equal(std::begin(reserved), std::end(reserved), &(*reservation)[1]);
-    if (offset != 0 && !mayReadParts) return std::nullopt;
-    const auto record = store->Find(id);
-    if (!record || offset >= record->bytes.size() || count == 0) return std::nullopt;
-    const auto rest = record->bytes.subspan(offset);
-    const auto part = count == ipmi::kWholeRecord ? rest : rest.first(std::min(count, rest.size()));
+    if (read->offset != 0 && ReservationIn(reservation) != read->reservation) return std::nullopt;
+    const auto record = store->Find(read->recordId);
+    if (!record || read->offset >= record->bytes.size() || read->count == 0) return std::nullopt;
+    const auto rest = record->bytes.subspan(read->offset);
+    const auto part = read->count == ipmi::kWholeRecord
+                          ? rest
+                          : rest.first(std::min<std::size_t>(read->count, rest.size()));
     Response answer{ipmi::kCompleted, static_cast<std::uint8_t>(record->next),
                     static_cast<std::uint8_t>(record->next >> 8)};
     answer.insert(answer.end(), part.begin(), part.end());
@@ -36,6 +30,16 @@ std::optional<Response> AnswerRead(const RecordStore* store,
 }
 
 }  // namespace
+
+std::optional<std::uint16_t> ReservationIn(const std::optional<Response>& response) {
+    if (!response || response->empty() || response->front() != ipmi::kCompleted) {
+        return std::nullopt;
+    }
+    ipmisel::ByteReader in{std::span(*response).subspan(1)};
+    const std::uint16_t reservation = in.U16();
+    if (!in.ok()) return std::nullopt;
+    return reservation;
+}
 
 std::optional<Response> ControllerMemory::Answer(const ipmi::Command& command) const {
     if (command.lun != ipmi::kBmcLun) return std::nullopt;

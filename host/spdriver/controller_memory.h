@@ -10,6 +10,9 @@
 
 namespace tqrhost {
 
+/// What Reserve SDR Repository answered; empty when it gave none.
+std::optional<std::uint16_t> ReservationIn(const std::optional<Response>& response);
+
 /// What was read of one controller before the plug-ins' pass: its event log and its sensor
 /// repository, in one state for all who ask.
 struct ControllerMemory {

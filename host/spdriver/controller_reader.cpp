@@ -83,9 +83,7 @@ std::optional<ipmi::SelInfo> LogInfoIn(const Response& response) {
 
 /// The record of an answer of Get SEL Entry is this one.
 bool HoldsRecord(const std::optional<Response>& response, const ipmi::SelBytes& record) {
-    constexpr std::size_t kBeforeRecord = 3;  // completion code, next record ID
-    return Completed(response) && response->size() == kBeforeRecord + record.size() &&
-           std::equal(record.begin(), record.end(), response->begin() + kBeforeRecord);
+    return Completed(response) && std::ranges::equal(ipmi::RecordIn(*response), record);
 }
 
 /// Each record names the one that follows by its ID, and the last one none.
@@ -277,9 +275,8 @@ void ControllerReader::StartWhole() {
 void ControllerReader::StartSensors() {
     sensors_ = Reader(ipmi::kGetSdr);
     sensors_->Expect(CountIn(memory_.sensorInfo).value_or(kUnknownCount));
-    if (memory_.reservation) {
-        ipmisel::ByteReader in(DataOf(*memory_.reservation));
-        sensors_->Reserved(in.U16());
+    if (const auto reservation = ReservationIn(memory_.reservation)) {
+        sensors_->Reserved(*reservation);
     }
 }
 

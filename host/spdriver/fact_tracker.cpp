@@ -39,10 +39,9 @@ const Fact* FindFact(std::span<const Fact> facts, ipmi::CommandCode code) {
 
 /// A controller that does not know a command does not have the fact.
 bool IsUnknown(ipmi::CommandCode command, std::uint8_t completionCode) {
-    constexpr std::uint8_t kParameterNotSupported = 0x80;
     return completionCode == ipmi::kInvalidCommand || completionCode == ipmi::kInvalidForLun ||
            (command == ipmi::kGetPefConfigurationParameters &&
-            completionCode == kParameterNotSupported);
+            completionCode == ipmi::kParameterNotSupported);
 }
 
 std::string Key(ipmi::CommandCode code, unsigned which) {

@@ -20,8 +20,9 @@ struct RecordAnswer {
         ipmisel::ByteReader in(response);
         completionCode = in.U8();
         next = in.U16();
-        const std::uint16_t id = in.U16();
-        if (offset == 0 && in.ok()) own = id;
+        ipmisel::ByteReader record(ipmi::RecordIn(response));
+        const std::uint16_t id = record.U16();
+        if (offset == 0 && record.ok()) own = id;
     }
 };
 
@@ -68,12 +69,10 @@ std::optional<Response> LoopGuard::Exchange(const RequestFrame& request) {
 }
 
 std::optional<Response> LoopGuard::Read(Walk* walk, bool isEventLog, const RequestFrame& request) {
-    // Reservation ID, record ID, offset, count.
-    ipmisel::ByteReader in(request.data());
-    in.U16();
-    const std::uint16_t record = in.U16();
-    const std::uint8_t offset = in.U8();
-    if (!in.ok()) return transport_->Exchange(request);
+    const auto read = ipmi::RecordRead::Parse(request.data());
+    if (!read) return transport_->Exchange(request);
+    const std::uint16_t record = read->recordId;
+    const std::uint8_t offset = read->offset;
 
     if (walk->ended && record == ipmi::kFirstRecordId && offset == 0) walk->Restart();
     if (walk->WasGiven(record, offset)) {
@@ -93,7 +92,7 @@ std::optional<Response> LoopGuard::Read(Walk* walk, bool isEventLog, const Reque
         return response;
     }
     const RecordAnswer answer(*response, offset);
-    if (answer.completionCode != 0) {
+    if (answer.completionCode != ipmi::kCompleted) {
         walk->Restart();
         return response;
     }

@@ -19,11 +19,10 @@ constexpr auto kMaxAge = std::chrono::seconds(5);
 constexpr std::size_t kMaxAhead = 256;
 
 /// A read of a part of a sensor record under a reservation.
-bool ReadsPartUnder(const Response& reservation, const ipmi::Command& command) {
-    constexpr std::size_t kReadLength = 6;
-    return command.code() == ipmi::kGetSdr && command.data.size() == kReadLength &&
-           command.data[4] != 0 && reservation.size() >= 3 &&
-           std::equal(command.data.begin(), command.data.begin() + 2, reservation.begin() + 1);
+bool ReadsPartUnder(const std::optional<Response>& reservation, const ipmi::Command& command) {
+    if (command.code() != ipmi::kGetSdr) return false;
+    const auto read = ipmi::RecordRead::Parse(command.data);
+    return read && read->offset != 0 && ReservationIn(reservation) == read->reservation;
 }
 
 void LogNoResponse(const ipmi::Command& command) {
@@ -47,8 +46,8 @@ std::optional<Response> MemoryTransport::Exchange(const RequestFrame& request) {
     const ipmi::Command command = request.ToCommand();
     if (auto remembered = memory_.Answer(command)) return remembered;
     auto response = ExchangeLive(command);
-    if (response && response->front() == ipmi::kReservationCanceled && memory_.reservation &&
-        ReadsPartUnder(*memory_.reservation, command)) {
+    if (response && response->front() == ipmi::kReservationCanceled &&
+        ReadsPartUnder(memory_.reservation, command)) {
         response = ReadUnderNewReservation(command);
     }
     return response;
@@ -122,14 +121,13 @@ void MemoryTransport::AskAhead() {
     }
 }
 
-std::optional<Response> MemoryTransport::ReadUnderNewReservation(ipmi::Command command) {
-    const auto reservation = ExchangeOver(*pipeline_, ipmi::ReserveSdrRepository());
-    if (!reservation || reservation->size() < 3 || reservation->front() != ipmi::kCompleted) {
-        return Response{ipmi::kReservationCanceled};
-    }
-    command.data[0] = reservation->at(1);
-    command.data[1] = reservation->at(2);
-    return ExchangeOver(*pipeline_, std::move(command));
+std::optional<Response> MemoryTransport::ReadUnderNewReservation(const ipmi::Command& command) {
+    const auto reservation = ReservationIn(ExchangeOver(*pipeline_, ipmi::ReserveSdrRepository()));
+    const auto read = ipmi::RecordRead::Parse(command.data);
+    if (!reservation || !read) return Response{ipmi::kReservationCanceled};
+    ipmi::Command again = ipmi::GetSdr(read->recordId, read->offset, read->count, *reservation);
+    again.lun = command.lun;
+    return ExchangeOver(*pipeline_, std::move(again));
 }
 
 }  // namespace tqrhost

@@ -39,7 +39,7 @@ private:
     void AskAhead();
     /// A part of a record is refused because the controller holds the reservation from the reading
     /// no longer: the reader could not know, so a new one is taken for it.
-    std::optional<Response> ReadUnderNewReservation(ipmi::Command command);
+    std::optional<Response> ReadUnderNewReservation(const ipmi::Command& command);
 
     std::unique_ptr<RequestPipeline> pipeline_;
     ControllerMemory memory_;

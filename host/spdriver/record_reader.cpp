@@ -6,13 +6,12 @@
 #include <utility>
 
 #include "base/bytes.h"
+#include "host/spdriver/controller_memory.h"
 #include "ipmi/sdr_record.h"
 #include "ipmi/sel_record.h"
 
 namespace tqrhost {
 namespace {
-
-constexpr std::size_t kBeforeRecord = 3;  // completion code, next record ID
 
 // What fits an answer over every interface of a controller, and what then still may.
 constexpr std::size_t kFirstPart = 22;
@@ -146,11 +145,9 @@ void RecordReader::Reserve() {
                           const auto reader = self.lock();
                           if (!reader) return;
                           reader->reserving_ = false;
-                          const Response none;
-                          ipmisel::ByteReader in(response ? *response : none);
-                          const bool completed = in.U8() == ipmi::kCompleted;
-                          const std::uint16_t reservation = in.U16();
-                          if (completed && in.ok()) reader->reservation_ = reservation;
+                          if (const auto reservation = ReservationIn(response)) {
+                              reader->reservation_ = *reservation;
+                          }
                           // All that is on its way was asked for with the old one.
                           for (auto& [id, record] : reader->incoming_) {
                               if (record.pending != 0 || !record.headed)
@@ -162,11 +159,11 @@ void RecordReader::Reserve() {
 
 void RecordReader::TakeBytes(std::uint16_t id, Incoming* record, std::size_t offset,
                              std::size_t count, const Response& response) {
-    if (response.size() < kBeforeRecord) {
+    if (response.size() < ipmi::kRecordAt) {
         record->failed = true;
         return;
     }
-    const std::span<const std::uint8_t> bytes = std::span(response).subspan(kBeforeRecord);
+    const std::span<const std::uint8_t> bytes = ipmi::RecordIn(response);
     if (offset == 0) {
         ipmisel::ByteReader in{std::span(response).subspan(1)};
         record->next = in.U16();
@@ -177,11 +174,12 @@ void RecordReader::TakeBytes(std::uint16_t id, Incoming* record, std::size_t off
                 record->failed = true;
             return;
         }
-        if (bytes.size() < ipmi::kSdrHeaderLength) {
+        const auto header = ipmi::SdrHeader::Parse(bytes);
+        if (!header) {
             record->failed = record->tries < kMaxTries;
             return;
         }
-        record->length = ipmi::kSdrHeaderLength + bytes[ipmi::kSdrHeaderLength - 1];
+        record->length = header->RecordLength();
         if (bytes.size() >= record->length) return;
         if (count == ipmi::kWholeRecord) {  // cut: so much it gives at a time
             whole_ = false;

@@ -3,12 +3,13 @@
 #include <algorithm>
 
 #include "base/bytes.h"
+#include "ipmi/sdr_record.h"
 
 namespace tqrhost {
 namespace {
 
 constexpr std::size_t kBlock = std::size_t{1} << 16;
-constexpr std::size_t kMaxRecord = 5 + 255;  // header, and what its length byte can count
+constexpr std::size_t kMaxRecord = ipmi::kMaxSdrLength;  // an event is shorter
 constexpr std::size_t kIds = 0x10000;
 
 }  // namespace

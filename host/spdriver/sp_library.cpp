@@ -28,10 +28,6 @@ struct SPLibrary::Impl {
 
 namespace {
 
-// The reply frame: completion code in byte 4, response from byte 8.
-constexpr std::size_t kCompletionCodeAt = 4;
-constexpr std::size_t kResponseAt = 8;
-
 /// The nodes of the machine that is collected from.
 struct OpenNode {
     std::string source;
@@ -66,9 +62,8 @@ unsigned gRefusedCommand = 0;  ///< see RefusedOptionalCommand
 
 /// Commands that a BMC may lack without being at fault: the auxiliary log, and what vendors define.
 bool IsOptional(const RequestFrame& request) {
-    constexpr std::uint8_t kFirstOemNetFn = 0x2E;  // IPMI 2.0, table 5-1: group and OEM commands
-    return ipmi::CommandCode{request.netFn(), request.command()} == ipmi::kGetAuxiliaryLogStatus ||
-           request.netFn() >= kFirstOemNetFn;
+    return request.code() == ipmi::kGetAuxiliaryLogStatus ||
+           request.netFn() >= ipmi::kFirstOemNetFn;
 }
 
 }  // namespace
@@ -158,8 +153,8 @@ bool SPLibrary::IsiBMCMachine() const { return impl_->integratedBmc; }
 bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSize, bool) {
     if (buffer == nullptr || length == nullptr || bufferSize <= 0) return false;
     if (!impl_->transport) return false;
-    const std::span<unsigned char> frame(buffer, static_cast<std::size_t>(bufferSize));
-    const auto request = RequestFrame::FromBuffer(frame);
+    const std::span<unsigned char> bytes(buffer, static_cast<std::size_t>(bufferSize));
+    const auto request = RequestFrame::FromBuffer(bytes);
     if (!request) return false;
     std::optional<Response> response;
     try {
@@ -177,10 +172,10 @@ bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSi
                          response->front() == ipmi::kInvalidCommand && IsOptional(*request);
     gRefusedCommand = refused ? gCommands : 0;
     if (!response || response->empty()) return false;
-    std::fill(frame.begin(), frame.end(), static_cast<unsigned char>(0));
-    const auto fits = std::min(response->size(), frame.size() - kResponseAt);
-    frame[kCompletionCodeAt] = response->front();
-    std::copy_n(response->begin(), fits, frame.begin() + kResponseAt);
+    std::fill(bytes.begin(), bytes.end(), static_cast<unsigned char>(0));
+    const auto fits = std::min(response->size(), bytes.size() - frame::kResponseAt);
+    bytes[frame::kCompletionCodeAt] = response->front();
+    std::copy_n(response->begin(), fits, bytes.begin() + frame::kResponseAt);
     *length = static_cast<int>(fits) - 1;
     return true;
 }

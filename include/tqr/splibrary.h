@@ -1,6 +1,10 @@
 #pragma once
 
+#include <algorithm>
+#include <cstddef>
+#include <cstdint>
 #include <memory>
+#include <span>
 
 namespace NQORTQR20 {
 class SPLibrary;
@@ -8,6 +12,39 @@ class Transport;
 struct NodeCompleteness;
 /// How whole the reading through a library object is, as the host saw it.
 NodeCompleteness CompletenessOf(const SPLibrary& library);
+
+/// The frames of SPLibrary::sendIPMICommand. A request: the start byte, the responder's slave
+/// address, NetFn, LUN, command, number of data bytes (little-endian, 32 bits), data, zeros up to
+/// the least length. A response, in the same buffer: the completion code, and further on once more
+/// with the response data behind it; every other byte is 0.
+namespace frame {
+constexpr std::uint8_t kStart = 0x01;
+constexpr std::uint8_t kResponder = 0x20;  ///< the BMC
+constexpr std::size_t kNetFnAt = 2;
+constexpr std::size_t kLunAt = 3;
+constexpr std::size_t kCommandAt = 4;
+constexpr std::size_t kCountAt = 5;
+constexpr std::size_t kDataAt = 9;
+constexpr std::size_t kLeastLength = 15;
+
+constexpr std::size_t kCompletionCodeAt = 4;
+constexpr std::size_t kResponseAt = 8;      ///< completion code, response data
+constexpr std::size_t kResponseDataAt = 9;  ///< in IPMI order
+
+/// Lays a request out in a buffer that holds zeros, from kDataAt + data.size() bytes on.
+inline void LayOutRequest(std::span<std::uint8_t> buffer, std::uint8_t netFn, std::uint8_t lun,
+                          std::uint8_t command, std::span<const std::uint8_t> data = {}) {
+    buffer[0] = kStart;
+    buffer[1] = kResponder;
+    buffer[kNetFnAt] = netFn;
+    buffer[kLunAt] = lun;
+    buffer[kCommandAt] = command;
+    for (std::size_t i = kCountAt, count = data.size(); i < kDataAt; ++i, count >>= 8) {
+        buffer[i] = static_cast<std::uint8_t>(count);
+    }
+    std::copy(data.begin(), data.end(), buffer.subspan(kDataAt).begin());
+}
+}  // namespace frame
 
 /// Access to one BMC node. The host owns the objects of the nodes of a collection.
 class SPLibrary {
@@ -27,11 +64,8 @@ public:
     /// Whether the management controller is of the newer integrated kind.
     bool IsiBMCMachine() const;
 
-    /// Sends one request and receives its response in the same buffer.
-    ///
-    /// Request frame: 0x01, responder address 0x20, NetFn, LUN, command, number of data bytes as a
-    /// little-endian 32-bit count, data from byte 9. Response frame: completion code in byte 4;
-    /// from byte 8 the completion code again and the response data in IPMI order.
+    /// Sends one request and receives its response in the same buffer, laid out as `frame` has
+    /// them.
     ///
     /// `bufferSize` is the size of the buffer. `*length` is not read; on success it is the number
     /// of response data bytes after the completion code. The buffer is cleared before the response

@@ -4,6 +4,7 @@
 #include <set>
 
 #include "base/text.h"
+#include "ipmi/sel_record.h"
 #include "plugins/ipmisel/pass/sections.h"
 #include "tests/support/described_classes.h"
 #include "tests/support/fru_inventory.h"
@@ -17,19 +18,17 @@ using NQORTQR20::Response;
 using Answer = std::optional<Response>;
 using Answers = std::vector<Answer>;
 
-constexpr std::uint8_t kReadFru = 0x11;
-constexpr std::uint8_t kGetSdr = 0x23;
-constexpr std::uint8_t kGetSelEntry = 0x43;
-constexpr std::size_t kRecordAt = 3;  // after completion code and next record ID
+using ipmi::kGetSdr;
+using ipmi::kGetSelEntry;
+using ipmi::kReadFruData;
+using ipmi::kRecordAt;
 
 /// One exchange of a pass.
 struct Step {
     RequestFrame request;
     Answer answer;
 
-    bool Is(std::uint8_t command) const {
-        return request.netFn() == 0x0A && request.command() == command;
-    }
+    bool Is(ipmi::CommandCode command) const { return request.code() == command; }
     /// A read that names a record and is answered the next one's ID.
     bool OfRecord() const { return Is(kGetSelEntry) || Is(kGetSdr); }
     int Record() const { return request.data()[2] | request.data()[3] << 8; }
@@ -86,8 +85,9 @@ struct Pass {
     /// A FRU device said that it is not there, or ends here.
     bool DeviceEnds() const {
         return std::any_of(steps.begin(), steps.end(), [](const Step& step) {
-            return step.Is(kReadFru) && step.answer && !step.answer->empty() &&
-                   (step.answer->front() == 0xCB || step.answer->front() == 0xC9);
+            return step.Is(kReadFruData) && step.answer && !step.answer->empty() &&
+                   (step.answer->front() == ipmi::kNotPresent ||
+                    step.answer->front() == ipmi::kParameterOutOfRange);
         });
     }
 };
@@ -170,12 +170,15 @@ private:
         std::string inventory;
         for (const Step& step : pass.steps) {
             const Response answer = step.answer.value_or(Response());
-            if (step.Is(kGetSelEntry) && answer.size() >= kRecordAt + 16) {
-                records.insert(Shown(Response(&answer[kRecordAt], &answer[kRecordAt + 16])));
+            if (step.Is(kGetSelEntry) && answer.size() >= kRecordAt + ipmi::kSelRecordSize) {
+                records.insert(
+                    Shown(Response(&answer[kRecordAt], &answer[kRecordAt] + ipmi::kSelRecordSize)));
             }
             // FRU data follow completion code and count, sixteen bytes in every chunk; a name ends
             // its record.
-            const std::size_t end = step.Is(kReadFru) ? 18 : step.Is(kGetSdr) ? answer.size() : 0;
+            const std::size_t end = step.Is(kReadFruData) ? 18
+                                    : step.Is(kGetSdr)    ? answer.size()
+                                                          : 0;
             for (std::size_t i = 2; i < std::min(end, answer.size()); ++i) {
                 inventory += static_cast<char>(answer[i]);
             }

@@ -53,7 +53,7 @@ protected:
         constexpr std::uint8_t kCommands[] = {0x11, 0x20, 0x22, 0x23, 0x40, 0x43, 0x43, 0x43};
         for (unsigned i = Below(4); i > 0; --i) {
             ipmisim::Fault fault;
-            fault.netFn = 0x0A;
+            fault.netFn = ipmi::kNetFnStorage;
             fault.command = kCommands[Below(std::size(kCommands))];
             if (!OneIn(10)) fault.call = 1 + Below(30);
             fault.kind = static_cast<ipmisim::Fault::Kind>(Below(4));

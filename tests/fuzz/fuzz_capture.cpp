@@ -3,7 +3,6 @@
 #include <sys/mman.h>
 #include <unistd.h>
 
-#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <string>
@@ -17,9 +16,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
         try {
             auto source =
                 NQORTQR20::OpenSources({"replay:/proc/self/fd/" + std::to_string(file)}, {});
-            const std::array<std::uint8_t, 15> frame{0x01, 0x20, 0x0A, 0x00, 0x40};
-            const auto request = NQORTQR20::RequestFrame::FromBuffer(frame);
-            for (const auto& node : source.nodes) node.transport->Exchange(*request);
+            const NQORTQR20::RequestFrame request(ipmi::GetSelInfo());
+            for (const auto& node : source.nodes) node.transport->Exchange(request);
         } catch (const NQORTQR20::SourceError&) {
         }
     }

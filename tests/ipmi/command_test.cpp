@@ -70,6 +70,31 @@ TEST(CompletionCode, HasTheWordsOfItsCommandElseTheGenericOnes) {
     for (const auto& c : cases) EXPECT_EQ(CompletionCodeText(c.command, c.code), c.text) << +c.code;
 }
 
+TEST(RecordRead, IsWhatTheRequestsOfEventsAndSensorRecordsSay) {
+    for (const Command& command :
+         {GetSelEntry(0x1234, 5, 16, 0x5678), GetSdr(0x1234, 5, 16, 0x5678)}) {
+        const auto read = RecordRead::Parse(command.data);
+        ASSERT_TRUE(read);
+        EXPECT_EQ(read->reservation, 0x5678);
+        EXPECT_EQ(read->recordId, 0x1234);
+        EXPECT_EQ(read->offset, 5);
+        EXPECT_EQ(read->count, 16);
+        EXPECT_FALSE(read->IsOfFirst() || read->IsOfWhole());
+        for (std::size_t length = 0; length <= 7; ++length) {
+            auto data = command.data;
+            data.resize(length);
+            EXPECT_EQ(RecordRead::Parse(data).has_value(), length == 6) << length;
+        }
+    }
+    const auto first = RecordRead::Parse(GetSdr(kFirstRecordId).data);
+    EXPECT_TRUE(first->IsOfFirst() && first->IsOfWhole());
+    const std::vector<std::uint8_t> answer{0x00, 0x02, 0x00, 0x01};
+    EXPECT_EQ(RecordIn(answer).size(), 1u);
+    for (std::size_t length = 0; length <= kRecordAt; ++length) {
+        EXPECT_TRUE(RecordIn(std::span(answer).first(length)).empty()) << length;
+    }
+}
+
 TEST(CommandName, IsEmptyForACommandThatIsNotListed) {
     EXPECT_EQ(CommandName({kNetFnApplication, 0x43}), "");
     EXPECT_EQ(CommandName(kGetSelEntry), "Get SEL Entry");

@@ -78,7 +78,7 @@ private:
 /// The call-th use (0 for every use) of a Storage command gets no response.
 inline ipmisim::Fault NoResponse(std::uint8_t command, unsigned call) {
     ipmisim::Fault fault;
-    fault.netFn = 0x0A;
+    fault.netFn = ipmi::kNetFnStorage;
     fault.command = command;
     if (call != 0) fault.call = call;
     return fault;

@@ -4,6 +4,8 @@
 #include <iterator>
 #include <utility>
 
+#include "base/bytes.h"
+
 namespace tqrhost {
 namespace {
 
@@ -24,14 +26,14 @@ bool ChangesTheBmc(const ipmi::Command& command) {
 /// Records of the event log carry their ID (IPMI 2.0, table 32-1): of an answer that may be a late
 /// one to an earlier request, it tells.
 bool IsOfAnotherRecord(const ipmi::Command& command, ByteView response) {
-    constexpr std::size_t kIdAt = 3;  // after completion code and next record ID
-    if (command.code() != ipmi::kGetSelEntry || command.data.size() != 6) return false;
-    const auto asked = static_cast<std::uint16_t>(command.data[2] | command.data[3] << 8);
-    if (asked == ipmi::kFirstRecordId || asked == ipmi::kLastRecordId || command.data[4] != 0 ||
-        response.size() < kIdAt + 2) {
+    if (command.code() != ipmi::kGetSelEntry) return false;
+    const auto read = ipmi::RecordRead::Parse(command.data);
+    if (!read || read->IsOfFirst() || read->recordId == ipmi::kLastRecordId || read->offset != 0) {
         return false;
     }
-    return asked != (response[kIdAt] | response[kIdAt + 1] << 8);
+    ipmisel::ByteReader in(ipmi::RecordIn(response));
+    const std::uint16_t id = in.U16();
+    return in.ok() && id != read->recordId;
 }
 
 }  // namespace

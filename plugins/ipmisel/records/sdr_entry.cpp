@@ -8,6 +8,7 @@
 
 #include "base/bytes.h"
 #include "base/text.h"
+#include "ipmi/sel_info.h"
 #include "plugins/ipmisel/log.h"
 #include "plugins/ipmisel/records/sdr_text.h"
 #include "plugins/ipmisel/texts/entity_names.h"
@@ -18,7 +19,7 @@ using NQORTQR20::TCPluginCallbacks;
 
 namespace {
 
-constexpr unsigned kSdrVersion = 0x51;
+constexpr unsigned kSdrVersion = ipmi::kSelVersion;
 constexpr std::size_t kIdLength = 16;
 constexpr std::size_t kEntityNameCapacity = 128;
 

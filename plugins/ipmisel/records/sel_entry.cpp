@@ -10,8 +10,10 @@
 
 #include "base/bytes.h"
 #include "base/text.h"
+#include "ipmi/command.h"
 #include "ipmi/event_types.h"
 #include "ipmi/sel_info.h"
+#include "ipmi/sel_record.h"
 #include "plugins/ipmisel/log.h"
 #include "plugins/ipmisel/records/sel_texts.h"
 
@@ -20,13 +22,11 @@ using NQORTQR20::TCPluginCallbacks;
 
 namespace {
 
-constexpr std::size_t kRecordLength = 16;
 constexpr std::size_t kShutDownCapacity = 512;  // of the caller's buffer
 constexpr std::size_t kEventDataCapacity = 256;
 
-// A row: completion code, next record ID, the record.
-constexpr std::size_t kRowHead = 3;
-constexpr std::size_t kRowNumbers = kRowHead + kRecordLength;
+// A row is an answer of Get SEL Entry, from the completion code on.
+constexpr std::size_t kRowNumbers = ipmi::kRecordAt + ipmi::kSelRecordSize;
 
 // A line of SEL information: 15 groups and the line feed.
 constexpr std::size_t kInfoNumbers = 15;
@@ -35,7 +35,7 @@ constexpr unsigned kSelVersion = ipmi::kSelVersion;
 
 constexpr unsigned kRawTextLength = 64;
 
-using Record = std::array<std::uint8_t, kRecordLength>;
+using Record = ipmi::SelBytes;
 
 /// Between the record as held, its ID high byte first, and as the wire has it; either way.
 Record SwapId(Record record) {
@@ -72,8 +72,8 @@ unsigned IPMISELEntry::ScanSELDataFile(TCPluginCallbacks* /*context*/, const s_S
         return kEndOfData;
     }
     Record wire{};  // what the row lacks is zero
-    for (std::size_t i = kRowHead; i < numbers->size(); ++i) {
-        wire[i - kRowHead] = static_cast<std::uint8_t>((*numbers)[i]);
+    for (std::size_t i = ipmi::kRecordAt; i < numbers->size(); ++i) {
+        wire[i - ipmi::kRecordAt] = static_cast<std::uint8_t>((*numbers)[i]);
     }
     bytes_ = SwapId(wire);
     if (LogEnabled(kTrace)) {
@@ -194,7 +194,7 @@ unsigned IPMISELEntry::CopyRawDataString(TCPluginCallbacks* /*context*/, char* o
 unsigned IPMISELEntry::CopyRawDataHex(TCPluginCallbacks* /*context*/, unsigned char* out,
                                       unsigned int len) const {
     TraceScope trace("IPMISELEntry::CopyRawDataHex()", TraceScope::kFunction);
-    if (len < kRecordLength) {
+    if (len < ipmi::kSelRecordSize) {
         return trace.Fail("Buffer not big enough to copy Raw Hex Data.", kWarning);
     }
     const Record wire = SwapId(bytes_);

@@ -5,17 +5,10 @@
 namespace ipmisel {
 namespace {
 
-constexpr std::uint8_t kFrameStart = 0x01;
-constexpr std::uint8_t kBmcAddress = 0x20;
-constexpr std::size_t kCountAt = 5;
-constexpr std::size_t kDataAt = 9;
-constexpr std::size_t kMaxData = 247;  // the rest of the transfer buffer
-constexpr std::size_t kCompletionCodeAt = 4;
-constexpr std::size_t kResponseAt = 8;
+namespace frame = NQORTQR20::frame;
 
-// Generic completion codes from 0xC0 on, IPMI 2.0 table 5-2; the last two have no text. Texts that
-// end without a full stop have always done so.
-constexpr std::uint8_t kFirstCompletionCode = 0xC0;
+// Generic completion codes from kNodeBusy on; the last two have no text. Texts that end without a
+// full stop have always done so.
 constexpr std::array<std::string_view, 24> kCompletionCodes{
     "Node Busy.",
     "Invalid Command.",
@@ -41,19 +34,18 @@ constexpr std::array<std::string_view, 24> kCompletionCodes{
     "Cannot execute command. Insufficient privilege level.",
     "Cannot execute command. Command, or request parameter(s), not supported in present state.",
 };
-static_assert(kCompletionCodes[0xCB - kFirstCompletionCode].starts_with("Requested Sensor"));
-static_assert(!kCompletionCodes[0xD5 - kFirstCompletionCode].empty());
-static_assert(kCompletionCodes[0xD6 - kFirstCompletionCode].empty());
-
-constexpr std::uint8_t kEraseInProgress = 0x81;
+static_assert(
+    kCompletionCodes[ipmi::kNotPresent - ipmi::kNodeBusy].starts_with("Requested Sensor"));
+static_assert(!kCompletionCodes[ipmi::kNotSupportedInState - ipmi::kNodeBusy].empty());
+static_assert(kCompletionCodes[ipmi::kSubfunctionDisabled - ipmi::kNodeBusy].empty());
 
 }  // namespace
 
 std::string_view CompletionCodeText(std::uint8_t code, bool eraseTextToo) {
-    if (code == kEraseInProgress && eraseTextToo) {
+    if (code == ipmi::kSelEraseInProgress && eraseTextToo) {
         return "Cannot execute command, SEL erase in progress.\n";
     }
-    const std::size_t index = static_cast<std::size_t>(code) - kFirstCompletionCode;
+    const std::size_t index = static_cast<std::size_t>(code) - ipmi::kNodeBusy;
     if (index < kCompletionCodes.size() && !kCompletionCodes[index].empty()) {
         return kCompletionCodes[index];
     }
@@ -68,24 +60,19 @@ unsigned IPMIMessage::Exchange(const ipmisel::IPMICommand& command,
     netFn_ = command.netFn;
     lun_ = command.lun;
     command_ = command.command;
-    if (data.size() > kMaxData) {
+    if (data.size() > transferBuffer_.size() - frame::kDataAt) {
         WriteLog(command.sendFailureSeverity, command.sendFailure);
         return command.sendFailureResult;
     }
     // Nothing of an earlier reply stays behind the frame.
     transferBuffer_.fill(0);
-    constexpr std::array<std::uint8_t, 2> kLead{kFrameStart, kBmcAddress};
-    std::copy(kLead.begin(), kLead.end(), transferBuffer_.begin());
-    transferBuffer_[2] = netFn_;
-    transferBuffer_[3] = lun_;
-    transferBuffer_[4] = command_;
-    transferBuffer_[kCountAt] = static_cast<std::uint8_t>(data.size());
-    std::copy(data.begin(), data.end(), transferBuffer_.begin() + kDataAt);
+    frame::LayOutRequest(transferBuffer_, netFn_, lun_, command_, data);
     if (LogEnabled(kTrace)) {
-        const auto frame = std::span<const std::uint8_t>(transferBuffer_)
-                               .first(std::max(kFrameLength, kDataAt + data.size()));
+        const auto request =
+            std::span<const std::uint8_t>(transferBuffer_)
+                .first(std::max(frame::kLeastLength, frame::kDataAt + data.size()));
         WriteLog(kTrace, std::string("Contents of buffer to send (") + command.bufferName +
-                             "):" + DumpFrame(frame, command.frameDigits));
+                             "):" + DumpFrame(request, command.frameDigits));
     }
 
     length_ = command.length;
@@ -95,8 +82,8 @@ unsigned IPMIMessage::Exchange(const ipmisel::IPMICommand& command,
         WriteLog(command.sendFailureSeverity, command.sendFailure);
         return command.sendFailureResult;
     }
-    const std::uint8_t completionCode = transferBuffer_[kCompletionCodeAt];
-    if (completionCode != 0) {
+    const std::uint8_t completionCode = transferBuffer_[frame::kCompletionCodeAt];
+    if (completionCode != ipmi::kCompleted) {
         std::string line = command.errorPrefix;
         line += CompletionCodeText(completionCode, command.eraseText);
         WriteLog(command.errorSeverity, line);
@@ -106,7 +93,7 @@ unsigned IPMIMessage::Exchange(const ipmisel::IPMICommand& command,
 }
 
 std::span<const std::uint8_t> IPMIMessage::Response() const {
-    const auto all = std::span(transferBuffer_).subspan(ipmisel::kResponseAt);
+    const auto all = std::span(transferBuffer_).subspan(NQORTQR20::frame::kResponseAt);
     if (length_ < 0) return {};
     return all.first(std::min(all.size(), static_cast<std::size_t>(length_) + 1));
 }
@@ -118,5 +105,6 @@ ipmisel::ByteReader IPMIMessage::Reply() const {
 }
 
 ipmisel::ByteReader IPMIMessage::ReplyBuffer() const {
-    return ipmisel::ByteReader(std::span(transferBuffer_).subspan(ipmisel::kResponseAt + 1));
+    return ipmisel::ByteReader(
+        std::span(transferBuffer_).subspan(NQORTQR20::frame::kResponseDataAt));
 }

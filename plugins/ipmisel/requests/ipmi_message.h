@@ -8,19 +8,18 @@
 #include <string_view>
 
 #include "base/bytes.h"
+#include "ipmi/command.h"
 #include "plugins/ipmisel/log.h"
 #include "plugins/ipmisel/result.h"
 #include "tqr/splibrary.h"
 
 namespace ipmisel {
 
-constexpr std::uint8_t kNetFnStorage = 0x0A;
-
 /// One IPMI command as a request class states it: what goes to the BMC, and how what happens to it
 /// is worded in the log.
 struct IPMICommand {
-    std::uint8_t netFn = kNetFnStorage;
-    std::uint8_t lun = 0x00;
+    std::uint8_t netFn = ipmi::kNetFnStorage;
+    std::uint8_t lun = ipmi::kBmcLun;
     std::uint8_t command = 0x00;
 
     const char* bufferName = "rspBuf";      ///< as the trace of the request frame calls it
@@ -61,11 +60,7 @@ inline IPMIRecordID ReadRecordID(ByteReader* in) {
 
 /// Base of the request classes: one IPMI command after the other over the transport of one BMC
 /// node. The request frame is laid at the start of the transfer buffer, and the reply frame comes
-/// back in the same buffer:
-///
-///     request: 0x01, responder address, NetFn, LUN, command, count of data bytes, three zeros,
-///              data bytes, zeros up to 15 bytes
-///     reply:   byte 4 completion code; from byte 8 the completion code again and the data
+/// back in the same buffer.
 class IPMIMessage {
 public:
     /// The transport is borrowed for the life of the object; without one nothing can be sent.
@@ -97,8 +92,6 @@ protected:
     int length() const { return length_; }
 
 private:
-    static constexpr std::size_t kFrameLength = 15;
-
     std::uint8_t netFn_ = 0;
     std::uint8_t lun_ = 0;
     std::uint8_t command_ = 0;

@@ -6,6 +6,7 @@
 
 #include "base/text.h"
 #include "ipmi/command.h"
+#include "ipmi/id_string.h"
 #include "ipmi/sdr_record.h"
 
 using namespace ipmisel;
@@ -39,8 +40,8 @@ constexpr IPMICommand kGetSdrString =
 // IPMI 2.0, table 43-7.
 constexpr auto kFruDeviceLocator = static_cast<std::uint8_t>(ipmi::SdrType::kFruLocator);
 constexpr std::uint8_t kHeaderOffset = 0;
-constexpr std::uint8_t kHeaderCount = 15;
-constexpr std::uint8_t kStringOffset = 15;
+constexpr auto kStringOffset = static_cast<std::uint8_t>(ipmi::kLocatorNameAt);
+constexpr std::uint8_t kHeaderCount = kStringOffset;
 
 constexpr unsigned kInventoryBytes = 256;
 constexpr std::uint8_t kChunk = 16;
@@ -123,7 +124,7 @@ unsigned IPMIRequestFRULocator::IPMIGetSDRString(NQORTQR20::TCPluginCallbacks*,
                                                  IPMIFRULocator* locator) {
     TraceScope trace("IPMIRequestFRULocator::IPMIGetSDRString()");
     if (ReadRecord(kGetSdrString, kStringOffset, ipmi::kWholeRecord) != kOk) return trace.Fail();
-    constexpr std::size_t kBeforeText = 4;  // completion code, next record ID, type/length byte
+    constexpr std::size_t kBeforeText = ipmi::kRecordAt + 1;  // the type/length byte
     ByteReader reply = Reply();
     reply.Skip(2);
     const std::uint8_t typeLength = reply.U8();
@@ -134,11 +135,10 @@ unsigned IPMIRequestFRULocator::IPMIGetSDRString(NQORTQR20::TCPluginCallbacks*,
     const auto end = std::find(
         text.begin(), text.begin() + std::min<std::ptrdiff_t>(std::ssize(text), typeLength), 0);
     locator->SetIDString(std::string(text.begin(), end));
-    constexpr std::uint8_t kLengthBits = 0x1F;
-    if (std::ssize(text) < (typeLength & kLengthBits)) {
-        WriteLog(kNotice,
-                 Format("The ID string of FRU device %u is cut short: %zu of %u bytes.",
-                        locator->GetFRUDevIDSlaveAddr(), text.size(), typeLength & kLengthBits));
+    const unsigned length = ipmi::TypeLength::FromByte(typeLength).length;
+    if (text.size() < length) {
+        WriteLog(kNotice, Format("The ID string of FRU device %u is cut short: %zu of %u bytes.",
+                                 locator->GetFRUDevIDSlaveAddr(), text.size(), length));
     }
     return kOk;
 }

@@ -43,8 +43,8 @@ constexpr std::uint8_t kHeaderCount = 10;
 constexpr std::uint8_t kRecordTypeAt = 3;
 constexpr std::uint8_t kUnitsOffset = 20;
 constexpr std::uint8_t kUnitsCount = 10;
-constexpr std::uint8_t kFullStringOffset = 47;
-constexpr std::uint8_t kCompactStringOffset = 31;
+constexpr auto kFullStringOffset = static_cast<std::uint8_t>(ipmi::kFullNameAt);
+constexpr auto kCompactStringOffset = static_cast<std::uint8_t>(ipmi::kCompactNameAt);
 
 /// Compatibility: one byte of 0xFF ends the repository, so that a record whose ID has such a byte
 /// is never read (SdrWalk.AnyFfByteEndsTheWalk).

@@ -13,18 +13,13 @@ protected:
     }
 
     void Send(std::uint8_t command, const std::vector<std::uint8_t>& data = {}) {
-        std::array<unsigned char, 256> buffer{0x01, 0x20, 0x0A, 0x00, command};
-        buffer[5] = static_cast<unsigned char>(data.size());
-        std::copy(data.begin(), data.end(), buffer.begin() + 9);
-        int length = 256;
-        Library()->sendIPMICommand(buffer.data(), &length, 256, true);
+        Ask(ipmi::MakeCommand({ipmi::kNetFnStorage, command}, data));
     }
     /// Any other command.
     void Ask(const ipmi::Command& command) {
-        std::array<unsigned char, 256> buffer{0x01, 0x20, command.netFn, command.lun,
-                                              command.command};
-        buffer[5] = static_cast<unsigned char>(command.data.size());
-        std::copy(command.data.begin(), command.data.end(), buffer.begin() + 9);
+        std::array<unsigned char, 256> buffer{};
+        NQORTQR20::frame::LayOutRequest(buffer, command.netFn, command.lun, command.command,
+                                        command.data);
         int length = 256;
         Library()->sendIPMICommand(buffer.data(), &length, 256, true);
     }

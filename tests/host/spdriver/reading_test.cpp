@@ -72,18 +72,18 @@ protected:
         NQORTQR20::OpenMachine(std::move(source));
         auto* const library = NQORTQR20::SPLibrary::GetSplibraryInstance(0);
         const auto send = [&](const ipmi::Command& command) {
-            const NQORTQR20::RequestFrame frame(command);
-            std::vector<unsigned char> buffer(frame.bytes().begin(), frame.bytes().end());
+            const NQORTQR20::RequestFrame request(command);
+            std::vector<unsigned char> buffer(request.bytes().begin(), request.bytes().end());
             buffer.resize(256);
             int length = 256;
-            return library->sendIPMICommand(buffer.data(), &length, 256, true) ? buffer
-                                                                               : decltype(buffer){};
+            if (!library->sendIPMICommand(buffer.data(), &length, 256, true)) return Response();
+            return Response(buffer.begin() + NQORTQR20::frame::kResponseAt, buffer.end());
         };
         send(ipmi::GetSelInfo());
         for (std::uint16_t id = 0; id != ipmi::kLastRecordId;) {
             const auto answer = send(ipmi::GetSelEntry(id));
-            if (answer.empty() || answer[8] != 0) break;
-            id = static_cast<std::uint16_t>(answer[9] | answer[10] << 8);
+            if (answer.empty() || answer.front() != 0) break;
+            id = static_cast<std::uint16_t>(answer[1] | answer[2] << 8);
         }
         if (sensors) send(ipmi::GetSdrRepositoryInfo());
         NQORTQR20::EndPass();

@@ -10,11 +10,7 @@ namespace ipmiseltest {
 /// A request frame of the Storage NetFn.
 inline NQORTQR20::RequestFrame StorageRequest(std::uint8_t command,
                                               const std::vector<std::uint8_t>& data = {}) {
-    std::vector<std::uint8_t> frame{
-        0x01, 0x20, 0x0A, 0x00, command, static_cast<std::uint8_t>(data.size()), 0, 0, 0};
-    frame.insert(frame.end(), data.begin(), data.end());
-    if (frame.size() < 15) frame.resize(15);
-    return *NQORTQR20::RequestFrame::FromBuffer(frame);
+    return NQORTQR20::RequestFrame(ipmi::MakeCommand({ipmi::kNetFnStorage, command}, data));
 }
 
 /// Get SEL Entry or Get SDR of a whole record, or from `offset`.

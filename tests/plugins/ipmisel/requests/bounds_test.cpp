@@ -31,9 +31,9 @@ SPLibrary::SPLibrary(std::unique_ptr<NQORTQR20::Transport>, bool) {}
 SPLibrary::~SPLibrary() = default;
 bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSize, bool) {
     std::fill_n(buffer, bufferSize, static_cast<unsigned char>(0x51));
-    buffer[4] = 0;
+    buffer[frame::kCompletionCodeAt] = 0;
     gToldLength = *length;
-    std::copy(gReply.begin(), gReply.end(), buffer + 8);
+    std::copy(gReply.begin(), gReply.end(), buffer + frame::kResponseAt);
     buffer[26] = static_cast<unsigned char>(++gSends);
     *length = gLength;
     return true;
