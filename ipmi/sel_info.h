@@ -25,6 +25,12 @@ struct SelInfo {
     bool partialAddSupported = false;
     bool reserveSupported = false;
     bool allocationSupported = false;
+
+    /// Whether records came or went between the two answers.
+    bool HasChanged(const SelInfo& later) const {
+        return records != later.records || lastAddition != later.lastAddition ||
+               lastErase != later.lastErase;
+    }
 };
 std::optional<SelInfo> ParseSelInfo(std::span<const std::uint8_t> response);
 

@@ -7,7 +7,6 @@
 #include "base/text.h"
 #include "host/spdriver/stop.h"
 #include "ipmi/sdr_record.h"
-#include "ipmi/sel_info.h"
 #include "ipmi/sel_record.h"
 
 namespace tqrhost {
@@ -138,9 +137,8 @@ void CompletenessTracker::NoteInfo(Source* source, bool askedAgain,
 void CompletenessTracker::NoteLogState(const Response& response) {
     const auto info = ipmi::ParseSelInfo(std::span(response).subspan(1));
     if (!info) return;
-    const LogState state{info->records, info->lastAddition, info->lastErase};
-    if (logState_.value_or(state) != state) AddFault({"Get SEL Info", "", kChanged, true});
-    logState_ = state;
+    if (logState_ && logState_->HasChanged(*info)) AddFault({"Get SEL Info", "", kChanged, true});
+    logState_ = info;
 }
 
 void CompletenessTracker::NoteSensorState(const Response& response) {

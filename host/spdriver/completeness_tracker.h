@@ -13,6 +13,7 @@
 #include "host/spdriver/reading.h"
 #include "host/spdriver/transport.h"
 #include "ipmi/sdr_info.h"
+#include "ipmi/sel_info.h"
 
 namespace tqrhost {
 
@@ -83,13 +84,7 @@ private:
         std::vector<ReadFault> faults;
     };
     std::optional<RefusedFru> refusedFru_;
-    /// What of Get SEL Info tells that the log has changed.
-    struct LogState {
-        std::uint16_t records;
-        std::uint32_t lastAddition, lastErase;
-        bool operator==(const LogState&) const = default;
-    };
-    std::optional<LogState> logState_;
+    std::optional<ipmi::SelInfo> logState_;
     std::optional<ipmi::SdrRepositoryInfo> sensorState_;
 };
 

@@ -30,8 +30,7 @@ bool Changed(const std::optional<Response>& before, const std::optional<Response
     const auto a = ipmi::ParseSelInfo(DataOf(*before));
     const auto b = ipmi::ParseSelInfo(DataOf(*after));
     if (!a || !b) return *before != *after;
-    return a->records != b->records || a->lastAddition != b->lastAddition ||
-           a->lastErase != b->lastErase;
+    return a->HasChanged(*b);
 }
 
 /// Version, then the number of records: in both repositories' information.
@@ -71,8 +70,7 @@ bool SameRepository(const Response& before, const std::optional<Response>& now) 
     if (!Completed(now)) return false;
     const auto a = ipmi::SdrRepositoryInfo::Parse(DataOf(before));
     const auto b = ipmi::SdrRepositoryInfo::Parse(DataOf(*now));
-    return a && b && a->records == b->records && a->lastAddition == b->lastAddition &&
-           a->lastErase == b->lastErase;
+    return a && b && !a->HasChanged(*b);
 }
 
 /// What an answer of Get SEL Info says; empty when it says nothing.
@@ -181,7 +179,7 @@ void ControllerReader::Compare() {
     const std::size_t records = now->records;
     const std::uint16_t next =
         known_->log.empty() ? ipmi::kLastRecordId : IdOf(std::span(*lastKnown_).subspan(1));
-    if (records == known_->log.size() && now->lastAddition == before->lastAddition &&
+    if (records == known_->log.size() && !before->HasChanged(*now) &&
         now->overflow == before->overflow && next == ipmi::kLastRecordId) {
         joined_ = std::make_unique<RecordStore>();
         AddChain(known_->log, ipmi::kLastRecordId, joined_.get());

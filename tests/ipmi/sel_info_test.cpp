@@ -34,6 +34,24 @@ TEST(SelInfo, NamesEveryFieldAndIsNoneWhenCut) {
     }
 }
 
+TEST(SelInfo, HasChangedWhenRecordsCameOrWent) {
+    const SelInfo before{.records = 7, .freeBytes = 100, .lastAddition = 3, .lastErase = 2};
+    const struct {
+        SelInfo later;
+        bool changed;
+    } cases[] = {
+        {before, false},
+        {{.records = 7, .freeBytes = 99, .lastAddition = 3, .lastErase = 2}, false},
+        {{.records = 8, .freeBytes = 100, .lastAddition = 3, .lastErase = 2}, true},
+        {{.records = 7, .freeBytes = 100, .lastAddition = 4, .lastErase = 2}, true},
+        {{.records = 7, .freeBytes = 100, .lastAddition = 3, .lastErase = 3}, true},
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(before.HasChanged(c.later), c.changed)
+            << c.later.records << " " << c.later.lastAddition << " " << c.later.lastErase;
+    }
+}
+
 TEST(SelAllocation, NamesEveryFieldAndIsNoneWhenCut) {
     const std::vector<std::uint8_t> answer{0x92, 0x0E, 0x12, 0x00, 0x4D, 0x0E, 0x3C, 0x0B, 0x01};
     const auto allocation = ParseSelAllocation(answer);
