@@ -25,17 +25,15 @@ std::string TimeText(Time time) {
     return text.data();
 }
 
-bool WholeInstanceSink::OpenInstance(std::string_view className) {
+bool InstanceSink::OpenInstance(std::string_view className) {
     open_.className = className;
     open_.properties.clear();
     return true;
 }
 
-bool WholeInstanceSink::AddProperty(std::string_view name, PropertyValue value) {
+bool InstanceSink::AddProperty(std::string_view name, PropertyValue value) {
     open_.properties.emplace_back(name, std::move(value));
     return true;
 }
-
-bool WholeInstanceSink::CloseInstance() { return Take(open_); }
 
 }  // namespace NQORTQR20

@@ -31,28 +31,20 @@ std::string TimeText(Time time);
 using PropertyValue = std::variant<std::string, std::vector<std::uint8_t>, ObjectPath, std::int64_t,
                                    double, bool, Time, std::vector<std::string>>;
 
-/// Where the instances of a collection go, piece by piece, so that the host holds no more than the
-/// open instance. An instance counts from CloseInstance on; one that is opened while another is
-/// still open replaces it. False refuses the piece; the plug-in gets kStatusFailed.
-class InstanceSink {
-public:
-    virtual ~InstanceSink() = default;
-    virtual bool OpenInstance(std::string_view className) = 0;
-    virtual bool AddProperty(std::string_view name, PropertyValue value) = 0;
-    virtual bool CloseInstance() = 0;
-};
-
 struct Instance {
     std::string className;
     std::vector<std::pair<std::string, PropertyValue>> properties;  ///< in the order written
 };
 
-/// A sink that gathers one instance and hands it over whole.
-class WholeInstanceSink : public InstanceSink {
+/// Where the instances of a collection go. What a plug-in writes piece by piece is gathered and
+/// taken whole, so that the host holds no more than the open instance; one that is opened while
+/// another is still open replaces it. False refuses the piece; the plug-in gets kStatusFailed.
+class InstanceSink {
 public:
-    bool OpenInstance(std::string_view className) override;
-    bool AddProperty(std::string_view name, PropertyValue value) override;
-    bool CloseInstance() override;
+    virtual ~InstanceSink() = default;
+    virtual bool OpenInstance(std::string_view className);
+    virtual bool AddProperty(std::string_view name, PropertyValue value);
+    bool CloseInstance() { return Take(open_); }
 
 protected:
     /// False when the instance could not be taken.

@@ -45,6 +45,9 @@ struct NodeCompleteness {
     /// and exported as far as they were read.
     bool Whole() const;
 };
+class SPLibrary;
+/// Of what went through a library object.
+NodeCompleteness CompletenessOf(const SPLibrary& library);
 /// One for each node of the open machine.
 std::vector<NodeCompleteness> GetCompleteness();
 

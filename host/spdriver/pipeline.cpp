@@ -75,8 +75,4 @@ std::optional<Response> ExchangeOver(RequestPipeline& pipeline, ipmi::Command co
     return std::move(answer->response);
 }
 
-std::optional<Response> PipelineTransport::Exchange(const RequestFrame& request) {
-    return ExchangeOver(*pipeline_, request.ToCommand());
-}
-
 }  // namespace tqrhost

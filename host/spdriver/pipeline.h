@@ -57,17 +57,6 @@ enum class RunResult { kDone, kIdle, kStopped };
 RunResult RunPipelines(std::span<RequestPipeline* const> pipelines,
                        const std::function<bool()>& done);
 
-/// One request at a time over a pipeline; no read-ahead.
-class PipelineTransport : public Transport {
-public:
-    explicit PipelineTransport(std::unique_ptr<RequestPipeline> pipeline)
-        : pipeline_(std::move(pipeline)) {}
-    std::optional<Response> Exchange(const RequestFrame& request) override;
-
-private:
-    std::unique_ptr<RequestPipeline> pipeline_;
-};
-
 /// Submits a request and runs the pipeline until its answer is there; empty when none came, and
 /// when the collection is to stop.
 std::optional<Response> ExchangeOver(RequestPipeline& pipeline, ipmi::Command command);

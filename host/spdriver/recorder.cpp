@@ -139,10 +139,6 @@ std::shared_ptr<CaptureWriter> RecordTo(const std::string& file, Source& source,
     auto capture = std::make_shared<tqrhost::CaptureFile>(file, source, classes);
     for (std::size_t node = 0; node < source.nodes.size(); ++node) {
         SourceNode& recorded = source.nodes[node];
-        if (recorded.pipeline) {
-            recorded.transport =
-                std::make_unique<tqrhost::PipelineTransport>(std::move(recorded.pipeline));
-        }
         recorded.transport = std::make_unique<tqrhost::RecordingTransport>(
             std::move(recorded.transport), node, clockRuns, capture);
     }

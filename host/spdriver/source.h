@@ -23,7 +23,8 @@
 
 namespace NQORTQR20 {
 
-/// One BMC node of a source: either of the two ways is set.
+/// One BMC node of a source: either of the two ways is set; ReadLiveNodes (reading.h) makes a
+/// transport of a pipeline, which OpenMachine wants.
 struct SourceNode {
     std::string name;                           ///< the source as the user wrote it
     std::unique_ptr<Transport> transport;       ///< each request is answered by itself

@@ -26,6 +26,12 @@ struct SPLibrary::Impl {
     bool integratedBmc;
 };
 
+struct HostAccess {
+    static tqrhost::CompletenessTracker* TrackerOf(const SPLibrary& library) {
+        return library.impl_->transport.get();
+    }
+};
+
 namespace {
 
 /// The nodes of the machine that is collected from.
@@ -35,12 +41,6 @@ struct OpenNode {
     std::function<std::vector<ipmi::Command>()> endPass;
     std::function<std::vector<ReadFault>()> missing;
 };
-constexpr std::size_t kTransferBuffer = 256;
-
-std::vector<unsigned char> FrameOf(const ipmi::Command& command) {
-    const RequestFrame frame(command);
-    return {frame.bytes().begin(), frame.bytes().end()};
-}
 
 std::vector<OpenNode>& Nodes() {
     static std::vector<OpenNode> nodes;
@@ -66,6 +66,23 @@ bool IsOptional(const RequestFrame& request) {
            request.netFn() >= ipmi::kFirstOemNetFn;
 }
 
+/// Empty when nothing came, for whatever reason: callers know no exceptions.
+std::optional<Response> Exchange(tqrhost::CompletenessTracker* transport,
+                                 const RequestFrame& request) {
+    if (transport == nullptr) return std::nullopt;
+    try {
+        auto response = transport->Exchange(request);
+        if (const auto& observer = Observer()) {
+            if (const auto state = transport->StateAfter(request)) observer(*state);
+        }
+        return response;
+    } catch (const std::exception& error) {
+        const std::string line = std::string("The way to the BMC failed: ") + error.what();
+        fdrWriteLog(ILogger::kError, line.c_str());
+        return std::nullopt;
+    }
+}
+
 }  // namespace
 
 void OpenMachine(Source source) {
@@ -73,9 +90,6 @@ void OpenMachine(Source source) {
     SetMachineFacts(std::move(source.facts));
     Unreachable() = std::move(source.unreachable);
     for (SourceNode& node : source.nodes) {
-        if (node.pipeline) {
-            node.transport = std::make_unique<tqrhost::PipelineTransport>(std::move(node.pipeline));
-        }
         auto library =
             std::make_unique<SPLibrary>(std::move(node.transport), GetMachineFacts().integratedBmc);
         Nodes().push_back({std::move(node.name), std::move(library), std::move(node.endPass),
@@ -87,11 +101,7 @@ void EndPass() {
     for (const OpenNode& node : Nodes()) {
         if (!node.endPass) continue;
         for (const ipmi::Command& command : node.endPass()) {
-            std::vector<unsigned char> buffer = FrameOf(command);
-            buffer.resize(kTransferBuffer);
-            int length = 0;
-            node.library->sendIPMICommand(buffer.data(), &length, static_cast<int>(buffer.size()),
-                                          true);
+            Exchange(HostAccess::TrackerOf(*node.library), RequestFrame(command));
         }
     }
 }
@@ -101,7 +111,7 @@ void ObserveReading(ReadingProgress progress) { Observer() = std::move(progress)
 unsigned RefusedOptionalCommand() { return gRefusedCommand; }
 
 NodeCompleteness CompletenessOf(const SPLibrary& library) {
-    const auto& tracker = library.impl_->transport;
+    tqrhost::CompletenessTracker* const tracker = HostAccess::TrackerOf(library);
     return tracker ? tracker->Completeness() : NodeCompleteness();
 }
 
@@ -156,17 +166,7 @@ bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSi
     const std::span<unsigned char> bytes(buffer, static_cast<std::size_t>(bufferSize));
     const auto request = RequestFrame::FromBuffer(bytes);
     if (!request) return false;
-    std::optional<Response> response;
-    try {
-        response = impl_->transport->Exchange(*request);
-        if (const auto& observer = Observer()) {
-            if (const auto state = impl_->transport->StateAfter(*request)) observer(*state);
-        }
-    } catch (const std::exception& error) {  // callers know no exceptions
-        const std::string line = std::string("The way to the BMC failed: ") + error.what();
-        fdrWriteLog(ILogger::kError, line.c_str());
-        return false;
-    }
+    const std::optional<Response> response = Exchange(impl_->transport.get(), *request);
     ++gCommands;
     const bool refused = response && !response->empty() &&
                          response->front() == ipmi::kInvalidCommand && IsOptional(*request);

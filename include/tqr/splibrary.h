@@ -7,11 +7,7 @@
 #include <span>
 
 namespace NQORTQR20 {
-class SPLibrary;
 class Transport;
-struct NodeCompleteness;
-/// How whole the reading through a library object is, as the host saw it.
-NodeCompleteness CompletenessOf(const SPLibrary& library);
 
 /// The frames of SPLibrary::sendIPMICommand. A request: the start byte, the responder's slave
 /// address, NetFn, LUN, command, number of data bytes (little-endian, 32 bits), data, zeros up to
@@ -75,7 +71,7 @@ public:
     bool sendIPMICommand(unsigned char* buffer, int* length, int bufferSize, bool flag);
 
 private:
-    friend NodeCompleteness CompletenessOf(const SPLibrary& library);
+    friend struct HostAccess;  // the host's own
     struct Impl;
     std::unique_ptr<Impl> impl_;
 };

@@ -44,7 +44,7 @@ bool OutputIsOver() {
 }
 
 bool ReportSink::OpenInstance(std::string_view className) {
-    return !IsOver() && WholeInstanceSink::OpenInstance(className);
+    return !IsOver() && InstanceSink::OpenInstance(className);
 }
 
 bool ReportSink::Take(const NQORTQR20::Instance& instance) {

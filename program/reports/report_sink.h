@@ -21,7 +21,7 @@ bool OutputIsOver();
 
 /// Takes the instances of a collection to the report and counts log records by node on their way.
 /// Once the report cannot be written, it takes nothing any more.
-class ReportSink : public NQORTQR20::WholeInstanceSink {
+class ReportSink : public NQORTQR20::InstanceSink {
 public:
     ReportSink(ReportWriter& report, const NQORTQR20::PluginSet& plugins,
                const std::vector<std::string>& wanted, std::size_t nodes);

@@ -54,10 +54,7 @@ private:
 };
 
 class NoSink : public NQORTQR20::InstanceSink {
-public:
-    bool OpenInstance(std::string_view) override { return true; }
-    bool AddProperty(std::string_view, NQORTQR20::PropertyValue) override { return true; }
-    bool CloseInstance() override { return true; }
+    bool Take(const NQORTQR20::Instance&) override { return true; }
 };
 
 }  // namespace

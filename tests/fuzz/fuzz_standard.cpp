@@ -57,13 +57,12 @@ private:
 /// Takes everything; a real must be a number.
 class NoSink : public NQORTQR20::InstanceSink {
 public:
-    bool OpenInstance(std::string_view) override { return true; }
     bool AddProperty(std::string_view, NQORTQR20::PropertyValue value) override {
         const auto* real = std::get_if<double>(&value);
         if (real != nullptr && !std::isfinite(*real)) __builtin_trap();
         return true;
     }
-    bool CloseInstance() override { return true; }
+    bool Take(const NQORTQR20::Instance&) override { return true; }
 };
 
 /// The bytes as a log, record after record.

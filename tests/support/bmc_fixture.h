@@ -147,7 +147,7 @@ inline std::optional<std::string> TextOf(const NQORTQR20::Instance& instance,
 }
 
 /// The instances of a collection, in memory.
-class InstanceRecorder : public NQORTQR20::WholeInstanceSink {
+class InstanceRecorder : public NQORTQR20::InstanceSink {
 public:
     std::vector<NQORTQR20::Instance> instances;
     /// A property that the host refuses the next time that it is written.
@@ -155,7 +155,7 @@ public:
 
     bool AddProperty(std::string_view name, NQORTQR20::PropertyValue value) override {
         if (refusedProperty.empty() || name != refusedProperty) {
-            return WholeInstanceSink::AddProperty(name, std::move(value));
+            return InstanceSink::AddProperty(name, std::move(value));
         }
         refusedProperty.clear();
         return false;

@@ -5,7 +5,6 @@
 #include <algorithm>
 #include <utility>
 
-#include "base/text.h"
 #include "host/spdriver/stop.h"
 #include "tqr/log.h"
 
@@ -21,15 +20,6 @@ constexpr std::chrono::milliseconds kReopeningPause{500};
 constexpr unsigned kTriesBeforeReopening = 3;
 /// In one Advance: a flood of packets does not keep the caller from its clock.
 constexpr unsigned kMaxBatches = 4;
-
-void LogNoResponse(const ipmi::Command& command) {
-    if (!NQORTQR20::fdrLogEnabled(ILogger::kNotice)) return;
-    NQORTQR20::fdrWriteLog(
-        ILogger::kNotice,
-        ipmisel::Format("No response to NetFn 0x%02x command 0x%02x: the BMC does not answer.",
-                        command.netFn, command.command)
-            .c_str());
-}
 
 void Log(ILogger::ETQRLogSeverity severity, const std::string& line) {
     NQORTQR20::fdrWriteLog(severity, line.c_str());
@@ -47,8 +37,7 @@ LanSession::LanSession(std::string name, LanSessionOptions options)
       options_(std::move(options)),
       requests_({.window = options_.window,
                  .timeout = options_.timeout,
-                 .anySessionNumber = options_.credentials.deviations.sessionNumbers,
-                 .failed = LogNoResponse}) {}
+                 .anySessionNumber = options_.credentials.deviations.sessionNumbers}) {}
 
 LanSession::~LanSession() {
     // One packet, unanswered: a BMC that misses it drops the session by itself after a minute.

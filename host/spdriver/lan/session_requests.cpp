@@ -147,7 +147,6 @@ void SessionRequests::MarkLost(Request* request) {
 
 void SessionRequests::Fail(const std::vector<Request>& requests) {
     for (const Request& request : requests) {
-        if (options_.failed) options_.failed(request.command);
         request.handler(std::nullopt);
     }
 }

@@ -53,8 +53,6 @@ public:
         std::optional<unsigned> window{};  ///< fixed; adaptive when left out
         std::chrono::milliseconds timeout{20000};
         bool anySessionNumber = false;  ///< workaround: answers whose session numbers mean nothing
-        /// Called for each request that fails, before its handler.
-        std::function<void(const ipmi::Command&)> failed{};
     };
     explicit SessionRequests(Options options)
         : options_(std::move(options)), window_(options_.window) {}

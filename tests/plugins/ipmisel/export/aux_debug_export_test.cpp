@@ -14,9 +14,11 @@ class LineRecorder : public InstanceRecorder {
 public:
     explicit LineRecorder(const LogRecorder& log) : log_(log) {}
     std::vector<std::string> lines;
-    bool CloseInstance() override {
+
+protected:
+    bool Take(const NQORTQR20::Instance& instance) override {
         lines.push_back(log_.All().back().second);
-        return InstanceRecorder::CloseInstance();
+        return InstanceRecorder::Take(instance);
     }
 
 private:
