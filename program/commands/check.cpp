@@ -11,8 +11,6 @@
 #include "program/commands/arguments.h"
 #include "program/commands/collect.h"
 #include "program/commands/failure.h"
-#include "program/commands/log_lines.h"
-#include "program/commands/plugins.h"
 #include "program/fleet/collect_hosts.h"
 #include "program/fleet/fleet_summary.h"
 #include "program/fleet/service_check.h"
@@ -123,8 +121,6 @@ Command AddCheckCommand(CLI::App* program) {
         program->add_subcommand("check", "Tell in one line what is wrong, for a monitoring system");
     const auto options = std::make_shared<CheckOptions>();
     options->collect.deadlineSeconds = 50;  // a monitoring system waits for a minute
-    options->collect.log.level = NQORTQR20::ILogger::kError;
-    options->collect.progress = false;
     command->add_option("FILE", options->files, "Saved reports of --format json, instead of --from")
         ->check(FileName());
     CLI::Option* const store =
@@ -147,10 +143,7 @@ Command AddCheckCommand(CLI::App* program) {
     for (const char* other : {"FILE", "--from"}) store->excludes(command->get_option(other));
     AddHostsOptions(command, &options->hosts);
     store->excludes(command->get_option("--hosts"));
-    AddDeadlineOption(command, &options->collect.deadlineSeconds);
-    AddSeveritiesOption(command, &options->collect.severities);
-    AddPluginOption(command, &options->collect.plugins);
-    AddLogLevelOption(command, &options->collect.log);
+    AddPassOptions(command, &options->collect);
     command->footer(
         "Exit status:\n"
         "  0  no problem\n"

@@ -370,6 +370,21 @@ std::vector<NamedFile> FilesOf(const CollectOptions& options) {
     return files;
 }
 
+void AddDeadlineOption(CLI::App* command, std::optional<double>* seconds) {
+    command
+        ->add_option("--deadline", *seconds,
+                     "Seconds that the whole collection may take; that of each controller with "
+                     "--hosts")
+        ->type_name("SECONDS")
+        ->check(Seconds(365 * kSecondsPerDay));
+}
+
+void AddSeveritiesOption(CLI::App* command, std::optional<std::string>* file) {
+    command->add_option("--severities", *file, "File with severities of your own")
+        ->type_name("FILE")
+        ->check(FileName());
+}
+
 }  // namespace
 
 Outcome CollectOutcome(const CollectOptions& options) {
@@ -398,19 +413,13 @@ int Collect(const CollectOptions& options) {
     return outcome.exitStatus;
 }
 
-void AddDeadlineOption(CLI::App* command, std::optional<double>* seconds) {
-    command
-        ->add_option("--deadline", *seconds,
-                     "Seconds that the whole collection may take; that of each controller with "
-                     "--hosts")
-        ->type_name("SECONDS")
-        ->check(Seconds(365 * kSecondsPerDay));
-}
-
-void AddSeveritiesOption(CLI::App* command, std::optional<std::string>* file) {
-    command->add_option("--severities", *file, "File with severities of your own")
-        ->type_name("FILE")
-        ->check(FileName());
+void AddPassOptions(CLI::App* command, CollectOptions* options) {
+    options->log.level = NQORTQR20::ILogger::kError;
+    options->progress = false;
+    AddDeadlineOption(command, &options->deadlineSeconds);
+    AddSeveritiesOption(command, &options->severities);
+    AddPluginOption(command, &options->plugins);
+    AddLogLevelOption(command, &options->log);
 }
 
 void AddStoreOptions(CLI::App* command, CollectOptions* options) {

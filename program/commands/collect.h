@@ -36,9 +36,9 @@ Outcome CollectOutcome(const CollectOptions& options);
 /// The same, told; the exit status.
 int Collect(const CollectOptions& options);
 
-// Options that other commands have too.
-void AddDeadlineOption(CLI::App* command, std::optional<double>* seconds);
-void AddSeveritiesOption(CLI::App* command, std::optional<std::string>* file);
+/// The options of a command that collects for a purpose of its own: deadline, severities, further
+/// plug-ins, log level. Only errors are logged unless told otherwise, and no progress is shown.
+void AddPassOptions(CLI::App* command, CollectOptions* options);
 
 /// `ipmisel collect`.
 Command AddCollectCommand(CLI::App* program);

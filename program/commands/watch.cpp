@@ -6,8 +6,6 @@
 #include "program/commands/arguments.h"
 #include "program/commands/collect.h"
 #include "program/commands/failure.h"
-#include "program/commands/log_lines.h"
-#include "program/commands/plugins.h"
 #include "program/fleet/watch.h"
 
 namespace ipmisel {
@@ -22,8 +20,6 @@ Command AddWatchCommand(CLI::App* program) {
     CLI::App* const command =
         program->add_subcommand("watch", "Visit controllers again and again, a line a new event");
     const auto options = std::make_shared<WatchOptions>();
-    options->collect.log.level = NQORTQR20::ILogger::kError;
-    options->collect.progress = false;
     AddAccessOptions(command, &options->collect.access);
     AddHostsOptions(command, &options->hosts);
     command
@@ -38,10 +34,7 @@ Command AddWatchCommand(CLI::App* program) {
                      "comes after the first visit")
         ->type_name("URI")
         ->check(NotEmpty("the store is empty; give sqlite:FILE or postgresql://..."));
-    AddDeadlineOption(command, &options->collect.deadlineSeconds);
-    AddSeveritiesOption(command, &options->collect.severities);
-    AddPluginOption(command, &options->collect.plugins);
-    AddLogLevelOption(command, &options->collect.log);
+    AddPassOptions(command, &options->collect);
     command->footer(
         "Exit status:\n"
         "  0  ended by SIGTERM or SIGINT\n"

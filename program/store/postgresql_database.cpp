@@ -1,14 +1,13 @@
-#include <dlfcn.h>
 #include <libpq-fe.h>
 #include <poll.h>
 
 #include <chrono>
 #include <cstdlib>
-#include <cstring>
 #include <random>
 #include <thread>
 #include <utility>
 
+#include "base/shared_library.h"
 #include "program/commands/failure.h"
 #include "program/store/database.h"
 
@@ -50,22 +49,13 @@ struct Library {
 #undef IPMISEL_DECLARE
 
 private:
-    Library() {
-        void* const handle = dlopen("libpq.so.5", RTLD_NOW | RTLD_LOCAL);
-        if (handle == nullptr) Refuse();
-        const auto find = [handle](const char* name, auto* function) {
-            void* const found = dlsym(handle, name);
-            if (found == nullptr) Refuse();
-            std::memcpy(function, &found, sizeof found);
-        };
-#define IPMISEL_FIND(name) find(#name, &(name))
+    Library() try {
+        const SharedLibrary library("libpq.so.5", "PostgreSQL's (package libpq5)");
+#define IPMISEL_FIND(name) library.Find(#name, &(name))
         IPMISEL_LIBPQ_FUNCTIONS(IPMISEL_FIND);
 #undef IPMISEL_FIND
-    }
-    [[noreturn]] static void Refuse() {
-        throw Failure(kExitUsage, "the library libpq.so.5 cannot be used (" +
-                                      std::string(dlerror()) +
-                                      "); install PostgreSQL's (package libpq5)");
+    } catch (const SharedLibraryError& error) {
+        throw Failure(kExitUsage, error.what());
     }
 };
 

@@ -1,4 +1,3 @@
-#include <dlfcn.h>
 #include <fcntl.h>
 #include <sqlite3.h>
 #include <sys/stat.h>
@@ -11,6 +10,7 @@
 #include <new>
 #include <thread>
 
+#include "base/shared_library.h"
 #include "program/commands/failure.h"
 #include "program/store/database.h"
 
@@ -51,22 +51,13 @@ struct Library {
 #undef IPMISEL_DECLARE
 
 private:
-    Library() {
-        void* const handle = dlopen("libsqlite3.so.0", RTLD_NOW | RTLD_LOCAL);
-        if (handle == nullptr) Refuse();
-        const auto find = [handle](const char* name, auto* function) {
-            void* const found = dlsym(handle, name);
-            if (found == nullptr) Refuse();
-            std::memcpy(function, &found, sizeof found);
-        };
-#define IPMISEL_FIND(name) find(#name, &(name))
+    Library() try {
+        const SharedLibrary library("libsqlite3.so.0", "SQLite 3 (package libsqlite3-0)");
+#define IPMISEL_FIND(name) library.Find(#name, &(name))
         IPMISEL_SQLITE_FUNCTIONS(IPMISEL_FIND);
 #undef IPMISEL_FIND
-    }
-    [[noreturn]] static void Refuse() {
-        throw Failure(kExitUsage, "the library libsqlite3.so.0 cannot be used (" +
-                                      std::string(dlerror()) +
-                                      "); install SQLite 3 (package libsqlite3-0)");
+    } catch (const SharedLibraryError& error) {
+        throw Failure(kExitUsage, error.what());
     }
 };
 

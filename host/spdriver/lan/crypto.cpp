@@ -1,6 +1,5 @@
 #include "host/spdriver/lan/crypto.h"
 
-#include <dlfcn.h>
 #include <openssl/core_names.h>
 #include <openssl/crypto.h>
 #include <openssl/evp.h>
@@ -8,8 +7,9 @@
 #include <sys/random.h>
 
 #include <algorithm>
-#include <cstring>
 #include <string>
+
+#include "base/shared_library.h"
 
 namespace tqrhost {
 namespace {
@@ -46,27 +46,16 @@ public:
 #undef IPMISEL_DECLARE
 
 private:
-    Library() {
-        // Never closed: libcrypto is not made for that.
-        handle_ = dlopen("libcrypto.so.3", RTLD_NOW | RTLD_LOCAL);
-        if (handle_ == nullptr) Refuse(dlerror());
-#define IPMISEL_FIND(name) Find(#name, &(name))
+    Library() try {
+        const ipmisel::SharedLibrary library("libcrypto.so.3", "OpenSSL 3 (package libssl3)");
+#define IPMISEL_FIND(name) library.Find(#name, &(name))
         IPMISEL_CRYPTO_FUNCTIONS(IPMISEL_FIND);
 #undef IPMISEL_FIND
         // What stands in openssl.cnf is for programs that speak TLS.
         OPENSSL_init_crypto(OPENSSL_INIT_NO_LOAD_CONFIG | OPENSSL_INIT_NO_ATEXIT, nullptr);
+    } catch (const ipmisel::SharedLibraryError& error) {
+        throw CryptoError(error.what());
     }
-    template <typename Function>
-    void Find(const char* name, Function* function) {
-        void* const found = dlsym(handle_, name);
-        if (found == nullptr) Refuse(dlerror());
-        std::memcpy(function, &found, sizeof found);
-    }
-    [[noreturn]] static void Refuse(const char* why) {
-        throw CryptoError("the library libcrypto.so.3 cannot be used (" + std::string(why) +
-                          "); install OpenSSL 3 (package libssl3)");
-    }
-    void* handle_;
 };
 
 void Check(bool good, const char* what) {
