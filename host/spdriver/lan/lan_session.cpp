@@ -13,11 +13,6 @@ namespace {
 
 using NQORTQR20::ILogger;
 
-constexpr std::chrono::seconds kIdle{30};
-constexpr std::chrono::milliseconds kMaxSilence{1500};
-constexpr std::chrono::milliseconds kRefusedSilence{250};
-constexpr std::chrono::milliseconds kReopeningPause{500};
-constexpr unsigned kTriesBeforeReopening = 3;
 /// In one Advance: a flood of packets does not keep the caller from its clock.
 constexpr unsigned kMaxBatches = 4;
 
@@ -37,7 +32,8 @@ LanSession::LanSession(std::string name, LanSessionOptions options)
       options_(std::move(options)),
       requests_({.window = options_.window,
                  .timeout = options_.timeout,
-                 .anySessionNumber = options_.credentials.deviations.sessionNumbers}) {}
+                 .anySessionNumber = options_.credentials.deviations.sessionNumbers}),
+      reopening_(options_.timeout) {}
 
 LanSession::~LanSession() {
     // One packet, unanswered: a BMC that misses it drops the session by itself after a minute.
@@ -74,9 +70,8 @@ void LanSession::Advance(Clock::time_point now) {
         requests_.FailAll();
         return;
     }
-    if (codec_ && requests_.Pending() > 0 && !requests_.SilentSince() &&
-        now - requests_.LastHeard() > kIdle) {
-        unproven_ = true;
+    if (codec_ && requests_.Pending() > 0 && !requests_.SilentSince()) {
+        reopening_.NoteIdle(now - requests_.LastHeard());
     }
     Receive(now);
     if (opening_) HandleOpening(now);
@@ -95,14 +90,14 @@ void LanSession::Receive(Clock::time_point now) {
                 if (opening_) opening_->Handle(packet, now);
                 continue;
             }
-            unproven_ = refused_ = false;
+            reopening_.NoteAnswer();
             if (opening_) opening_.reset();  // it lives: no other is needed
             requests_.Handle(*answer, now);
         }
         if (packets.size() < UdpSocket::kBatch) break;
     }
     if (!socket_->TakeRefusal()) return;
-    refused_ = true;
+    reopening_.NoteRefusal();
     if (opening_) opening_->HandleRefusal(now);
 }
 
@@ -110,10 +105,13 @@ void LanSession::HandleOpening(Clock::time_point now) {
     opening_->HandleTimer(now);
     opening_->TakePackets(&toSend_);
     if (opening_->state() == SessionOpening::State::kOpening) return;
-    if (codec_) reopenedAt_ = now;
-    retryReopening_ = false;
-    unproven_ = refused_ = false;
-    if (opening_->state() == SessionOpening::State::kOpen) {
+    const bool isOpen = opening_->state() == SessionOpening::State::kOpen;
+    if (codec_) {
+        reopening_.NoteReopening(now, !isOpen && MayPass(opening_->error()));
+    } else {
+        reopening_.NoteAnswer();
+    }
+    if (isOpen) {
         if (codec_) Log(ILogger::kNotice, name_ + ": the session has been opened anew.");
         SessionOpening::Session session = opening_->TakeSession();
         requests_.Start(session.codec.get(), session.sequence, session.received, session.roundTrip,
@@ -121,7 +119,6 @@ void LanSession::HandleOpening(Clock::time_point now) {
         codec_ = std::move(session.codec);
     } else if (codec_) {
         Log(ILogger::kNotice, Advice(name_, opening_->error()));
-        retryReopening_ = MayPass(opening_->error());
     } else {
         error_ = opening_->error();
         dead_ = true;
@@ -133,17 +130,7 @@ void LanSession::HandleOpening(Clock::time_point now) {
 std::optional<Clock::time_point> LanSession::ReopenAt() const {
     const auto silence = requests_.SilentSince();
     if (!codec_ || opening_ || !silence) return std::nullopt;
-    if (retryReopening_) return reopenedAt_ + kReopeningPause;
-    // Once, until the new session has brought an answer.
-    if (requests_.LastHeard() <= reopenedAt_) return std::nullopt;
-    if (refused_) return silence->since + kRefusedSilence;
-    if (unproven_) {
-        if (silence->tries < 2) return std::nullopt;
-        return silence->since + 2 * silence->expected;
-    }
-    if (silence->tries < kTriesBeforeReopening) return std::nullopt;
-    const auto patience = std::min<Clock::duration>(kMaxSilence, options_.timeout / 3);
-    return silence->since + std::max<Clock::duration>(patience, 2 * silence->expected);
+    return reopening_.At(*silence, requests_.LastHeard());
 }
 
 void LanSession::CheckSilence(Clock::time_point now) {

@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "host/spdriver/lan/opening_error.h"
+#include "host/spdriver/lan/reopening_policy.h"
 #include "host/spdriver/lan/session_opening.h"
 #include "host/spdriver/lan/session_requests.h"
 #include "host/spdriver/lan/udp_socket.h"
@@ -66,12 +67,9 @@ private:
     std::optional<SessionOpening> opening_;
     std::unique_ptr<rmcpplus::Codec> codec_;  ///< of the session that is open
     SessionRequests requests_;
+    ReopeningPolicy reopening_;
     std::optional<OpeningError> error_;
     std::vector<rmcpplus::Packet> toSend_;
-    Clock::time_point reopenedAt_{};  ///< when a session was opened anew, or could not be
-    bool retryReopening_ = false;
-    bool unproven_ = false;  ///< idle so long that the BMC may have dropped the session
-    bool refused_ = false;   ///< nobody listens on the port, since the last answer
     bool dead_ = false;
 };
 
