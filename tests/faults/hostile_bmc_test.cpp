@@ -108,16 +108,17 @@ TEST_F(HostileBmc, CountsThatNeverAddUp) {
         std::size_t exported;
         bool whole;
     } cases[] = {
-        {"no records, and then some", Answer(0x40, 0, info(0, 0)), 0, true},
-        {"fewer than there are", Answer(0x40, 0, info(2, 0)), 2, true},
-        {"65,535 of three", Answer(0x40, 0, info(0xFF, 0xFF)), 3, false},
-        {"no sensors, and then one", Answer(0x20, 0, info(0, 0)), 3, true},
-        {"65,535 sensors of one", Answer(0x20, 0, info(0xFF, 0xFF)), 3, false},
-        {"inventory of nothing for ever", Answer(0x11, 0, {0}), 3, true},
-        {"inventory of more than came", Answer(0x11, 0, {0xFF, 'A', 'B'}), 3, true},
-        {"one record for ever", Answer(0x43, 0, toItself), 1, false},
-        {"records of nothing", Answer(0x43, 0, toNowhere), 0, false},
-        {"sensors of nothing", Answer(0x23, 0, toNowhere), 3, false},
+        {"no records, and then some", Answer(ipmi::kGetSelInfo, 0, info(0, 0)), 0, true},
+        {"fewer than there are", Answer(ipmi::kGetSelInfo, 0, info(2, 0)), 2, true},
+        {"65,535 of three", Answer(ipmi::kGetSelInfo, 0, info(0xFF, 0xFF)), 3, false},
+        {"no sensors, and then one", Answer(ipmi::kGetSdrRepositoryInfo, 0, info(0, 0)), 3, true},
+        {"65,535 sensors of one", Answer(ipmi::kGetSdrRepositoryInfo, 0, info(0xFF, 0xFF)), 3,
+         false},
+        {"inventory of nothing for ever", Answer(ipmi::kReadFruData, 0, {0}), 3, true},
+        {"inventory of more than came", Answer(ipmi::kReadFruData, 0, {0xFF, 'A', 'B'}), 3, true},
+        {"one record for ever", Answer(ipmi::kGetSelEntry, 0, toItself), 1, false},
+        {"records of nothing", Answer(ipmi::kGetSelEntry, 0, toNowhere), 0, false},
+        {"sensors of nothing", Answer(ipmi::kGetSdr, 0, toNowhere), 3, false},
     };
     nodes[0].sdrRecords = {FullSensor(1, 0x30, 7, 1, "Ambient")};
     nodes[0].fru = {{0, FixedLayout("Maker", "Board", "S-0")}};

@@ -134,7 +134,8 @@ TEST_F(Memory, AHundredCollectionsLeaveNothingBehind) {
     nodes[0].fru = {{0, FixedLayout("Maker", "Board", "S-0")},
                     {3, FixedLayout("Maker", "Supply", "S-3")}};
     nodes.push_back(nodes[0]);
-    nodes[1].faults = {NoResponse(0x43, 20), CompletionCode(0x11, 5, 0xC3)};
+    nodes[1].faults = {NoResponse(ipmi::kGetSelEntry, 20),
+                       CompletionCode(ipmi::kReadFruData, 5, 0xC3)};
     std::size_t early = 0;
     for (int pass = 1; pass <= 110; ++pass) {
         ipmisel::Module().ipmifruonce = false;

@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <memory>
 #include <optional>
 #include <string>
@@ -75,27 +76,36 @@ private:
     std::vector<std::vector<std::uint8_t>>* requests_;
 };
 
-/// The call-th use (0 for every use) of a Storage command gets no response.
-inline ipmisim::Fault NoResponse(std::uint8_t command, unsigned call) {
+/// The call-th use (0 for every use) of a command gets no response.
+inline ipmisim::Fault NoResponse(ipmi::CommandCode command, unsigned call) {
     ipmisim::Fault fault;
-    fault.netFn = ipmi::kNetFnStorage;
-    fault.command = command;
+    fault.netFn = command.netFn;
+    fault.command = command.number;
     if (call != 0) fault.call = call;
     return fault;
 }
 /// It answers a completion code.
-inline ipmisim::Fault CompletionCode(std::uint8_t command, unsigned call, std::uint8_t code) {
+inline ipmisim::Fault CompletionCode(ipmi::CommandCode command, unsigned call, std::uint8_t code) {
     ipmisim::Fault fault = NoResponse(command, call);
     fault.kind = ipmisim::Fault::Kind::kCompletionCode;
     fault.completionCode = code;
     return fault;
 }
 /// It answers these data.
-inline ipmisim::Fault Answer(std::uint8_t command, unsigned call, ipmisim::Bytes data) {
+inline ipmisim::Fault Answer(ipmi::CommandCode command, unsigned call, ipmisim::Bytes data) {
     ipmisim::Fault fault = NoResponse(command, call);
     fault.kind = ipmisim::Fault::Kind::kData;
     fault.data = std::move(data);
     return fault;
+}
+
+/// How often a command is among request frames.
+inline long CountOf(ipmi::CommandCode command,
+                    const std::vector<std::vector<std::uint8_t>>& requests) {
+    using namespace NQORTQR20::frame;
+    return std::count_if(requests.begin(), requests.end(), [&](const auto& request) {
+        return request[kNetFnAt] == command.netFn && request[kCommandAt] == command.number;
+    });
 }
 
 /// A case over one simulated BMC: describe it in `bmc`, then take Library().
@@ -118,10 +128,10 @@ protected:
         library_.reset();
         return Library();
     }
-    void FailWith(std::uint8_t command, unsigned call, std::uint8_t completionCode) {
+    void FailWith(ipmi::CommandCode command, unsigned call, std::uint8_t completionCode) {
         bmc.faults.push_back(CompletionCode(command, call, completionCode));
     }
-    void Silence(std::uint8_t command, unsigned call) {
+    void Silence(ipmi::CommandCode command, unsigned call) {
         bmc.faults.push_back(NoResponse(command, call));
     }
     /// The request frames in hexadecimal digits.

@@ -70,11 +70,7 @@ protected:
         const auto lines = log.Lines(severity);
         return std::find(lines.begin(), lines.end(), line) != lines.end();
     }
-    /// How often a Storage command was sent.
-    long Sent(std::uint8_t command) const {
-        return std::count_if(requests.begin(), requests.end(),
-                             [&](const auto& frame) { return frame[4] == command; });
-    }
+    long Sent(ipmi::CommandCode command) const { return CountOf(command, requests); }
 };
 
 }  // namespace ipmiseltest

@@ -12,8 +12,8 @@ protected:
         for (std::uint8_t i = 1; i <= 3; ++i) bmc.selEntries.push_back({i, 0, 2});
     }
 
-    void Send(std::uint8_t command, const std::vector<std::uint8_t>& data = {}) {
-        Ask(ipmi::MakeCommand({ipmi::kNetFnStorage, command}, data));
+    void Send(ipmi::CommandCode command, const std::vector<std::uint8_t>& data = {}) {
+        Ask(ipmi::MakeCommand(command, data));
     }
     /// Any other command.
     void Ask(const ipmi::Command& command) {
@@ -28,8 +28,9 @@ protected:
                std::to_string(account.read);
     }
     void ReadLog() {
-        Send(0x40);
-        for (const std::uint8_t record : {0, 2, 3}) Send(0x43, {0, 0, record, 0, 0, 0xFF});
+        Send(ipmi::kGetSelInfo);
+        for (const std::uint8_t record : {0, 2, 3})
+            Send(ipmi::kGetSelEntry, {0, 0, record, 0, 0, 0xFF});
     }
     NQORTQR20::NodeCompleteness Account() { return NQORTQR20::CompletenessOf(*Library()); }
     std::vector<std::string> Faults() {
@@ -52,8 +53,8 @@ TEST_F(Completeness, CountsEveryRecordOnceHoweverOftenItIsRead) {
 }
 
 TEST_F(Completeness, TellsWhatWentWrongWithEachRead) {
-    Silence(0x43, 1);
-    FailWith(0x43, 2, 0xCB);
+    Silence(ipmi::kGetSelEntry, 1);
+    FailWith(ipmi::kGetSelEntry, 2, 0xCB);
     bmc.faults.push_back({0x0A, 0x43, 3, ipmisim::Fault::Kind::kTruncate, 0, 7, {}});
     ReadLog();
     EXPECT_EQ(Faults(),
@@ -64,27 +65,27 @@ TEST_F(Completeness, TellsWhatWentWrongWithEachRead) {
 }
 
 TEST_F(Completeness, ALogThatNobodyReadIsNotMissing) {
-    Send(0x40);
+    Send(ipmi::kGetSelInfo);
     EXPECT_EQ(Account().log.announced, 3u);
     EXPECT_TRUE(Account().Whole());
-    Send(0x43, {0, 0, 2, 0, 0, 0xFF});
+    Send(ipmi::kGetSelEntry, {0, 0, 2, 0, 0, 0xFF});
     EXPECT_EQ(Account().log.Missing(), 2u);
 }
 
 TEST_F(Completeness, ASensorRecordInPartsIsAsGoodAsAWholeOne) {
     bmc.sdrRecords = {{1, 0, 0x51, 1, 5, 6, 7, 8, 9, 10}};
     bmc.faults.push_back({0x0A, 0x23, 2, ipmisim::Fault::Kind::kTruncate, 0, 2 + 6, {}});
-    FailWith(0x23, 1, 0xCA);
-    Send(0x20);
-    Send(0x22);
-    Send(0x23, {1, 0, 0, 0, 0, 0xFF});  // refused whole
+    FailWith(ipmi::kGetSdr, 1, 0xCA);
+    Send(ipmi::kGetSdrRepositoryInfo);
+    Send(ipmi::kReserveSdrRepository);
+    Send(ipmi::kGetSdr, {1, 0, 0, 0, 0, 0xFF});  // refused whole
     EXPECT_EQ(Faults(), Texts{});
     EXPECT_EQ(Account().sensors.Missing(), 1u);
-    Send(0x23, {1, 0, 0, 0, 0, 0xFF});  // cut after six bytes
+    Send(ipmi::kGetSdr, {1, 0, 0, 0, 0, 0xFF});  // cut after six bytes
     EXPECT_EQ(Faults(), Texts{"Get SDR 0000: short answer"});
-    Send(0x23, {1, 0, 1, 0, 6, 2});
+    Send(ipmi::kGetSdr, {1, 0, 1, 0, 6, 2});
     EXPECT_FALSE(Account().Whole());
-    Send(0x23, {1, 0, 1, 0, 8, 2});
+    Send(ipmi::kGetSdr, {1, 0, 1, 0, 8, 2});
     EXPECT_EQ(Faults(), Texts{});
     EXPECT_TRUE(Account().Whole());
 }
@@ -130,9 +131,9 @@ TEST_F(Completeness, AnInventoryDeviceIsReadWhenItsEndIs) {
 
 TEST_F(Completeness, AnInventoryReadThatWasRefusedAndThenAnsweredIsNoFault) {
     bmc.fru[3] = ipmisim::Bytes(64, 0xAA);
-    FailWith(0x11, 1, 0xCA);
-    FailWith(0x11, 2, 0x81);
-    FailWith(0x11, 4, 0x81);
+    FailWith(ipmi::kReadFruData, 1, 0xCA);
+    FailWith(ipmi::kReadFruData, 2, 0x81);
+    FailWith(ipmi::kReadFruData, 4, 0x81);
     Ask(ipmi::ReadFruData(3, 0, 32));
     Ask(ipmi::ReadFruData(3, 0, 16));
     EXPECT_EQ(Faults().size(), 2u);
@@ -150,10 +151,10 @@ TEST_F(Completeness, ARepositoryThatHasChangedIsToldAndNoMore) {
                           .call = 3,
                           .kind = ipmisim::Fault::Kind::kData,
                           .data = ipmisim::Bytes{0x51, 0, 0, 0, 0, 1, 0, 0, 0, 0, 0, 0, 0, 0}});
-    for (int i = 0; i < 2; ++i) Send(0x20);
+    for (int i = 0; i < 2; ++i) Send(ipmi::kGetSdrRepositoryInfo);
     EXPECT_EQ(Faults(), Texts{});
-    Send(0x20);
-    Send(0x20);
+    Send(ipmi::kGetSdrRepositoryInfo);
+    Send(ipmi::kGetSdrRepositoryInfo);
     EXPECT_EQ(Faults(),
               Texts{"Get SDR Repository Info : the sensor repository has changed while it "
                     "was read"});
@@ -161,8 +162,8 @@ TEST_F(Completeness, ARepositoryThatHasChangedIsToldAndNoMore) {
 }
 
 TEST_F(Completeness, AQuestionAnsweredAtTheSecondTryLeavesNothingOut) {
-    Silence(0x40, 1);
-    Send(0x40);
+    Silence(ipmi::kGetSelInfo, 1);
+    Send(ipmi::kGetSelInfo);
     EXPECT_EQ(Faults(), Texts{"Get SEL Info : no response"});
     ReadLog();
     EXPECT_EQ(Faults(), Texts{});
@@ -171,9 +172,9 @@ TEST_F(Completeness, AQuestionAnsweredAtTheSecondTryLeavesNothingOut) {
 
 TEST_F(Completeness, ACircleIsAFaultAndAnAbsentDeviceIsNone) {
     ReadLog();
-    Send(0x43, {0, 0, 1, 0, 0, 0xFF});  // the first record again, under its own ID
+    Send(ipmi::kGetSelEntry, {0, 0, 1, 0, 0, 0xFF});  // the first record again, under its own ID
     EXPECT_EQ(Faults(), Texts{"Get SEL Entry 0001: ran in a circle"});
-    Send(0x11, {9, 0, 0, 16});
+    Send(ipmi::kReadFruData, {9, 0, 0, 16});
     EXPECT_EQ(Faults().size(), 1u);
 }
 
@@ -181,9 +182,9 @@ TEST_F(Completeness, AWalkThatEndsEarlyIsNotMadeUpForByAnother) {
     ipmisim::Bytes last(18, 0xFF);  // by its next record ID
     last[2] = last[4] = 2;
     last[3] = 0;
-    bmc.faults = {ipmiseltest::Answer(0x43, 2, last)};
-    Send(0x40);
-    for (const std::uint8_t record : {0, 2}) Send(0x43, {0, 0, record, 0, 0, 0xFF});
+    bmc.faults = {ipmiseltest::Answer(ipmi::kGetSelEntry, 2, last)};
+    Send(ipmi::kGetSelInfo);
+    for (const std::uint8_t record : {0, 2}) Send(ipmi::kGetSelEntry, {0, 0, record, 0, 0, 0xFF});
     ReadLog();
     EXPECT_EQ(Account().log.read, 3u);
     EXPECT_EQ(Faults(), Texts{"Get SEL Entry 0002: ended early"});
@@ -191,10 +192,10 @@ TEST_F(Completeness, AWalkThatEndsEarlyIsNotMadeUpForByAnother) {
 
 TEST_F(Completeness, AnInventoryFaultLeavesLogAndSensorsWhole) {
     bmc.fru[0] = ipmisim::Bytes(16, 1);
-    FailWith(0x11, 2, 0xC0);
-    Send(0x11, {0, 0, 0, 16});
-    Send(0x11, {0, 0, 0, 16});
-    Send(0x11, {0, 16, 0, 16});  // past the end: the device is smaller
+    FailWith(ipmi::kReadFruData, 2, 0xC0);
+    Send(ipmi::kReadFruData, {0, 0, 0, 16});
+    Send(ipmi::kReadFruData, {0, 0, 0, 16});
+    Send(ipmi::kReadFruData, {0, 16, 0, 16});  // past the end: the device is smaller
     EXPECT_EQ(Faults(), Texts{"Read FRU Data 0000: completion code c0"});
     EXPECT_TRUE(Account().Whole());
 }

@@ -7,11 +7,11 @@
 namespace ipmiseltest {
 namespace {
 
-constexpr std::uint8_t kSel = 0x43, kSdr = 0x23;
+constexpr ipmi::CommandCode kSel = ipmi::kGetSelEntry, kSdr = ipmi::kGetSdr;
 
 /// Both walks over a BMC whose records have the given IDs; of two with one ID the first is found,
 /// so that a repeated ID closes a circle.
-class Guard : public ::testing::TestWithParam<std::uint8_t> {
+class Guard : public ::testing::TestWithParam<ipmi::CommandCode> {
 protected:
     std::vector<std::vector<std::uint8_t>> asked;
     std::unique_ptr<tqrhost::LoopGuard> guard;
@@ -26,11 +26,11 @@ protected:
         guard =
             std::make_unique<tqrhost::LoopGuard>(std::make_unique<SimulatedTransport>(bmc, &asked));
     }
-    bool Read(std::uint16_t id, std::uint8_t command = GetParam()) {
+    bool Read(std::uint16_t id, ipmi::CommandCode command = GetParam()) {
         const auto answer = guard->Exchange(ReadRequest(command, id));
         return answer && answer->front() == 0;
     }
-    void Send(std::uint8_t command) { guard->Exchange(StorageRequest(command)); }
+    void Send(ipmi::CommandCode command) { guard->Exchange(RequestOf(command)); }
     /// Reads along the chain; the number of records that were given.
     unsigned Walk() {
         std::uint16_t id = 0;
@@ -66,7 +66,7 @@ TEST_P(Guard, AWalkGivesEachRecordOnceAndCanBeMadeAgain) {
 TEST_P(Guard, AFailedReadEndsTheWalk) {
     for (const auto kind :
          {ipmisim::Fault::Kind::kNoResponse, ipmisim::Fault::Kind::kCompletionCode}) {
-        Records({1, 2, 3}, {{0x0A, GetParam(), 2, kind, 0xCB, 0, {}}});
+        Records({1, 2, 3}, {{GetParam().netFn, GetParam().number, 2, kind, 0xCB, 0, {}}});
         EXPECT_EQ(Walk(), 1u);
         EXPECT_EQ(Walk(), 3u);
     }
@@ -74,10 +74,12 @@ TEST_P(Guard, AFailedReadEndsTheWalk) {
 
 TEST_P(Guard, TheCommandsThatBeginAWalkForgetTheLast) {
     const bool isSel = GetParam() == kSel;
-    for (const std::uint8_t begin : {isSel ? 0x40 : 0x22, isSel ? 0x40 : 0x20}) {
+    for (const ipmi::CommandCode begin :
+         {isSel ? ipmi::kGetSelInfo : ipmi::kReserveSdrRepository,
+          isSel ? ipmi::kGetSelInfo : ipmi::kGetSdrRepositoryInfo}) {
         Records({1, 2, 3});
         EXPECT_TRUE(Read(0) && Read(2));
-        Send(isSel ? 0x22 : 0x40);  // begins the other walk
+        Send(isSel ? ipmi::kReserveSdrRepository : ipmi::kGetSelInfo);  // begins the other walk
         EXPECT_FALSE(Read(2));
         EXPECT_TRUE(Read(0) && Read(2));
         Send(begin);
@@ -87,9 +89,9 @@ TEST_P(Guard, TheCommandsThatBeginAWalkForgetTheLast) {
 
 TEST_P(Guard, OtherPartsOfTheLastRecordAreGivenAfterIt) {
     Records({1});
-    Send(0x22);
+    Send(ipmi::kReserveSdrRepository);
     const auto part = [](std::uint8_t offset) {
-        return StorageRequest(GetParam(), {1, 0, 0, 0, offset, 1});
+        return RequestOf(GetParam(), {1, 0, 0, 0, offset, 1});
     };
     EXPECT_TRUE(guard->Exchange(part(0)) && guard->Exchange(part(2)) && guard->Exchange(part(3)));
     EXPECT_FALSE(guard->Exchange(part(2)));

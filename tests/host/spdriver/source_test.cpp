@@ -12,11 +12,13 @@
 namespace {
 
 using ipmiseltest::ReadRequest;
-using ipmiseltest::StorageRequest;
+using ipmiseltest::RequestOf;
 using namespace ::testing;
 using namespace tqrhost;
 
-constexpr std::uint8_t kGetSelInfo = 0x40, kGetSelEntry = 0x43, kGetSelTime = 0x48;
+using ipmi::kGetSelEntry;
+using ipmi::kGetSelInfo;
+using ipmi::kGetSelTime;
 
 /// The one line with which the sources are refused; empty when they open.
 std::string Refusal(const std::vector<std::string>& sources) {
@@ -57,10 +59,10 @@ TEST(Sources, WhatIsOfNoKindOrCannotBeJoinedIsRefused) {
 std::vector<std::optional<Response>> Converse(const Source& source) {
     std::vector<std::optional<Response>> answers;
     for (int i = 0; i < 3; ++i) {
-        answers.push_back(source.nodes[0].transport->Exchange(StorageRequest(kGetSelTime)));
+        answers.push_back(source.nodes[0].transport->Exchange(RequestOf(kGetSelTime)));
     }
     answers.push_back(source.nodes[0].transport->Exchange(ReadRequest(kGetSelEntry, 1)));
-    answers.push_back(source.nodes[1].transport->Exchange(StorageRequest(kGetSelTime)));
+    answers.push_back(source.nodes[1].transport->Exchange(RequestOf(kGetSelTime)));
     return answers;
 }
 
@@ -89,10 +91,10 @@ TEST(Capture, AReplayAnswersWhatWasRecorded) {
     ASSERT_EQ(replay.nodes.size(), 2u);
     EXPECT_EQ(Converse(replay), recorded);
     // Asked once more than recorded; another node's request; other data; another command.
-    EXPECT_EQ(replay.nodes[0].transport->Exchange(StorageRequest(kGetSelTime)), recorded[2]);
+    EXPECT_EQ(replay.nodes[0].transport->Exchange(RequestOf(kGetSelTime)), recorded[2]);
     EXPECT_EQ(replay.nodes[1].transport->Exchange(ReadRequest(kGetSelEntry, 1)), std::nullopt);
     EXPECT_EQ(replay.nodes[0].transport->Exchange(ReadRequest(kGetSelEntry, 2)), std::nullopt);
-    EXPECT_EQ(replay.nodes[0].transport->Exchange(StorageRequest(kGetSelInfo)), std::nullopt);
+    EXPECT_EQ(replay.nodes[0].transport->Exchange(RequestOf(kGetSelInfo)), std::nullopt);
 }
 
 /// A controller that takes its time, and the clock that a plug-in sees around the question.
@@ -108,9 +110,9 @@ TEST(Capture, AReplayShowsTheClockAsItWasAtTheQuestion) {
             seen.push_back(NQORTQR20::TOSSpecific::GetLocalTime().ToString());
         };
         for (int i = 0; i < 2; ++i) {
-            source.nodes[0].transport->Exchange(StorageRequest(kGetSelInfo));
+            source.nodes[0].transport->Exchange(RequestOf(kGetSelInfo));
             see();
-            source.nodes[0].transport->Exchange(StorageRequest(kGetSelTime));
+            source.nodes[0].transport->Exchange(RequestOf(kGetSelTime));
             see();
         }
         NQORTQR20::SetMachineFacts({});
@@ -139,14 +141,14 @@ TEST(Capture, OneThatEndsInTheMiddleOfALineIsReplayedAsFarAsItGoes) {
     for (std::size_t length = lastLine; length <= text.size(); ++length) {
         Source source =
             OpenSources({"replay:" + folder.Write("capture", text.substr(0, length))}, {});
-        EXPECT_TRUE(source.nodes[0].transport->Exchange(StorageRequest(kGetSelTime)));
+        EXPECT_TRUE(source.nodes[0].transport->Exchange(RequestOf(kGetSelTime)));
         std::vector<std::string> problems;
         for (const auto& fault : source.nodes[0].missing()) problems.push_back(fault.problem);
         const bool cut = length > lastLine && length < text.size();
         EXPECT_EQ(problems.size(), cut ? 1u : 0u) << length;
         // What it lacks is reported, once.
         for (int i = 0; i < 2; ++i) {
-            source.nodes[0].transport->Exchange(StorageRequest(kGetSelEntry));
+            source.nodes[0].transport->Exchange(RequestOf(kGetSelEntry));
         }
         ASSERT_EQ(source.nodes[0].missing().size(), cut ? 2u : 1u);
         EXPECT_EQ(source.nodes[0].missing().back(),
@@ -235,7 +237,7 @@ TEST(InbandSource, WithoutADriverTheSmbiosRecordMakesAMachineThatIsSilent) {
     EXPECT_FALSE(source.facts.ipmiDriver);
     EXPECT_THAT(source.facts.smbios, ElementsAre(ipmiDevice));
     ASSERT_EQ(source.nodes.size(), 1u);
-    EXPECT_EQ(source.nodes[0].transport->Exchange(StorageRequest(kGetSelInfo)), std::nullopt);
+    EXPECT_EQ(source.nodes[0].transport->Exchange(RequestOf(kGetSelInfo)), std::nullopt);
 }
 
 }  // namespace

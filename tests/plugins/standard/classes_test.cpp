@@ -348,11 +348,7 @@ TEST_F(StandardClasses, AnInventoryHasEveryFieldOfItsDevice) {
 }
 
 TEST_F(StandardClasses, ASystemIsNamedByItsInventoryAndEachDeviceReadOnce) {
-    const auto reads = [&] {
-        return std::count_if(requests.begin(), requests.end(), [](const auto& frame) {
-            return frame[2] == ipmi::kReadFruData.netFn && frame[4] == ipmi::kReadFruData.number;
-        });
-    };
+    const auto reads = [&] { return ipmiseltest::CountOf(ipmi::kReadFruData, requests); };
     Collect(ServerWithInventory(), {"IPMI_FRU"});
     const auto once = reads();
     requests.clear();
@@ -364,10 +360,7 @@ TEST_F(StandardClasses, ASystemIsNamedByItsInventoryAndEachDeviceReadOnce) {
     EXPECT_EQ(reads(), once);
     requests.clear();
     Collect(ServerWithInventory(), {"IPMI_Controller"});
-    EXPECT_EQ(std::count_if(requests.begin(), requests.end(),
-                            [](const auto& frame) { return frame[4] == ipmi::kGetSdr.number; }),
-              0)
-        << "no repository for device 0";
+    EXPECT_EQ(ipmiseltest::CountOf(ipmi::kGetSdr, requests), 0) << "no repository for device 0";
 }
 
 /// A controller with a log of 512 temperature events, all taken back but those of sensor 1, and 100
@@ -392,11 +385,7 @@ std::string LargeServer() {
 }
 
 TEST_F(StandardClasses, EachRecordIsReadOnceForAllClasses) {
-    const auto sent = [&](ipmi::CommandCode code) {
-        return std::count_if(requests.begin(), requests.end(), [&](const auto& frame) {
-            return frame[2] == code.netFn && frame[4] == code.number;
-        });
-    };
+    const auto sent = [&](ipmi::CommandCode code) { return ipmiseltest::CountOf(code, requests); };
     std::vector<const char*> all;
     for (std::uint32_t i = 0; i < fdrPluginClasses.classCount; ++i) {
         all.push_back(fdrPluginClasses.classes[i].name);

@@ -90,19 +90,17 @@ TEST_F(FruDeviceTest, AnotherControllersDeviceIsNotReadByItsNumber) {
 }
 
 TEST_F(FruDeviceTest, WhatFailsIsToldAndWhatWasReadIsUsed) {
-    constexpr std::uint8_t kAreaInfo = 0x10;
-    constexpr std::uint8_t kRead = 0x11;
     const std::size_t size = WholeFruImage().Bytes().size();
     const auto read = [&](const ipmisim::Fault& fault) {
         bmc.faults = {fault};
         return Read({});
     };
     bmc.fru[0] = WholeFruImage().Bytes();
-    EXPECT_THAT(read(CompletionCode(kAreaInfo, 0, 0xD5))[0].problems,
+    EXPECT_THAT(read(CompletionCode(ipmi::kGetFruInventoryAreaInfo, 0, 0xD5))[0].problems,
                 ElementsAre("Get FRU Inventory Area Info: completion code d5h"));
-    EXPECT_THAT(read(CompletionCode(kAreaInfo, 0, 0xCB)), IsEmpty());
-    EXPECT_THAT(read(CompletionCode(kRead, 0, 0xCB)), IsEmpty());
-    const auto cut = read(NoResponse(kRead, 3));
+    EXPECT_THAT(read(CompletionCode(ipmi::kGetFruInventoryAreaInfo, 0, 0xCB)), IsEmpty());
+    EXPECT_THAT(read(CompletionCode(ipmi::kReadFruData, 0, 0xCB)), IsEmpty());
+    const auto cut = read(NoResponse(ipmi::kReadFruData, 3));
     ASSERT_THAT(cut, SizeIs(1));
     EXPECT_EQ(cut[0].inventory->chassis->serialNumber, "CHS01");
     EXPECT_THAT(cut[0].problems,
@@ -110,16 +108,15 @@ TEST_F(FruDeviceTest, WhatFailsIsToldAndWhatWasReadIsUsed) {
 }
 
 TEST_F(FruDeviceTest, ADeviceThatIsBusyForAWhileIsReadWhole) {
-    constexpr std::uint8_t kAreaInfo = 0x10;
-    constexpr std::uint8_t kRead = 0x11;
     bmc.fru[0] = WholeFruImage().Bytes();
-    bmc.faults = {CompletionCode(kAreaInfo, 1, 0xC0), CompletionCode(kRead, 1, 0x81),
-                  CompletionCode(kRead, 3, 0xC0)};
+    bmc.faults = {CompletionCode(ipmi::kGetFruInventoryAreaInfo, 1, 0xC0),
+                  CompletionCode(ipmi::kReadFruData, 1, 0x81),
+                  CompletionCode(ipmi::kReadFruData, 3, 0xC0)};
     const auto devices = Read({});
     ASSERT_THAT(devices, SizeIs(1));
     EXPECT_THAT(devices[0].problems, IsEmpty());
     EXPECT_EQ(devices[0].SerialNumber(), "SN01");
-    bmc.faults = {CompletionCode(kRead, 0, 0x81)};
+    bmc.faults = {CompletionCode(ipmi::kReadFruData, 0, 0x81)};
     EXPECT_THAT(Read({})[0].problems,
                 ElementsAre(HasSubstr("bytes could be read: completion code 81h")));
 }

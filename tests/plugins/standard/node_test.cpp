@@ -38,11 +38,7 @@ protected:
         }
         return "\"sdr\": {\"records\": [" + list + "]}";
     }
-    long Sent(ipmi::CommandCode code) const {
-        return std::count_if(requests.begin(), requests.end(), [&](const auto& frame) {
-            return frame[2] == code.netFn && frame[4] == code.number;
-        });
-    }
+    long Sent(ipmi::CommandCode code) const { return ipmiseltest::CountOf(code, requests); }
 };
 
 TEST_F(NodeTest, EachFactIsAskedForOnceAndOnlyWhenWanted) {

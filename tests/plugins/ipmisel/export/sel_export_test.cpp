@@ -222,7 +222,7 @@ TEST_F(SelExport, WithoutAValueArrayTheExportEnds) {
 }
 
 TEST_F(SelExport, UnknownClockDifferenceIsTolerated) {
-    Silence(0x48, 0);
+    Silence(ipmi::kGetSelTime, 0);
     EXPECT_EQ(Export(), 0U);  // of no records
     EXPECT_THAT(written.instances, IsEmpty());
     EXPECT_THAT(log.Lines(ipmisel::kNotice),

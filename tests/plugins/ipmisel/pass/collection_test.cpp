@@ -36,10 +36,10 @@ constexpr const char* kLog = "QORSG_IPMILogRecord";
 constexpr const char* kAux = "QORSG_ZMCAuxDebugRecord";
 constexpr const char* kFru = "QORSG_IPMIFRU";
 
-constexpr std::uint8_t kGetSelInfo = 0x40;
-constexpr std::uint8_t kGetSelEntry = 0x43;
-constexpr std::uint8_t kGetSdrInfo = 0x20;
-constexpr std::uint8_t kGetSdr = 0x23;
+using ipmi::kGetSdr;
+using ipmi::kGetSdrRepositoryInfo;
+using ipmi::kGetSelEntry;
+using ipmi::kGetSelInfo;
 
 class Pass : public MachineTest {
 protected:
@@ -163,7 +163,7 @@ TEST_F(Pass, WhatIsReadBeforeAFailureIsUsed) {
     const std::string sensors = "Could not collect all sensor data records\n";
     const std::string records = "Failed to fill all the entries into SEL array.\n";
     const std::tuple<ipmisim::Fault, int, std::string, std::vector<std::string>> cases[] = {
-        {NoResponse(kGetSdrInfo, 1), 0, sensors, {"", "", ""}},
+        {NoResponse(kGetSdrRepositoryInfo, 1), 0, sensors, {"", "", ""}},
         {CompletionCode(kGetSdr, 4, 0xC5),
          0,
          sensors,
@@ -181,7 +181,8 @@ TEST_F(Pass, WhatIsReadBeforeAFailureIsUsed) {
         nodes[0].faults = {fault};
         EXPECT_EQ(Collect({kLog}), 0);
         EXPECT_TRUE(Logged(severity, line));
-        EXPECT_EQ(Logged(1, "No SDR data obtained.\n"), fault.command == kGetSdrInfo);
+        EXPECT_EQ(Logged(1, "No SDR data obtained.\n"),
+                  fault.command == kGetSdrRepositoryInfo.number);
         EXPECT_TRUE(Logged(4, "num_SELentries = 3"));
         EXPECT_EQ(Written("SensorInformation"), names);
     }

@@ -2,6 +2,7 @@
 
 #include <filesystem>
 #include <functional>
+#include <map>
 
 #include "plugins/ipmisel/requests/diff_time.h"
 #include "plugins/ipmisel/requests/request_aux_log.h"
@@ -69,7 +70,7 @@ TEST_F(Exchange, LongDataIsSentWholeOrNotAtAll) {
 }
 
 TEST_F(Exchange, SelInfoInFull) {
-    bmc.faults = {ipmiseltest::Answer(0x40, 1, {0x51, 0x34, 0x12, 0xEE})};
+    bmc.faults = {ipmiseltest::Answer(ipmi::kGetSelInfo, 1, {0x51, 0x34, 0x12, 0xEE})};
     EXPECT_EQ(SelInfo(), kOk);
     EXPECT_EQ(count, 4660U);
     EXPECT_THAT(Frames(), ElementsAre("01 20 0A 00 40 00 00 00 00 00 00 00 00 00 00 "));
@@ -110,38 +111,41 @@ TEST_F(Exchange, WrongSelVersionFails) {
 // No operation has a completed line when its command fails.
 TEST_F(Exchange, EveryCommandReportsNoAnswerAndCompletionCodes) {
     const struct {
-        std::uint8_t command;
+        ipmi::CommandCode command;
         std::function<unsigned()> run;
         std::string notSent;  // after "Failure in sending command to "
         std::string prefix;   // after "IPMI error in "
         bool erase;
     } cases[] = {
-        {0x40, [&] { return SelInfo(); }, "obtain SEL info.",
+        {ipmi::kGetSelInfo, [&] { return SelInfo(); }, "obtain SEL info.",
          "obtaining system event log info: ", true},
-        {0x43, [&] { return IPMIRequestSEL(Library()).IPMIGetSELEntry(nullptr, &row, 1); },
+        {ipmi::kGetSelEntry,
+         [&] { return IPMIRequestSEL(Library()).IPMIGetSELEntry(nullptr, &row, 1); },
          "obtain SEL Entry.", "obtaining system event log entry: ", true},
-        {0x20, [&] { return IPMIRequestSDR(Library()).IPMIGetSDRInfo(nullptr, info); },
+        {ipmi::kGetSdrRepositoryInfo,
+         [&] { return IPMIRequestSDR(Library()).IPMIGetSDRInfo(nullptr, info); },
          "obtain SDR info.", "obtaining sensor data record info: ", false},
-        {0x22, [&] { return IPMIRequestSDR(Library()).IPMIReserveSDR(nullptr); }, "reserve SDR.",
+        {ipmi::kReserveSdrRepository,
+         [&] { return IPMIRequestSDR(Library()).IPMIReserveSDR(nullptr); }, "reserve SDR.",
          "reserving sensor data record: ", false},
-        {0x23, [&] { return IPMIRequestSDR(Library()).IPMIGetSDRHeader(nullptr, &entry); },
+        {ipmi::kGetSdr, [&] { return IPMIRequestSDR(Library()).IPMIGetSDRHeader(nullptr, &entry); },
          "obtain SDR Header.", "obtaining sensor data record header: ", false},
-        {0x23, [&] { return IPMIRequestSDR(Library()).IPMIGetSDRUnits(nullptr, &entry); },
+        {ipmi::kGetSdr, [&] { return IPMIRequestSDR(Library()).IPMIGetSDRUnits(nullptr, &entry); },
          "obtain SDR Units.", "obtaining sensor data record units: ", false},
-        {0x23, [&] { return IPMIRequestSDR(Library()).IPMIGetSDRString(nullptr, &entry); },
+        {ipmi::kGetSdr, [&] { return IPMIRequestSDR(Library()).IPMIGetSDRString(nullptr, &entry); },
          "obtain SDR String.", "obtaining sensor data record string: ", false},
-        {0x5A, [&] { return AuxStatus(); }, "obtain AUX Log Status.",
+        {ipmi::kGetAuxiliaryLogStatus, [&] { return AuxStatus(); }, "obtain AUX Log Status.",
          "obtaining system event log info: ", false},
-        {0x48, [&] { return GetDiffTime(nullptr, &difference, &notBehind, Library()); },
+        {ipmi::kGetSelTime,
+         [&] { return GetDiffTime(nullptr, &difference, &notBehind, Library()); },
          "obtain system event log device time.", "obtaining system event log device time: ", false},
     };
-    for (const std::uint8_t command : {0x40, 0x43, 0x20, 0x22, 0x23, 0x5A, 0x48}) {
-        const unsigned uses = command == 0x23 ? 3 : 1;
-        for (unsigned use = 0; use < uses; ++use) {
-            Silence(command, 3 * use + 1);
-            FailWith(command, 3 * use + 2, 0x81);
-            FailWith(command, 3 * use + 3, 0xC5);
-        }
+    std::map<ipmi::CommandCode, unsigned> uses;
+    for (const auto& c : cases) {
+        unsigned& use = uses[c.command];
+        Silence(c.command, ++use);
+        FailWith(c.command, ++use, ipmi::kSelEraseInProgress);
+        FailWith(c.command, ++use, ipmi::kReservationCanceled);
     }
     for (const auto& c : cases) {
         log.Clear();

@@ -12,7 +12,7 @@ using namespace ipmisel;
 using ::testing::Contains;
 using ::testing::ElementsAre;
 
-constexpr std::uint8_t kGetSdr = 0x23;
+using ipmi::kGetSdr;
 
 class FruWalk : public ipmiseltest::BmcTest {
 protected:
@@ -121,12 +121,12 @@ TEST_F(FruWalk, OneByteOfFfGoesOn) {
 
 TEST_F(FruWalk, FailureKeepsWhatWasFound) {
     const struct {
-        std::uint8_t command;
+        ipmi::CommandCode command;
         unsigned call;
         std::string what, prefix;
         std::size_t found;
     } cases[] = {
-        {0x22, 1, "reserve SDR.", "reserving sensor data record: ", 0},
+        {ipmi::kReserveSdrRepository, 1, "reserve SDR.", "reserving sensor data record: ", 0},
         {kGetSdr, 3, "obtain SDR Header.", "obtaining sensor data record header: ", 1},
         {kGetSdr, 4, "obtain SDR String.", "obtaining sensor data record string: ", 1},
     };
@@ -171,7 +171,7 @@ TEST_F(FruData, IsReadInSixteenChunks) {
 
 TEST_F(FruData, EachAnswerFillsItsChunkAsFarAsItGoes) {
     const auto answer = [](unsigned call, ipmisim::Bytes data) {
-        return ipmiseltest::Answer(0x11, call, std::move(data));
+        return ipmiseltest::Answer(ipmi::kReadFruData, call, std::move(data));
     };
     ipmisim::Bytes tooLong(400, 0xCC);
     std::iota(tooLong.begin() + 1, tooLong.begin() + 17, std::uint8_t{0xF1});
@@ -195,7 +195,7 @@ TEST_F(FruData, EachAnswerFillsItsChunkAsFarAsItGoes) {
          256,
          100,
          {kInfo, "FRU data not available for Device ID 7: Parameter out of range."}},
-        {{ipmiseltest::NoResponse(0x11, 2)},
+        {{ipmiseltest::NoResponse(ipmi::kReadFruData, 2)},
          16,
          256,
          300,

@@ -64,7 +64,7 @@ TEST_F(SelWalk, FirstEntryIsStoredEvenForNoRows) {
 
 TEST_F(SelWalk, MissingAnswerInTheMiddleKeepsTheRowsAndIsTolerated) {
     AddEntries({1, 2, 3});
-    Silence(0x43, 3);
+    Silence(ipmi::kGetSelEntry, 3);
     EXPECT_EQ(Walk(3), kOk);
     EXPECT_EQ(filled, 2U);
     EXPECT_THAT(log.Lines(kError), ElementsAre());
