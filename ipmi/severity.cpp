@@ -11,9 +11,6 @@ namespace ipmi {
 
 namespace {
 
-constexpr std::array<std::string_view, 5> kNames{"information", "ok", "warning", "critical",
-                                                 "fatal"};
-
 constexpr std::uint8_t kAnySensorType = 0;
 
 // A row is a type, and three letters for each of its offsets from 0 up: severity when asserted,
@@ -179,14 +176,10 @@ bool IsOf(const auto& row, std::uint8_t eventType, std::uint8_t sensorType) {
 
 }  // namespace
 
-std::string_view SeverityName(Severity severity) {
-    return kNames[static_cast<std::size_t>(severity)];
-}
-
 std::optional<Severity> ParseSeverity(std::string_view name) {
-    const auto* const found = std::ranges::find(kNames, name);
-    if (found == kNames.end()) return std::nullopt;
-    return static_cast<Severity>(found - kNames.begin());
+    const auto* const found = std::ranges::find(kSeverityNames, name);
+    if (found == kSeverityNames.end()) return std::nullopt;
+    return static_cast<Severity>(found - kSeverityNames.begin());
 }
 
 EventGrade GradeOf(std::uint8_t eventType, std::uint8_t sensorType, std::uint8_t offset) {

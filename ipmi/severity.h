@@ -1,5 +1,7 @@
 #pragma once
 
+#include <array>
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <string_view>
@@ -9,8 +11,11 @@ namespace ipmi {
 /// How bad an event is, from nothing to worst.
 enum class Severity : std::uint8_t { kInformation, kOk, kWarning, kCritical, kFatal };
 
-/// "information", "ok", "warning", "critical", "fatal".
-std::string_view SeverityName(Severity severity);
+inline constexpr std::array<std::string_view, 5> kSeverityNames{"information", "ok", "warning",
+                                                                "critical", "fatal"};
+constexpr std::string_view SeverityName(Severity severity) {
+    return kSeverityNames[static_cast<std::size_t>(severity)];
+}
 std::optional<Severity> ParseSeverity(std::string_view name);
 constexpr bool IsFault(std::optional<Severity> severity) {
     return severity && *severity >= Severity::kWarning;

@@ -5,6 +5,7 @@
 #include <bit>
 #include <numeric>
 
+#include "base/hex.h"
 #include "base/text.h"
 #include "ipmi/id_string.h"
 #include "ipmi/jep106.h"
@@ -215,8 +216,7 @@ std::optional<MemoryModule> ReadSpd(Bytes bytes) {
         module.partNumber.erase(module.partNumber.find_last_not_of(' ') + 1);
     }
     if (const Bytes serial = identity->serialNumber; !IsBlank(serial)) {
-        module.serialNumber =
-            ipmisel::Format("%02X%02X%02X%02X", serial[0], serial[1], serial[2], serial[3]);
+        module.serialNumber = ipmisel::HexText(serial, ipmisel::HexCase::kUpper);
     }
     if (!IsBlank(identity->manufactured)) module.manufactured = ReadDate(identity->manufactured);
     return module;

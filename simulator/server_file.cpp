@@ -6,6 +6,7 @@
 #include <limits>
 #include <string_view>
 
+#include "base/hex.h"
 #include "ipmi/pef.h"
 #include "simulator/strict_json.h"
 
@@ -85,11 +86,10 @@ std::uint8_t FruDevice(const std::string& key, const JsonValue& value) {
 
 /// A key of `factors`: a raw reading.
 std::uint8_t HexKey(const std::string& key, const JsonValue& value, const char* what) {
-    std::size_t digits = 0;
-    const bool isByte =
-        key.size() == 2 && key.find_first_not_of("0123456789abcdefABCDEF") == std::string::npos;
-    if (!isByte) value.Refuse(std::string(what) + " is two hexadecimal digits");
-    return static_cast<std::uint8_t>(std::stoul(key, &digits, 16));
+    const auto bytes = ipmisel::ParseHex(key);
+    if (!bytes || bytes->size() != 1)
+        value.Refuse(std::string(what) + " is two hexadecimal digits");
+    return bytes->front();
 }
 
 /// A key of `sensors`: "NN", or "OWNER/LUN/NN" with the owner in two hexadecimal digits.

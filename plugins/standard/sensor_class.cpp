@@ -72,13 +72,13 @@ constexpr ThresholdName kThresholds[ipmi::kThresholdCount] = {
 constexpr unsigned kStateCount = 15;
 
 std::string_view ThresholdStatus(const ipmi::SensorReading& reading) {
-    std::string_view status = "ok";
+    auto worst = ipmi::Severity::kOk;
     for (unsigned i = 0; i < ipmi::kThresholdCount; ++i) {
         if (!reading.Asserted(i)) continue;
-        if (kThresholds[i].critical) return "critical";
-        status = "warning";
+        worst = std::max(
+            worst, kThresholds[i].critical ? ipmi::Severity::kCritical : ipmi::Severity::kWarning);
     }
-    return status;
+    return ipmi::SeverityName(worst);
 }
 
 std::string_view DiscreteStatus(const ipmi::Sensor& sensor, const ipmi::SensorReading& reading) {
@@ -93,9 +93,10 @@ std::string_view DiscreteStatus(const ipmi::Sensor& sensor, const ipmi::SensorRe
         if (!severity) isGraded = false;
         worst = std::max(worst, severity);
     }
-    if (worst >= ipmi::Severity::kCritical) return "critical";
-    if (worst == ipmi::Severity::kWarning) return "warning";
-    return isGraded ? "ok" : "";
+    if (ipmi::IsFault(worst)) {
+        return ipmi::SeverityName(std::min(*worst, ipmi::Severity::kCritical));
+    }
+    return isGraded ? ipmi::SeverityName(ipmi::Severity::kOk) : "";
 }
 
 void WriteRecord(Output& output, const ipmi::Sensor& sensor) {

@@ -79,7 +79,7 @@ std::vector<SystemSummary> Stored(const std::string& uri, const std::vector<std:
         const auto place = index.find(stored.system);
         if (stored.acknowledged || place == index.end()) continue;
         Finding finding;
-        finding.severity = SeverityNamed(stored.severity);
+        finding.severity = ParseSeverity(stored.severity);
         finding.title = stored.title;
         finding.part = stored.part;
         finding.partNumber = stored.partNumber;

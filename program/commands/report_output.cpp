@@ -34,7 +34,7 @@ private:
 
 EventWish WishOf(const ReportOptions& options) {
     EventWish wish;
-    if (options.severity) wish.severity = SeverityNamed(*options.severity);
+    if (options.severity) wish.severity = ParseSeverity(*options.severity);
     wish.last = options.last;
     if (options.since) {
         const auto now = std::chrono::system_clock::now().time_since_epoch();

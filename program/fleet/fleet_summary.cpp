@@ -133,7 +133,7 @@ std::string FleetVerdict(const std::vector<SystemSummary>& systems) {
     }
     Texts counts;
     for (const auto& [severity, count] : bySeverity) {
-        counts.push_back(std::to_string(count) + " " + SeverityName(severity));
+        counts.push_back(std::to_string(count) + " " + std::string(ipmi::SeverityName(severity)));
     }
     const auto add = [&counts](std::size_t count, const char* what) {
         if (count > 0) counts.push_back(std::to_string(count) + what);

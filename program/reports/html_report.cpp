@@ -554,7 +554,7 @@ private:
     void WriteSensors() {
         std::string rows;
         for (const Sensor& s : machine_.sensors) {
-            const std::optional<Severity> severity = SeverityNamed(s.status);
+            const std::optional<Severity> severity = ParseSeverity(s.status);
             const std::string reading =
                 s.reading ? NumberText(*s.reading) + (s.unit.empty() ? "" : " " + s.unit) : "";
             rows +=

@@ -1,13 +1,14 @@
 #pragma once
 
-#include <optional>
 #include <span>
 #include <string_view>
 
+#include "ipmi/severity.h"
+
 namespace ipmisel {
 
-/// How bad an event is; worse is greater.
-enum class Severity { kInformation, kOk, kWarning, kCritical, kFatal };
+using ipmi::ParseSeverity;
+using ipmi::Severity;
 
 /// A severity on the scales of others.
 struct SeverityInfo {
@@ -22,7 +23,5 @@ struct SeverityInfo {
 /// From the least to the worst.
 std::span<const SeverityInfo> Severities();
 const SeverityInfo& InfoOf(Severity severity);
-/// By name; empty for any other text.
-std::optional<Severity> SeverityNamed(std::string_view name);
 
 }  // namespace ipmisel

@@ -2,6 +2,7 @@
 #include <map>
 #include <memory>
 
+#include "base/bytes.h"
 #include "base/text.h"
 #include "program/reports/report.h"
 #include "program/reports/systems.h"
@@ -23,8 +24,8 @@ constexpr std::size_t kNarrow = 100;
 
 std::string ShownValue(const std::string& text) { return text; }
 std::string ShownValue(const std::vector<std::uint8_t>& bytes) {
-    std::string text;
-    for (const std::uint8_t byte : bytes) text += Format(text.empty() ? "%02x" : " %02x", byte);
+    std::string text = DumpBytes(bytes, Digits::kLowerHex);
+    if (!text.empty()) text.pop_back();
     return text;
 }
 std::string ShownValue(const NQORTQR20::ObjectPath& path) {
@@ -277,7 +278,7 @@ private:
         for (const Sensor& s : machine_.sensors) {
             if (IndexOf(s.node) != index) continue;
             ++byStatus[s.status];
-            const std::optional<Severity> severity = SeverityNamed(s.status);
+            const std::optional<Severity> severity = ParseSeverity(s.status);
             if (!IsNamed(kSensorClass) && severity.value_or(Severity::kOk) <= Severity::kOk)
                 continue;
             TextTable::Row row{{}, severity, {}};

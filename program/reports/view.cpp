@@ -6,6 +6,8 @@
 #include <type_traits>
 #include <variant>
 
+#include "base/hex.h"
+
 namespace ipmisel {
 namespace {
 
@@ -194,7 +196,7 @@ void Assign(const PropertyValue& value, Texts* member) {
     if (const auto* texts = std::get_if<Texts>(&value)) *member = *texts;
 }
 void Assign(const PropertyValue& value, std::optional<Severity>* member) {
-    if (const auto* text = std::get_if<std::string>(&value)) *member = SeverityNamed(*text);
+    if (const auto* text = std::get_if<std::string>(&value)) *member = ParseSeverity(*text);
 }
 
 /// Properties come nearly in the order of the fields: the search goes on from the last one found.
@@ -271,15 +273,11 @@ MaybeTime ParseTime(std::string_view text) {
 }
 
 std::optional<std::array<std::uint8_t, 16>> Event::Record() const {
-    std::array<std::uint8_t, 16> bytes{};
-    if (raw.size() != 2 * bytes.size()) return std::nullopt;
-    for (std::size_t i = 0; i < bytes.size(); ++i) {
-        const char* const digits = raw.data() + 2 * i;
-        if (std::from_chars(digits, digits + 2, bytes[i], 16).ptr != digits + 2) {
-            return std::nullopt;
-        }
-    }
-    return bytes;
+    std::array<std::uint8_t, 16> record{};
+    const auto bytes = ParseHex(raw);
+    if (!bytes || bytes->size() != record.size()) return std::nullopt;
+    std::copy(bytes->begin(), bytes->end(), record.begin());
+    return record;
 }
 
 Controller ControllerOf(const Instance& instance) { return Read(instance, kController); }

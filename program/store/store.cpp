@@ -345,8 +345,8 @@ private:
             // Of a log that was read in part the last event known here need not be the last.
             const bool anew =
                 last != found->lastEvent && (visit_.complete || has(found->lastEvent));
-            const auto now = SeverityNamed(finding.severity);
-            const auto before = SeverityNamed(found->severity);
+            const auto now = ParseSeverity(finding.severity);
+            const auto before = ParseSeverity(found->severity);
             const bool worse = now && (!before || *now > *before);
             if (found->acknowledged && (anew || worse)) {
                 db_.Query("UPDATE findings SET acknowledged = NULL WHERE id = $1", found->id);

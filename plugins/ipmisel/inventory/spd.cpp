@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <string_view>
 
-#include "base/text.h"
+#include "base/hex.h"
 #include "plugins/ipmisel/inventory/vpd_entry.h"
 #include "plugins/ipmisel/log.h"
 
@@ -29,7 +29,7 @@ std::string Trimmed(Bytes field) {
 /// Of zeros alone it has not been programmed, or not been read.
 std::string SerialNumber(Bytes field) {
     if (std::count(field.begin(), field.end(), 0) == std::ssize(field)) return kNotAvailable;
-    return Format("%02X%02X%02X%02X", field[0], field[1], field[2], field[3]);
+    return HexText(field, HexCase::kUpper);
 }
 
 std::string Vendor(std::string_view vendor) {

@@ -204,10 +204,10 @@ TEST(Wording, SaysHowAClockGoes) {
 }
 
 TEST(Severities, AreOrderedAndNamedOnce) {
-    EXPECT_EQ(ipmisel::SeverityNamed("fatal"), ipmisel::Severity::kFatal);
-    EXPECT_EQ(ipmisel::SeverityNamed("Fatal"), std::nullopt);
+    EXPECT_EQ(ipmisel::ParseSeverity("fatal"), ipmisel::Severity::kFatal);
+    EXPECT_EQ(ipmisel::ParseSeverity("Fatal"), std::nullopt);
     for (const auto& info : ipmisel::Severities()) {
-        EXPECT_EQ(ipmisel::SeverityNamed(info.name), info.severity);
+        EXPECT_EQ(ipmisel::ParseSeverity(info.name), info.severity);
         EXPECT_LE(info.shortName.size(), 8U);
     }
 }
