@@ -31,6 +31,35 @@ install_packages() {
         apt-get -qq install --no-install-recommends -y "${missing[@]}" >/dev/null
 }
 
+# bare_debian FOLDER [ARCHITECTURE]: a Debian 12 with nothing installed, made once and kept as an archive
+# beside it; takes the network from this machine: its resolver, its proxy, its settings of apt.
+bare_debian() {
+    local folder=$1 architecture=${2:-$(dpkg --print-architecture)} archive
+    archive=$(dirname "$folder")/bookworm-$architecture.tar
+    rm -rf "$folder"
+    mkdir -p "$folder"
+    if [ ! -e "$archive" ]; then
+        debootstrap --arch="$architecture" --variant=minbase bookworm "$folder" >"$archive.log" || return 1
+        tar -C "$folder" -cf "$archive.new" . && mv "$archive.new" "$archive" || return 1
+    else
+        tar -C "$folder" -xf "$archive" || return 1
+    fi
+    cp /etc/resolv.conf "$folder/etc/"
+    apt-config dump | grep -E '^Acquire::(http|https|Check)' >"$folder/etc/apt/apt.conf.d/50host" || true
+    echo 'Dpkg::Use-Pty "0";' >>"$folder/etc/apt/apt.conf.d/50host"
+    # dpkg is to leave the disk to itself: nobody keeps this one.
+    echo force-unsafe-io >"$folder/etc/dpkg/dpkg.cfg.d/unsafe-io"
+    inside "$folder" apt-get -qq update
+}
+# inside FOLDER COMMAND...: runs it in there, with processes of its own that end with it.
+inside() {
+    local folder=$1
+    shift
+    unshare --mount --pid --fork --kill-child --mount-proc="$folder/proc" -- env -i ${http_proxy:+http_proxy="$http_proxy"} \
+        ${https_proxy:+https_proxy="$https_proxy"} PATH=/usr/sbin:/usr/bin:/sbin:/bin LANG=C.UTF-8 HOME=/root \
+        DEBIAN_FRONTEND=noninteractive chroot "$folder" "$@"
+}
+
 # What the build needs, its tests need on top, and the tests that compare with other people's programs.
 build_packages=(g++ cmake ninja-build pkg-config libssl-dev libcli11-dev nlohmann-json3-dev
                 libpq-dev libsqlite3-dev)
@@ -38,3 +67,4 @@ test_packages=(googletest libfreeipmi-dev openipmi python3)
 peer_packages=(ipmitool freeipmi-tools file fish zsh jq sqlite3 postgresql python3-jsonschema python3-pyghmi prometheus prometheus-node-exporter
                rsyslog tidy chromium)
 package_packages=(debhelper dh-python fakeroot help2man lintian lowdown)
+package_test_packages=(autopkgtest debootstrap python3)
