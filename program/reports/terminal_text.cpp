@@ -109,6 +109,11 @@ std::string Fit(std::string_view text, std::size_t width) {
 
 void SayFor(const std::string& name) { gSaidFor = TerminalText(name) + ": "; }
 
+void SayOf(const std::string& name, std::string_view text) {
+    const std::string before = TerminalText(name) + ": ";
+    Say((before == gSaidFor ? "" : before) + std::string(text));
+}
+
 void Say(std::string_view text) {
     const std::string line = "ipmisel: " + gSaidFor + TerminalText(text) + "\n";
     HideProgress();

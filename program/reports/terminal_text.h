@@ -34,5 +34,7 @@ std::string Fit(std::string_view text, std::size_t width);
 void Say(std::string_view text);
 /// From now on Say puts a name before each text.
 void SayFor(const std::string& name);
+/// With a name before the text, which is not said twice.
+void SayOf(const std::string& name, std::string_view text);
 
 }  // namespace ipmisel

@@ -102,7 +102,7 @@ private:
         std::int64_t position;
     };
 
-    void Tell(const std::string& text) { lines_.push_back(visit_.name + ": " + text); }
+    void Tell(const std::string& text) { lines_.push_back(text); }
 
     /// Without its GUID a controller would be taken for another one, and its events for others.
     bool HasIdentity() const {
@@ -469,12 +469,16 @@ private:
 
     void TellOfGuid() {
         if (visit_.guid.empty()) return;
-        for (const SqlRow& row : db_.Query("SELECT name FROM systems WHERE guid = $1 AND name <> $2"
-                                           " AND gone IS NULL ORDER BY name",
-                                           SqlText(visit_.guid), SqlText(visit_.name))) {
-            Tell("its GUID " + visit_.guid + " is claimed by " + TextOf(row.at(0)) +
-                 " too; the two are kept apart by their names");
-        }
+        const auto rows = db_.Query(
+            "SELECT COUNT(*), MIN(name) FROM systems WHERE guid = $1 AND name <> $2"
+            " AND gone IS NULL",
+            SqlText(visit_.guid), SqlText(visit_.name));
+        const auto others = static_cast<std::size_t>(IntegerOf(rows.at(0).at(0)));
+        if (others == 0) return;
+        // Some manufacturers give the same one to all.
+        Tell("its GUID " + visit_.guid + " is claimed by " + TextOf(rows[0].at(1)) +
+             (others == 1 ? "" : " and " + Counted(others - 1, "other")) +
+             " too; they are kept apart by their names");
     }
 
     Database& db_;

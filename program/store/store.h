@@ -113,7 +113,7 @@ public:
 
     /// Stores a visit in one transaction. `before` is what Find gave when the visit began. What is
     /// to be told of it (log cleared, another controller, a GUID claimed twice) is returned, a line
-    /// each.
+    /// each without the name.
     std::vector<std::string> Add(const Visit& visit, const std::optional<StoredSystem>& before);
     /// Stores that a controller was found as it was.
     void AddUnchanged(const StoredSystem& system, std::int64_t started, std::int64_t finished);

@@ -251,7 +251,7 @@ void StoredCollection::Finish(const ReportEnd& end, std::vector<NQORTQR20::NodeR
                                        "\n" + finding.part);
             }
         }
-        for (const std::string& line : store.Add(visit, before_[node])) Say(line);
+        for (const std::string& line : store.Add(visit, before_[node])) SayOf(visit.name, line);
     }
 }
 
