@@ -52,13 +52,8 @@ TEST(SelfTest, EveryResultHasWords) {
 
 TEST(SdrRepositoryInfo, IsReadWholeOrNotAtAll) {
     const Bytes answer{0x51, 0x02, 0x01, 0x04, 0x03, 1, 2, 3, 4, 5, 6, 7, 8, 0x22};
-    const auto info = SdrRepositoryInfo::Parse(answer).value();
-    EXPECT_EQ(info.version, 0x51);
-    EXPECT_EQ(info.records, 0x0102);
-    EXPECT_EQ(info.freeBytes, 0x0304);
-    EXPECT_EQ(info.lastAddition, 0x04030201u);
-    EXPECT_EQ(info.lastErase, 0x08070605u);
-    EXPECT_EQ(info.operations, 0x22);
+    EXPECT_EQ(SdrRepositoryInfo::Parse(answer),
+              (SdrRepositoryInfo{0x51, 0x0102, 0x0304, 0x04030201, 0x08070605, 0x22}));
     EXPECT_FALSE(SdrRepositoryInfo::Parse(std::span(answer).first(13)).has_value());
 }
 

@@ -14,10 +14,7 @@ TEST(IdString, AllFourEncodingsGiveUtf8) {
         const char* text;
     } cases[] = {
         {0xC3, {'F', 'a', 'n', 'X'}, "Fan"},
-        {0xC3,
-         {'T', 0xB0, 'C'},
-         "T\xC2\xB0"
-         "C"},
+        {0xC3, {'T', 0xB0, 'C'}, "T\u00B0C"},
         {0xC1, {'A'}, "A"},  // one character is a name, not an end mark
         {0xDF, {'b', 'o', 't', 'h'}, "both"},
         {0xC6, {'U', 'p', 0, 'x', 'y', 'z'}, "Up"},
@@ -34,10 +31,7 @@ TEST(IdString, AllFourEncodingsGiveUtf8) {
         {0x45, {0x01}, "01"},
         {0x03, {'1', 0, 0xE9, 0, 0xAC, 0x20, 'x', 0}, "1\xC3\xA9\xE2\x82\xAC"},
         {0x02, {0x3D, 0xD8, 0x25, 0xDD}, "\xF0\x9F\x94\xA5"},
-        {0x02,
-         {0x3D, 0xD8, 'A', 0},
-         "\xEF\xBF\xBD"
-         "A"},
+        {0x02, {0x3D, 0xD8, 'A', 0}, "\uFFFDA"},
         {0x03, {'A', 0, 'B'}, "A"},
         {0x02, {'A', 0, 0, 0}, "A"},
         {0x00, {'A', 0}, ""},

@@ -78,8 +78,7 @@ TEST(Reading, EveryLinearizationIsAppliedToTheScaledValue) {
 TEST(Reading, WhatIsNoNumberHasNoValue) {
     const struct {
         std::uint8_t function;
-        int m;
-        int resultExponent;
+        int m, resultExponent;
         std::uint8_t raw;
     } cases[] = {
         {0x01, 1, 0, 0},    {0x02, 1, 0, 0xFF}, {0x03, 1, 0, 0}, {0x04, 500, 2, 100},
@@ -110,15 +109,13 @@ TEST(Reading, FactorsAreSignedAndSplitOverTheirBytes) {
     // M = -2 (3FEh), tolerance 21; B = 341 (155h), accuracy 2B5h = 693 with exponent 2; K2 -3,
     // K1 5.
     const std::vector<std::uint8_t> bytes{0xFE, 0xD5, 0x55, 0x75, 0xA8, 0xD5};
-    const auto f = ReadingFactors::Parse(bytes);
-    ASSERT_TRUE(f.has_value());
-    EXPECT_EQ(f->m, -2);
-    EXPECT_EQ(f->toleranceHalfCounts, 21u);
-    EXPECT_EQ(f->b, 341);
-    EXPECT_EQ(f->accuracy, 693u);
-    EXPECT_EQ(f->accuracyExponent, 2u);
-    EXPECT_EQ(f->resultExponent, -3);
-    EXPECT_EQ(f->bExponent, 5);
+    EXPECT_EQ(ReadingFactors::Parse(bytes), (ReadingFactors{.m = -2,
+                                                            .b = 341,
+                                                            .bExponent = 5,
+                                                            .resultExponent = -3,
+                                                            .toleranceHalfCounts = 21,
+                                                            .accuracy = 693,
+                                                            .accuracyExponent = 2}));
     EXPECT_EQ(ReadingFactors::Parse(std::span(bytes).first(5)), std::nullopt);
 }
 

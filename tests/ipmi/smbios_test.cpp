@@ -80,20 +80,10 @@ TEST(Smbios, ReadsAMemoryDevice) {
 }
 
 TEST(Smbios, ReadsAProcessorAndASlot) {
-    Bytes formatted(0x2A - 4);
-    formatted[0] = 1;
-    formatted[3] = 2;
-    formatted[0x10 - 4] = 3;
-    formatted[0x20 - 4] = 4;
-    formatted[0x22 - 4] = 5;
-    Bytes structure{4, 0x2A, 0, 0};
-    structure.insert(structure.end(), formatted.begin(), formatted.end());
-    for (const std::string_view text : {"CPU1", "Acme", "Model 7", "PS1", "PP1"}) {
-        structure.insert(structure.end(), text.begin(), text.end());
-        structure.push_back(0);
-    }
-    structure.push_back(0);
-    const auto processor = ReadSmbiosProcessor(structure);
+    const auto processor = ReadSmbiosProcessor(
+        SmbiosStructure(4, {1, 0, 0, 2, 0, 0, 0, 0, 0, 0, 0, 0, 3, 0, 0, 0, 0, 0, 0,
+                            0, 0, 0, 0, 0, 0, 0, 0, 0, 4, 0, 5, 0, 0, 0, 0, 0, 0, 0},
+                        {"CPU1", "Acme", "Model 7", "PS1", "PP1"}));
     ASSERT_TRUE(processor);
     EXPECT_EQ(processor->socket, "CPU1");
     EXPECT_EQ(processor->manufacturer, "Acme");

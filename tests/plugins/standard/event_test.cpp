@@ -37,8 +37,7 @@ TEST(EventText, IsOneForEveryKindOfRecord) {
         .Record(0x03, {1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13})
         .Record(0xC0, {1, 2, 3, 0x69, 0x3A, 0xCD, 0x00, 0xC0, 0xBF, 0x00, 0x3B, 0xFD, 0x00});
     const struct {
-        const char* sentence;
-        const char* vendorData;
+        const char *sentence, *vendorData;
     } expected[] = {
         {"Memory sensor 80h: correctable memory error (ECC or other), memory module 4", ""},
         {"Power Supply sensor 71h: no longer: power supply input lost (AC/DC)", ""},

@@ -4,6 +4,7 @@
 
 #include "tests/support/bmc_fixture.h"
 #include "tests/support/fru_image.h"
+#include "tests/support/fru_inventory.h"
 #include "tests/support/spd_image.h"
 
 namespace standard {
@@ -12,27 +13,15 @@ namespace {
 using namespace ::testing;
 using namespace ipmiseltest;
 
-/// A FRU device locator (IPMI 2.0, table 43-7) of a logical device.
+/// A FRU device locator of a logical device.
 ipmi::SdrRecord Locator(std::uint8_t device, std::uint8_t entity, std::uint8_t instance,
                         std::string_view name, std::uint8_t address = 0x20,
                         std::uint8_t access = 0x80) {
-    std::vector<std::uint8_t> bytes{0x01,
-                                    0x00,
-                                    0x51,
-                                    0x11,
-                                    static_cast<std::uint8_t>(11 + name.size()),
-                                    address,
-                                    device,
-                                    access,
-                                    0x00,
-                                    0x00,
-                                    0x10,
-                                    0x00,
-                                    entity,
-                                    instance,
-                                    0x00,
-                                    static_cast<std::uint8_t>(0xC0 | name.size())};
-    bytes.insert(bytes.end(), name.begin(), name.end());
+    std::vector<std::uint8_t> bytes = FruLocator(1, device, name);
+    bytes[5] = address;
+    bytes[7] = access;
+    bytes[12] = entity;
+    bytes[13] = instance;
     return *ipmi::SdrRecord::Parse(bytes);
 }
 

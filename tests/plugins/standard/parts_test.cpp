@@ -21,17 +21,9 @@ constexpr std::uint32_t kTime = 1773000000;  // 2026-03-08
 /// A compact record of a sensor that the BMC owns.
 ipmi::SdrRecord SensorRecord(std::uint8_t number, std::uint8_t entity, std::uint8_t instance,
                              std::uint8_t type, std::uint8_t owner = 0x20) {
-    std::vector<std::uint8_t> bytes(32);
-    bytes[0] = number;
-    bytes[2] = 0x51;
-    bytes[3] = 0x02;
-    bytes[4] = 27;
-    bytes[5] = owner;
-    bytes[7] = number;
-    bytes[8] = entity;
-    bytes[9] = instance;
-    bytes[12] = type;
-    bytes[13] = 0x6F;
+    std::vector<std::uint8_t> bytes{number, 0,      0x51,     2, 27, owner, 0,
+                                    number, entity, instance, 0, 0,  type,  0x6F};
+    bytes.resize(32);
     bytes[23] = 1;
     bytes[31] = 0xC0;
     return *ipmi::SdrRecord::Parse(bytes);
@@ -67,6 +59,11 @@ ipmi::SmbiosMemoryDevice Module(std::string slot, std::string serial, std::uint3
         device.partNumber = "M16G";
     }
     return device;
+}
+
+/// How such a module is told of.
+std::string Whole(const std::string& slot, const std::string& serial) {
+    return slot + ", part number M16G, serial number " + serial;
 }
 
 class PartsTest : public Test {
@@ -174,39 +171,23 @@ TEST_F(PartsTest, AMemoryModuleIsFoundByTheLabelThatEndsInItsNumber) {
         std::vector<std::string> parts;
         bool certain;
     } cases[] = {
-        {{Module("DIMM_1", "S1"), Module("DIMM_2", "S2")},
-         2,
-         {"DIMM_2, part number M16G, serial number S2"},
-         true},
-        {{Module("DIMM_12", "S1"), Module("DIMM 02", "S2")},
-         2,
-         {"DIMM 02, part number M16G, serial number S2"},
-         true},
+        {{Module("DIMM_1", "S1"), Module("DIMM_2", "S2")}, 2, {Whole("DIMM_2", "S2")}, true},
+        {{Module("DIMM_12", "S1"), Module("DIMM 02", "S2")}, 2, {Whole("DIMM 02", "S2")}, true},
         // Two labels end in 1: counted from 1 the first, from 0 the second.
         {{Module("A1", "S1"), Module("B1", "S2"), Module("A2", "S3")},
          1,
-         {"A1, part number M16G, serial number S1", "B1, part number M16G, serial number S2"},
+         {Whole("A1", "S1"), Whole("B1", "S2")},
          false},
         // No label ends in a number; an empty slot has no module to fail.
-        {{Module("A", "S1"), Module("B", "", 0)},
-         1,
-         {"A, part number M16G, serial number S1"},
-         false},
-        {{Module("A", "S1"), Module("B", "S2")},
-         2,
-         {"B, part number M16G, serial number S2"},
-         false},
+        {{Module("A", "S1"), Module("B", "", 0)}, 1, {Whole("A", "S1")}, false},
+        {{Module("A", "S1"), Module("B", "S2")}, 2, {Whole("B", "S2")}, false},
         {{Module("A", "S1"), Module("B", "S2")}, 7, {"Memory Module 7"}, false},
         {{}, 4, {"Memory Module 4"}, false},
         // One module, told of twice; and two that are said to be in one slot.
-        {{Module("DIMM_3", "S1"), Module("DIMM_3", "S1")},
-         3,
-         {"DIMM_3, part number M16G, serial number S1"},
-         true},
+        {{Module("DIMM_3", "S1"), Module("DIMM_3", "S1")}, 3, {Whole("DIMM_3", "S1")}, true},
         {{Module("DIMM_3", "S1"), Module("DIMM_3", "S2")},
          3,
-         {"DIMM_3, part number M16G, serial number S1",
-          "DIMM_3, part number M16G, serial number S2"},
+         {Whole("DIMM_3", "S1"), Whole("DIMM_3", "S2")},
          false},
     };
     for (const auto& c : cases) {
@@ -243,7 +224,7 @@ TEST_F(PartsTest, EntitiesAreFoundInSmbiosWhereBothCountAlike) {
     Sensors({SensorRecord(1, 0x03, 2, 0x07), SensorRecord(2, kModule, 1, kMemorySensor)});
     EXPECT_THAT(Texts(OfSensor(0)), ElementsAre("CPU2, serial number C2"));
     EXPECT_FALSE(OfSensor(0).certain);
-    EXPECT_THAT(Texts(OfSensor(1)), ElementsAre("DIMM_1, part number M16G, serial number S1"));
+    EXPECT_THAT(Texts(OfSensor(1)), ElementsAre(Whole("DIMM_1", "S1")));
     // The controller counts from 0.
     Sensors({SensorRecord(1, 0x03, 2, 0x07), SensorRecord(3, 0x03, 0, 0x07)});
     EXPECT_THAT(Texts(OfSensor(0)), ElementsAre("Processor 2"));
@@ -264,7 +245,7 @@ TEST_F(PartsTest, ASlotIsFoundByItsLabelAndByItsAddress) {
     } cases[] = {{0x09, 2, {"PCIe Slot 2"}},
                  {0x00, 9, {"Riser"}},
                  {0x09, 3, {}},
-                 {0x07, 2, {"DIMM_2, part number M16G, serial number S2"}}};
+                 {0x07, 2, {Whole("DIMM_2", "S2")}}};
     for (const auto& c : cases) {
         node.log.clear();
         Event(kSlotSensor, 0x0C, 0x6F, 0xF0, c.type, c.number);
@@ -334,7 +315,7 @@ TEST_F(PartsTest, OneModuleTakenOutIsNotTheOthers) {
     facts.smbios.memoryDevices = {Module("DIMM_1", "S1"), Module("DIMM_2", "S2")};
     for (const std::uint8_t module : {1, 2}) Event(kMemorySensor, 9, 0x6F, 0x30, 0xFF, module);
     Event(kMemorySensor, 9, 0xEF, 0x36, 0xFF, 2);
-    EXPECT_THAT(Texts(OfEvent(0)), ElementsAre("DIMM_1, part number M16G, serial number S1"));
+    EXPECT_THAT(Texts(OfEvent(0)), ElementsAre(Whole("DIMM_1", "S1")));
     EXPECT_THAT(Texts(OfEvent(1)), ElementsAre("DIMM_2"));
 }
 
@@ -354,8 +335,7 @@ TEST_F(PartsTest, AModuleIsTakenOutByWhateverSensorTellsOfIt) {
         node.log.clear();
         Event(kMemorySensor, 0x80, 0x6F, 0x30, 0xFF, 2, 0x01);  // by the firmware
         Event(c.type, c.sensor, c.direction, c.data1, c.data2, c.data3);
-        EXPECT_THAT(Texts(OfEvent()),
-                    ElementsAre(c.gone ? "DIMM_2" : "DIMM_2, part number M16G, serial number S2"))
+        EXPECT_THAT(Texts(OfEvent()), ElementsAre(c.gone ? "DIMM_2" : Whole("DIMM_2", "S2")))
             << int{c.sensor} << " " << int{c.data3};
     }
 }

@@ -19,8 +19,7 @@ std::string SeverityBy(const std::string& rules, bool deasserted = false) {
 
 TEST(SeverityRules, TheFirstWhoseConditionsAllHoldGivesTheSeverity) {
     const struct {
-        const char* rules;
-        const char* severity;
+        const char *rules, *severity;
     } cases[] = {
         {"", "not the user's"},
         {"# nothing\n\n   \n", "not the user's"},
@@ -53,8 +52,7 @@ TEST(SeverityRules, HoldForADeassertionOnlyWhenTheySaySo) {
 
 TEST(SeverityRules, ABadLineIsRefusedWithItsNumber) {
     const struct {
-        const char* line;
-        const char* problem;
+        const char *line, *problem;
     } cases[] = {
         {"bad offset=1",
          "\"bad\" is no severity: information, ok, warning, critical, fatal or none"},
