@@ -87,9 +87,7 @@ TEST(StringCch, NoBufferIsNoWork) {
 TEST(GetString, FirstStringWithoutAndLaterOnesWithTheirNul) {
     const unsigned char block[] = {'A', 'B', 0, 'C', 'D', 0, 0};
     const struct {
-        int length;
-        int index;
-        int result;
+        int length, index, result;
         std::string out;  // over a buffer of '#'
     } cases[] = {{7, 1, 1, "AB##"},
                  {7, 2, 1, std::string("CD\0#", 4)},

@@ -23,30 +23,20 @@ TEST_F(Collecting, TheJsonReportHoldsEveryPropertyInTheOrderWritten) {
     const Ended ended = Collect(source, {"--format", "json", "--class", "QORSG_IPMILogRecord"});
     EXPECT_EQ(ended.exitStatus, 0);
     const Json expected = Json::parse(R"({
-        "format": "ipmisel/1",
-        "source": "",
-        "machine_type": "SIM-T",
-        "collected": "2024-03-05T11:00:00Z",
-        "complete": true,
-        "systems": [{"name": "server"}],
+        "format": "ipmisel/1", "source": "", "machine_type": "SIM-T",
+        "collected": "2024-03-05T11:00:00Z", "complete": true, "systems": [{"name": "server"}],
         "plugin": {"name": "IPMISEL", "version": "1.0", "interface": "1.0"},
         "status": {"code": 0, "text": "Success"},
         "instances": [{"class": "QORSG_IPMILogRecord", "properties": {
-            "CreationClassName": "QORSG_IPMILog",
-            "LogCreationClassName": "QORSG_IPMILog",
-            "LogName": "IPMILogEntry",
-            "RecordID": "1",
+            "CreationClassName": "QORSG_IPMILog", "LogCreationClassName": "QORSG_IPMILog",
+            "LogName": "IPMILogEntry", "RecordID": "1",
             "MessageTimestamp": "20240305092816.000000+060",
             "CreationTimeStamp": "20240305092816.000000+060",
             "Source": "16 (address). LUN 0. Channel 0.",
-            "SensorType": "Temperature",
-            "EventType": "Assertion, Threshold.",
-            "Entity": "Processor",
-            "EntityInstance": "1",
-            "SensorInformation": "CPU1 Temp",
+            "SensorType": "Temperature", "EventType": "Assertion, Threshold.",
+            "Entity": "Processor", "EntityInstance": "1", "SensorInformation": "CPU1 Temp",
             "Message": "Processor 1 (Temperature - CPU1 Temp): Assertion: Rose above the upper critical limit. \n               Trigger threshold value: 69 degrees C. \n               Trigger reading: 80 degrees C.",
-            "AuxLog": "No Extended Data",
-            "SourceNode": "1",
+            "AuxLog": "No Extended Data", "SourceNode": "1",
             "RawData": [1, 0, 2, 176, 229, 230, 101, 32, 0, 4, 1, 48, 1, 89, 80, 69]}}],
         "notices": [],
         "completeness": [{"node": 1, "source": "",
@@ -270,10 +260,8 @@ TEST_F(Collecting, ANoticeIsToldAndKept) {
 
 TEST_F(Collecting, WhatWentWrongShowsInExitStatusReportAndOneLine) {
     const struct {
-        const char* what;
-        const char* fault;
-        int exitStatus;
-        int statusCode;
+        const char *what, *fault;
+        int exitStatus, statusCode;
         const char* line;
     } cases[] = {
         {"no log", R"({"netfn": "0a", "command": "40", "no_response": true})", 1, 3,

@@ -97,8 +97,7 @@ TEST_F(ConfigurationTest, ACommandsOwnSectionGoesBeforeWhatIsForAll) {
 
 TEST_F(ConfigurationTest, ALineThatCannotHoldIsRefusedWithItsFile) {
     const struct {
-        const char* text;
-        const char* problem;
+        const char *text, *problem;
     } cases[] = {
         {"usre = x\n", "no command has an option \"usre\""},
         {"[collect]\nevery = 60\n", "collect has no option \"every\""},

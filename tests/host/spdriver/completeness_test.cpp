@@ -15,7 +15,6 @@ protected:
     void Send(ipmi::CommandCode command, const std::vector<std::uint8_t>& data = {}) {
         Ask(ipmi::MakeCommand(command, data));
     }
-    /// Any other command.
     void Ask(const ipmi::Command& command) {
         std::array<unsigned char, 256> buffer{};
         NQORTQR20::frame::LayOutRequest(buffer, command.netFn, command.lun, command.command,

@@ -1,8 +1,5 @@
 #include <gmock/gmock.h>
 
-#include <chrono>
-#include <functional>
-
 #include "host/spdriver/source.h"
 #include "tests/support/ipmi_sim.h"
 
@@ -39,24 +36,11 @@ protected:
         }
         return "";
     }
-    struct Change {
-        std::function<void(SourceOptions*)> change;
-        const char* reason;
-    };
-    void ExpectRefusals(const std::string& place, const std::vector<Change>& cases) {
-        const SourceOptions good = options;
-        for (const Change& c : cases) {
-            c.change(&options);
-            EXPECT_THAT(Refusal(place), HasSubstr(c.reason));
-            options = good;
-        }
-    }
 };
 
 TEST_F(Lan, APlaceThatCannotBeIsRefusedAtOnce) {
     const struct {
-        const char* place;
-        const char* reason;
+        const char *place, *reason;
     } cases[] = {{":623", "no host is named"},
                  {"host:", "the port is no number from 1 to 65535"},
                  {"host:65536", "the port is no number from 1 to 65535"},
@@ -70,36 +54,16 @@ TEST_F(Lan, APlaceThatCannotBeIsRefusedAtOnce) {
     EXPECT_EQ(passwordsAsked, 0u);
 }
 
-TEST_F(Lan, AccessThatCannotBeIsRefusedAtOnce) {
-    ExpectRefusals(
-        "127.0.0.1",
-        {{[](auto* o) { o->cipherSuite = 4; }, "cipher suite 4 is not supported; use 17 or 3"},
-         {[](auto* o) { o->password = [] { return std::string(21, 'p'); }; },
-          "password is longer than the 20 bytes"}});
+TEST_F(Lan, APasswordThatNoBmcTakesIsRefusedAtOnce) {
+    options.password = [] { return std::string(21, 'p'); };
+    EXPECT_THAT(Refusal("127.0.0.1"), HasSubstr("password is longer than the 20 bytes"));
 }
 
-TEST_F(Lan, ANameThatDoesNotResolveAndSilenceAreTold) {
-    EXPECT_THAT(Refusal("no-such-host.invalid"),
-                StartsWith("lan:no-such-host.invalid: the host name does not resolve"));
-    options.timeoutSeconds = 0.5;
-    const auto before = std::chrono::steady_clock::now();
-    const std::string place = "127.0.0.1:" + std::to_string(ipmiseltest::FreeUdpPort());
-    EXPECT_THAT(Refusal(place),
-                StartsWith("lan:" + place + ": nobody listens there, or a firewall refuses"));
-    EXPECT_LT(std::chrono::steady_clock::now() - before, std::chrono::seconds(5));
-}
-
-TEST_F(Lan, WhatFailsAtTheLogInIsToldApart) {
+TEST_F(Lan, ThePasswordIsAskedForOnceForAllBmcs) {
     if (!IpmiSim::Missing().empty()) GTEST_SKIP() << IpmiSim::Missing();
     IpmiSim sim({});
-    ExpectRefusals(
-        sim.Place(),
-        {{[](auto* o) { o->password = [] { return std::string("wrong"); }; }, "wrong password"},
-         {[](auto* o) { o->user = "nobody"; }, "does not know the user name"},
-         {[](auto* o) { o->cipherSuite = 17; }, "the BMC"}});
     options.cipherSuite = 3;
     options.workarounds.clear();  // the privilege is named in Open Session, so it is granted there
-    passwordsAsked = 0;
     EXPECT_EQ(OpenSources({"lan:" + sim.Place(), "lan:" + sim.Place()}, options).nodes.size(), 2u);
     EXPECT_EQ(passwordsAsked, 1u);
 }

@@ -63,6 +63,16 @@ protected:
         }
         return sensors;
     }
+    /// Three sensor records are given whole, and the controller is not asked again.
+    void ExpectRecordsInMemory() {
+        asked.clear();
+        for (std::uint16_t id = 1; id <= 3; ++id) {
+            const Answer record = Ask(ipmi::GetSdr(id));
+            ASSERT_TRUE(record);
+            EXPECT_EQ(ipmisim::Bytes(record->begin() + 3, record->end()), bmc.sdrRecords[id - 1]);
+        }
+        EXPECT_THAT(asked, IsEmpty());
+    }
     unsigned LogCount() {
         const Answer info = Ask(ipmi::GetSelInfo());
         return (*info)[2] | (*info)[3] << 8;
@@ -184,14 +194,8 @@ TEST_F(Reading, AControllerThatGivesNoWholeRecordsIsAskedForParts) {
                                 }),
                   3)
             << code;
-        asked.clear();
-        for (std::uint16_t id = 1; id <= 3; ++id) {
-            const Answer record = Ask(ipmi::GetSdr(id));
-            ASSERT_TRUE(record);
-            EXPECT_EQ(ipmisim::Bytes(record->begin() + 3, record->end()), bmc.sdrRecords[id - 1])
-                << code;
-        }
-        EXPECT_THAT(asked, IsEmpty()) << code;
+        SCOPED_TRACE(code);
+        ExpectRecordsInMemory();
     }
 }
 
@@ -206,13 +210,7 @@ TEST_F(Reading, ALostReservationIsTakenAnewAndThePassDoesNotSeeIt) {
     };
     Read({.window = 4, .before = lose});
     EXPECT_EQ(Asked(ipmi::kReserveSdrRepository), 2u);
-    asked.clear();
-    for (std::uint16_t id = 1; id <= 3; ++id) {
-        const Answer record = Ask(ipmi::GetSdr(id));
-        ASSERT_TRUE(record);
-        EXPECT_EQ(ipmisim::Bytes(record->begin() + 3, record->end()), bmc.sdrRecords[id - 1]);
-    }
-    EXPECT_THAT(asked, IsEmpty());
+    ExpectRecordsInMemory();
 }
 
 TEST_F(Reading, ARepositoryThatChangesWhileItIsReadIsTold) {

@@ -13,14 +13,10 @@ using ipmisel::ParseTime;
 using NQORTQR20::Instance;
 using NQORTQR20::Time;
 
-std::optional<Time> At(std::optional<std::int64_t> seconds) {
-    return seconds ? std::optional(Time{*seconds}) : std::nullopt;
-}
-
 TEST(View, ATimeIsReadInEveryFormOfRfc3339AndNothingElse) {
     const struct {
         const char* text;
-        std::optional<std::int64_t> seconds;
+        std::int64_t seconds;
     } cases[] = {
         {"1970-01-01T00:00:00Z", 0},
         {"2026-03-09T02:31:44Z", 1773023504},
@@ -29,20 +25,13 @@ TEST(View, ATimeIsReadInEveryFormOfRfc3339AndNothingElse) {
         {"2026-03-08T21:01:44-05:30", 1773023504},
         {"1969-12-31T23:59:59Z", -1},
         {"2100-01-01T00:00:00Z", 4102444800},
-        {"2026-02-29T02:31:44Z", std::nullopt},  // no leap year
-        {"2026-03-09T24:00:00Z", std::nullopt},
-        {"2026-03-09T02:60:00Z", std::nullopt},
-        {"2026-13-09T02:31:44Z", std::nullopt},
-        {"2026-03-09T02:31:44", std::nullopt},
-        {"2026-03-09T02:31:44Zx", std::nullopt},
-        {"2026-03-09T02:31:44+1:00", std::nullopt},
-        {"2026-03-09T02:31:44+24:00", std::nullopt},
-        {"-026-03-09T02:31:44Z", std::nullopt},
-        {"2026-03-+9T02:31:44Z", std::nullopt},
-        {"", std::nullopt},
     };
-    for (const auto& c : cases) {
-        EXPECT_EQ(ParseTime(c.text), At(c.seconds)) << c.text;
+    for (const auto& c : cases) EXPECT_EQ(ParseTime(c.text), Time{c.seconds}) << c.text;
+    for (const char* text : {"2026-02-29T02:31:44Z", "2026-03-09T24:00:00Z", "2026-03-09T02:60:00Z",
+                             "2026-13-09T02:31:44Z", "2026-03-09T02:31:44", "2026-03-09T02:31:44Zx",
+                             "2026-03-09T02:31:44+1:00", "2026-03-09T02:31:44+24:00",
+                             "-026-03-09T02:31:44Z", "2026-03-+9T02:31:44Z", ""}) {
+        EXPECT_EQ(ParseTime(text), std::nullopt) << text;
     }
 }
 
@@ -108,7 +97,7 @@ TEST(View, AMomentIsADateATimeOrHowLongAgo) {
     const Time now{1773100800};  // 2026-03-10
     const struct {
         const char* text;
-        std::optional<std::int64_t> seconds;
+        std::int64_t seconds;
     } cases[] = {
         {"2026-03-09", 1773014400},
         {"2026-03-09 02:31", 1773023460},
@@ -118,16 +107,12 @@ TEST(View, AMomentIsADateATimeOrHowLongAgo) {
         {"12h", 1773057600},
         {"7d", 1772496000},
         {"0d", 1773100800},
-        {"7", std::nullopt},
-        {"7w", std::nullopt},
-        {"d", std::nullopt},
-        {"-1d", std::nullopt},
-        {"99999999999d", std::nullopt},
-        {"yesterday", std::nullopt},
-        {"", std::nullopt},
     };
     for (const auto& c : cases) {
-        EXPECT_EQ(ipmisel::ParseMoment(c.text, now), At(c.seconds)) << c.text;
+        EXPECT_EQ(ipmisel::ParseMoment(c.text, now), Time{c.seconds}) << c.text;
+    }
+    for (const char* text : {"7", "7w", "d", "-1d", "99999999999d", "yesterday", ""}) {
+        EXPECT_EQ(ipmisel::ParseMoment(text, now), std::nullopt) << text;
     }
 }
 

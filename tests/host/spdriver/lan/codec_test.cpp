@@ -3,6 +3,7 @@
 #include <string>
 #include <vector>
 
+#include "base/hex.h"
 #include "base/text.h"
 #include "host/spdriver/lan/crypto.h"
 #include "host/spdriver/lan/rmcpplus_codec.h"
@@ -15,13 +16,7 @@ using namespace tqrhost::rmcpplus;
 using ipmisim::RmcpBmc;
 using Bytes = std::vector<std::uint8_t>;
 
-Bytes FromHex(const char* text) {
-    Bytes bytes;
-    for (; text[0] != '\0'; text += 2) {
-        bytes.push_back(static_cast<std::uint8_t>(std::stoi(std::string(text, 2), nullptr, 16)));
-    }
-    return bytes;
-}
+Bytes FromHex(const char* text) { return ipmisel::ParseHex(text).value(); }
 Bytes FromText(std::string_view text) { return {text.begin(), text.end()}; }
 
 TEST(Crypto, HmacOfThePublishedVectors) {

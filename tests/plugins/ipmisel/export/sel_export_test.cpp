@@ -101,13 +101,11 @@ TEST_F(SelExport, EntityNamesAboveTheNumberedOnesReachOnlyTheMessage) {
     EXPECT_THAT(log.Lines(0), IsEmpty());  // no text is looked for that there is not
     ASSERT_EQ(written.instances.size(), 4U);
     const struct {
-        const char* entity;
-        const char* instance;
-        const char* sensorType;
-        const char* sensor;
+        const char *entity, *instance, *sensorType, *sensor;
         std::string message;
     } cases[] = {
-        {"", "3", "Temperature", "Ambient", "Processing blade 3 (Temperature - Ambient): Assertion: "},
+        {"", "3", "Temperature", "Ambient",
+         "Processing blade 3 (Temperature - Ambient): Assertion: "},
         {"", "3", "Temperature", "Ambient", " 3 (Temperature - Ambient): Deassertion: "},
         {"Battery", "1", "Power Supply", "VRM 1",
          "Battery 1 (Voltage Regulator Module - VRM 1): Assertion: "},

@@ -164,14 +164,9 @@ TEST_F(Pass, WhatIsReadBeforeAFailureIsUsed) {
     const std::string records = "Failed to fill all the entries into SEL array.\n";
     const std::tuple<ipmisim::Fault, int, std::string, std::vector<std::string>> cases[] = {
         {NoResponse(kGetSdrRepositoryInfo, 1), 0, sensors, {"", "", ""}},
-        {CompletionCode(kGetSdr, 4, 0xC5),
-         0,
-         sensors,
-         {"Ambient", "", "Ambient"}},  // header of the second
-        {CompletionCode(kGetSdr, 5, 0xC5),
-         0,
-         sensors,
-         {"Ambient", "", "Ambient"}},  // and its units
+        // The header of the second, and its units.
+        {CompletionCode(kGetSdr, 4, 0xC5), 0, sensors, {"Ambient", "", "Ambient"}},
+        {CompletionCode(kGetSdr, 5, 0xC5), 0, sensors, {"Ambient", "", "Ambient"}},
         {NoResponse(kGetSelEntry, 1), 1, records, {}},
         {NoResponse(kGetSelEntry, 3), 1, records, {"Ambient", "CPU 2"}},
         {CompletionCode(kGetSelEntry, 2, 0xCB), 1, records, {"Ambient"}},

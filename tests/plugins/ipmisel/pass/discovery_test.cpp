@@ -26,8 +26,7 @@ TEST_F(Discovery, PartsAreNamedByAnyOemString) {
     longHeader[1] = 0xFF;
     const struct {
         std::vector<std::vector<std::uint8_t>> structures;
-        bool cpld;
-        bool fpga;
+        bool cpld, fpga;
     } cases[] = {
         {{}, false, false},
         {{OemStrings({"nothing"})}, false, false},

@@ -131,8 +131,7 @@ TEST_F(FirmwareSection, VersionsThatCannotBeHadAreNotMadeUp) {
         "3 Could not create the instance for BusID[0] information for AMI backplane.\n",
         "3 Got BusID[1] information for AMI backplane.\n", "1.4.3"};
     const struct {
-        const char* className;
-        const char* machineType;
+        const char *className, *machineType;
         ipmisim::FixedReply reply;
         Lines story;
     } cases[] = {

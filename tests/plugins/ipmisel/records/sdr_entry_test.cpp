@@ -117,8 +117,11 @@ TEST_F(SdrEntry, RepositoryInformationMustBeOfItsVersion) {
 using SdrEntities = ipmiseltest::MappingTest;
 
 TEST_F(SdrEntities, NameTheSensorAndItsEntity) {
-    const std::pair<std::uint8_t, const char*> cases[] = {
-        {0x07, "<1007>"}, {0x28, "<1040>"}, {0x29, "Processing blade"}, {0x35, ""}};
+    const std::pair<std::uint8_t, const char*> cases[] = {{0x07, "<1007>"},
+                                                          {0x28, "<1040>"},
+                                                          {0x29, "Processing blade"},
+                                                          {0x34, "Processor or front-side bus"},
+                                                          {0x35, ""}};
     for (const auto& [entityId, entityName] : cases) {
         IPMISDREntry entry;
         ASSERT_EQ(Scan(SensorTexts(), &entry), 0);

@@ -167,8 +167,7 @@ TEST_F(Exchange, DiffTimeComparesTheClocks) {
     const ipmiseltest::Machine now("", "20240305120304.000000+060");
     const struct {
         std::uint32_t raw;
-        const char* bmcTime;
-        const char* difference;
+        const char *bmcTime, *difference;
         bool notBehind;
     } cases[] = {{1709640184, "20240305120304.000000+060", "00000000000000.000000:000", true},
                  {1709640185, "20240305120305.000000+060", "00000000000001.000000:000", true},

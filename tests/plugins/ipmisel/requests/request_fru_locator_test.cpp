@@ -21,22 +21,13 @@ protected:
     /// A record whose byte i is i, but for what is given.
     void AddRecord(std::uint16_t id, std::uint8_t device, const std::string& idString,
                    std::uint8_t typeLength, std::uint8_t type = 0x11) {
-        ipmisim::Bytes record{ipmiseltest::Low(id),
-                              ipmiseltest::High(id),
-                              2,
-                              type,
-                              4,
-                              5,
-                              device,
-                              7,
-                              8,
-                              9,
-                              10,
-                              11,
-                              12,
-                              13,
-                              14,
-                              typeLength};
+        ipmisim::Bytes record(16);
+        std::iota(record.begin(), record.end(), std::uint8_t{0});
+        record[0] = ipmiseltest::Low(id);
+        record[1] = ipmiseltest::High(id);
+        record[3] = type;
+        record[6] = device;
+        record[15] = typeLength;
         record.insert(record.end(), idString.begin(), idString.end());
         bmc.sdrRecords.push_back(record);
     }

@@ -1,7 +1,6 @@
 #include <string>
 #include <vector>
 
-#include "plugins/ipmisel/texts/entity_names.h"
 #include "plugins/ipmisel/texts/sdr_strings.h"
 #include "tests/plugins/ipmisel/texts/mapping_fixture.h"
 
@@ -33,13 +32,6 @@ TEST(SensorType, NamesStandardAndOemTypes) {
     char small[5];
     mapping.GetSensorType(nullptr, 0x01, small, sizeof small, 0);
     EXPECT_STREQ(small, "Temp");
-}
-
-TEST(EntityName, IsHeldForTheHigherStandardOnes) {
-    EXPECT_EQ(ipmisel::HeldEntityName(0x28), "");
-    EXPECT_EQ(ipmisel::HeldEntityName(0x29), "Processing blade");
-    EXPECT_EQ(ipmisel::HeldEntityName(0x34), "Processor or front-side bus");
-    EXPECT_EQ(ipmisel::HeldEntityName(0x35), "");
 }
 
 TEST(SdrString, ExpandsAbbreviationsAndVoltages) {
