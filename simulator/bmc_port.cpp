@@ -83,6 +83,7 @@ void BmcPort::Take(const Packet& packet, const sockaddr_storage& client, Clock::
     ++packets_;
     outstanding_ += ofSession ? 1 : 0;
     outgoing_.emplace(due, Outgoing{client, std::move(answer), ofSession});
+    SendDue();  // the BMC may take its time for the next
 }
 
 void BmcPort::SendDue() {

@@ -109,7 +109,7 @@ Source OpenLan(const std::vector<std::string>& places, const Access& access) {
     if (source.nodes.empty()) {
         std::string reasons;
         for (const UnreachableNode& node : source.unreachable) {
-            reasons += (reasons.empty() ? "" : "\n") + node.reason;
+            reasons += (reasons.empty() ? "" : "; ") + node.reason;
         }
         throw SourceError(reasons, refusal);
     }

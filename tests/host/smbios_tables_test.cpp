@@ -114,6 +114,10 @@ TEST(SystemSmbios, SmallerBoundHolds) {
         place.Write(file, {bytes.begin(), bytes.end()});
     };
     EXPECT_EQ(ReadSystemSmbios(folder), SmbiosStructures());
+    EXPECT_EQ(SystemSmbiosError(folder), 0);  // there is none
+    std::filesystem::create_symlink("DMI", folder / "DMI");
+    EXPECT_EQ(SystemSmbiosError(folder), ELOOP);
+    std::filesystem::remove(folder / "DMI");
     write("DMI", Join({kSystem, kBare, kBare, kEnd}));
     EXPECT_EQ(ReadSystemSmbios(folder), SmbiosStructures());
     const auto systemOnly = static_cast<std::uint8_t>(kSystem.size());

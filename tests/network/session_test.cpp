@@ -166,7 +166,8 @@ TEST_F(Session, TheDeadlineHoldsWhileASessionIsOpenedAndAllThatFailedAreNamed) {
         }
     });
     EXPECT_LT(took, 1.2);
-    EXPECT_THAT(reason, AllOf(HasSubstr(one.Place() + ": "), HasSubstr(other.Place() + ": ")));
+    EXPECT_THAT(reason,
+                AllOf(HasSubstr(one.Place() + ": "), HasSubstr("; " + other.Place() + ": ")));
 }
 
 TEST_F(Session, AFloodOfPacketsHoldsNoDeadlineUp) {
