@@ -56,6 +56,9 @@ TEST(MemoryModuleText, IsShownOnlyWhenItIsPlainAscii) {
 
 TEST(KeptInstances, OneThatTheHostRefusesLeavesTheOthers) {
     IPMIVPDEntry entries;
+    entries.AddInstance();  // nothing added: no instance
+    entries.AddProperty("Vendor", "dropped");
+    entries.DropInstance();
     entries.AddProperty("PartNumber", "1");
     entries.AddInstance();
     entries.AddProperty("Vendor", "Second");
