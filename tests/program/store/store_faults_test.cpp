@@ -1,4 +1,5 @@
 #include <chrono>
+#include <map>
 #include <random>
 #include <thread>
 
@@ -82,10 +83,55 @@ protected:
     std::vector<std::string> Stored() {
         return Column("SELECT s.guid || e.raw FROM events e JOIN systems s ON s.id = e.system");
     }
+    /// The problems of a controller, as a collection without a store tells them.
+    std::vector<std::string> Findings(const Controller& bmc) {
+        const std::string out = (folder.path() / "findings").string();
+        std::filesystem::remove(out);
+        const Result plain =
+            Run({"collect", "--from", "sim:" + folder.Write("bmc.json", bmc.Server().dump()),
+                 "--class", "IPMI_Finding", "--format", "json", "--output", out});
+        EXPECT_EQ(plain.exitStatus, 0) << plain.err;
+        std::vector<std::string> findings;
+        for (const Json& instance : Json::parse(ReadText(out))["instances"]) {
+            const Json& finding = instance["properties"];
+            findings.push_back(finding["Severity"].get<std::string>() + " " +
+                               finding["Title"].get<std::string>() + " " + finding["Count"].dump());
+        }
+        return findings;
+    }
+    /// They are those of the store; an acknowledgement holds until there is a further event of it.
+    void ExpectFindings(const Controller& bmc, Random& random) {
+        std::vector<std::string> stored;
+        const auto open = ipmisel::Store(uri).OpenFindings({"bmc"});
+        for (const ipmisel::StoredFinding& finding : open) {
+            stored.push_back(finding.severity + " " + finding.title + " " +
+                             std::to_string(finding.count));
+            const auto held = acknowledged_.find(finding.key);
+            const bool holds = held != acknowledged_.end() && held->second == LastEvent(finding);
+            EXPECT_EQ(finding.acknowledged, holds) << finding.title;
+        }
+        ASSERT_EQ(stored, Findings(bmc));
+        std::map<std::string, std::string> still;
+        for (const ipmisel::StoredFinding& finding : open) {
+            if (finding.acknowledged) still[finding.key] = LastEvent(finding);
+        }
+        acknowledged_ = std::move(still);
+        if (open.empty() || Pick(random, 2) == 0) return;
+        const ipmisel::StoredFinding& one = open[Pick(random, open.size())];
+        EXPECT_EQ(ipmisel::Store(uri).Acknowledge(one.key, "test", "", 1), 1U);
+        acknowledged_[one.key] = LastEvent(one);
+    }
+    static std::string LastEvent(const ipmisel::StoredFinding& finding) {
+        return Json::parse(finding.properties)["Events"].back();
+    }
     void NewUri(int number) {
+        acknowledged_.clear();
         uri = GetParam() ? PostgresqlServer::Get()->FreshUri()
                          : "sqlite:" + databases.path() + "/" + std::to_string(number) + ".db";
     }
+
+private:
+    std::map<std::string, std::string> acknowledged_;  ///< last event by key
 };
 INSTANTIATE_TEST_SUITE_P(, StoreFaults, Values(false, true), StoreName);
 
@@ -113,6 +159,7 @@ TEST_P(StoreFaults, AllRunsTogetherGaveWhatWasEverInTheLogAtAVisit) {
             ASSERT_EQ(visit.exitStatus, 0) << visit.err;
             for (const std::string& raw : visit.Raws()) given.push_back(bmc.guid + raw);
             ASSERT_EQ(Present(), log);
+            ExpectFindings(bmc, random);
         }
         EXPECT_EQ(SetOf(given), ever);
         EXPECT_EQ(given.size(), ever.size()) << "an event was given twice";
