@@ -150,10 +150,12 @@ def _fill(port: int, bmc: dict) -> bool:
         lines += [set_time(entry[3:7]), f"raw 0x0a 0x44 {hexes(entry)}"]
         number += 1
     run([*lines, erased, *gaps, set_time(bmc["sel"]["time"].to_bytes(4, "little"))])
-    written = bytes.fromhex(run([f"raw 0x0a 0x43 0 0 {hexes(entry[:2])} 0 0xff"
-                                 for entry in entries]))
+    written = bytes.fromhex(run([*(f"raw 0x0a 0x43 0 0 {hexes(entry[:2])} 0 0xff"
+                                   for entry in entries), "raw 0x0a 0x40"]))
+    written, info = written[:-14], written[-14:]
     # The next record's ID stands before each.
-    return [written[at + 2:at + 18] for at in range(0, len(written), 18)] == entries
+    return (int.from_bytes(info[9:13], "little") == bmc["sel"]["last_erase"] and
+            [written[at + 2:at + 18] for at in range(0, len(written), 18)] == entries)
 
 
 @contextlib.contextmanager
