@@ -18,6 +18,7 @@ namespace {
 constexpr std::size_t kReserve = 8 << 20;
 std::atomic<void*> gReserve = nullptr;
 std::atomic<bool> gHasRunOut = false;
+std::atomic<bool> gParentTells = false;
 
 void GiveReserveBack() {
     gHasRunOut = true;
@@ -30,6 +31,7 @@ void GiveReserveBack() {
     try {
         if (const auto error = std::current_exception()) std::rethrow_exception(error);
     } catch (const std::bad_alloc&) {
+        if (gParentTells) std::_Exit(kExitNoSource);
         for (const std::string_view part :
              {"ipmisel: ", kOutOfMemory, "; ", kOutOfMemoryAdvice, "\n"}) {
             if (write(STDERR_FILENO, part.data(), part.size()) < 0) break;
@@ -43,10 +45,12 @@ void GiveReserveBack() {
 }  // namespace
 
 void PrepareForOutOfMemory() {
-    gReserve = std::malloc(kReserve);
+    if (gReserve == nullptr) gReserve = std::malloc(kReserve);
     std::set_new_handler(GiveReserveBack);
     std::set_terminate(EndTheProgram);
 }
+
+void LeaveOutOfMemoryToTheParent() { gParentTells = true; }
 
 bool HasRunOutOfMemory() { return gHasRunOut; }
 

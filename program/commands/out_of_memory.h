@@ -10,6 +10,8 @@ inline constexpr char kOutOfMemoryAdvice[] =
 /// Keeps some memory back for the end of a program that has run out of it, and lets that be one
 /// line and an exit status wherever it happens.
 void PrepareForOutOfMemory();
+/// In a process whose parent tells why it ended: no line, the exit status kExitNoSource.
+void LeaveOutOfMemoryToTheParent();
 /// Whether an allocation has failed since.
 bool HasRunOutOfMemory();
 

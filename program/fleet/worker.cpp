@@ -12,6 +12,7 @@
 
 #include "host/spdriver/source.h"
 #include "program/commands/failure.h"
+#include "program/commands/out_of_memory.h"
 #include "program/commands/plugins.h"
 #include "program/reports/json_text.h"
 #include "program/reports/terminal_text.h"
@@ -85,7 +86,7 @@ WorkerResult CollectAsAsked(const CollectOptions& options) {
     } catch (const Failure& failure) {
         return {{failure.exitStatus, failure.what(), ""}};
     } catch (const std::bad_alloc&) {
-        return {{kExitPassFailed, "out of memory", "collect from fewer at a time with --jobs"}};
+        return {OutOfMemoryOfAWorker()};
     } catch (const std::exception& error) {
         return {
             {kExitPassFailed, std::string("ended by an error of its own: ") + error.what(), ""}};
@@ -135,8 +136,13 @@ std::optional<WorkerResult> ParseWorkerResult(const std::string& message) {
     }
 }
 
+Outcome OutOfMemoryOfAWorker() {
+    return {kExitPassFailed, kOutOfMemory, "collect from fewer at a time with --jobs"};
+}
+
 int RunWorker(const std::string& name) {
     SayFor(name);
+    LeaveOutOfMemoryToTheParent();
     // Whoever wrote it is the parent by then, which may be killed at any time; nobody would take
     // the report then.
     const CollectOptions options = ParseRequest(ReadRequest());

@@ -30,6 +30,9 @@ std::string WriteWorkerResult(const WorkerResult& result);
 /// Empty when it is no such message.
 std::optional<WorkerResult> ParseWorkerResult(const std::string& message);
 
+/// What is told of a worker that had not memory enough. One that cannot say so ends with
+/// kExitNoSource and no result.
+Outcome OutOfMemoryOfAWorker();
 /// The work itself, to be run in a process of its own; the exit status. Log lines stand under the
 /// name. Throws Failure.
 int RunWorker(const std::string& name);

@@ -184,6 +184,8 @@ WorkerEnd WorkerPool::End(Worker& worker) {
     if (worker.killed) {
         end.result.outcome = {kExitPart, "did not end at its deadline and was killed",
                               "read this controller alone to see where it hangs"};
+    } else if (WIFEXITED(status) && WEXITSTATUS(status) == kExitNoSource) {
+        end.result.outcome = OutOfMemoryOfAWorker();  // so that it could not even say so
     } else {
         const std::string how = WIFSIGNALED(status)
                                     ? std::string("was ended by ") + strsignal(WTERMSIG(status))
