@@ -91,7 +91,8 @@ bool IsOutOfOrder(std::uint8_t completion) {
 }
 
 /// One read of those above. False when the BMC does not work at all.
-bool TryCommand(DoctorController* controller, const ReadCommand& read, bool* emptyLog, Steps* steps) {
+bool TryCommand(DoctorController* controller, const ReadCommand& read, bool* emptyLog,
+                Steps* steps) {
     const ipmi::CommandCode code = read.command.code();
     const std::string name(ipmi::CommandName(code));
     const auto began = Clock::now();
