@@ -13,44 +13,45 @@ namespace {
 std::uint8_t Low(std::uint16_t value) { return static_cast<std::uint8_t>(value & 0xFF); }
 std::uint8_t High(std::uint16_t value) { return static_cast<std::uint8_t>(value >> 8); }
 
-struct NamedCommand {
+struct KnownCommand {
     CommandCode code;
     std::string_view name;
+    std::size_t leastAnswer = 1;
 };
 
-constexpr std::array kCommandNames = std::to_array<NamedCommand>({
-    {kGetChassisStatus, "Get Chassis Status"},
-    {kGetPefConfigurationParameters, "Get PEF Configuration Parameters"},
+constexpr std::array kCommands = std::to_array<KnownCommand>({
+    {kGetChassisStatus, "Get Chassis Status", 4},
+    {kGetPefConfigurationParameters, "Get PEF Configuration Parameters", 3},
     {kGetDeviceSdrInfo, "Get Device SDR Info"},
-    {kGetSensorReadingFactors, "Get Sensor Reading Factors"},
+    {kGetSensorReadingFactors, "Get Sensor Reading Factors", 8},
     {kGetSensorHysteresis, "Get Sensor Hysteresis"},
-    {kGetSensorThresholds, "Get Sensor Thresholds"},
+    {kGetSensorThresholds, "Get Sensor Thresholds", 8},
     {kGetSensorEventStatus, "Get Sensor Event Status"},
-    {kGetSensorReading, "Get Sensor Reading"},
-    {kGetDeviceId, "Get Device ID"},
-    {kGetSelfTestResults, "Get Self Test Results"},
-    {kGetDeviceGuid, "Get Device GUID"},
+    {kGetSensorReading, "Get Sensor Reading", 3},
+    {kGetDeviceId, "Get Device ID", 12},
+    {kGetSelfTestResults, "Get Self Test Results", 3},
+    {kGetDeviceGuid, "Get Device GUID", 17},
     {kGetMessage, "Get Message"},
     {kSendMessage, "Send Message"},
-    {kGetSystemGuid, "Get System GUID"},
+    {kGetSystemGuid, "Get System GUID", 17},
     {kGetChannelAuthenticationCapabilities, "Get Channel Authentication Capabilities"},
     {kGetSessionChallenge, "Get Session Challenge"},
     {kActivateSession, "Activate Session"},
     {kSetSessionPrivilegeLevel, "Set Session Privilege Level"},
     {kCloseSession, "Close Session"},
     {kGetChannelCipherSuites, "Get Channel Cipher Suites"},
-    {kGetFruInventoryAreaInfo, "Get FRU Inventory Area Info"},
-    {kReadFruData, "Read FRU Data"},
-    {kGetSdrRepositoryInfo, "Get SDR Repository Info"},
-    {kReserveSdrRepository, "Reserve SDR Repository"},
+    {kGetFruInventoryAreaInfo, "Get FRU Inventory Area Info", 4},
+    {kReadFruData, "Read FRU Data", 2},
+    {kGetSdrRepositoryInfo, "Get SDR Repository Info", 4},
+    {kReserveSdrRepository, "Reserve SDR Repository", 3},
     {kGetSdr, "Get SDR"},
-    {kGetSelInfo, "Get SEL Info"},
-    {kGetSelAllocationInfo, "Get SEL Allocation Info"},
+    {kGetSelInfo, "Get SEL Info", 4},
+    {kGetSelAllocationInfo, "Get SEL Allocation Info", 10},
     {kReserveSel, "Reserve SEL"},
     {kGetSelEntry, "Get SEL Entry"},
-    {kGetSelTime, "Get SEL Time"},
+    {kGetSelTime, "Get SEL Time", 5},
     {kGetAuxiliaryLogStatus, "Get Auxiliary Log Status"},
-    {kGetSelTimeUtcOffset, "Get SEL Time UTC Offset"},
+    {kGetSelTimeUtcOffset, "Get SEL Time UTC Offset", 3},
 });
 
 // Generic completion codes C0h to D6h, table 5-2.
@@ -119,8 +120,13 @@ constexpr std::array kSpecificCodes = std::to_array<SpecificCode>({
 }  // namespace
 
 std::string_view CommandName(CommandCode code) {
-    const auto* const found = std::ranges::find(kCommandNames, code, &NamedCommand::code);
-    return found == kCommandNames.end() ? std::string_view() : found->name;
+    const auto* const found = std::ranges::find(kCommands, code, &KnownCommand::code);
+    return found == kCommands.end() ? std::string_view() : found->name;
+}
+
+std::size_t LeastAnswer(CommandCode code) {
+    const auto* const found = std::ranges::find(kCommands, code, &KnownCommand::code);
+    return found == kCommands.end() ? 1 : found->leastAnswer;
 }
 
 Command MakeCommand(CommandCode code, std::vector<std::uint8_t> data, std::uint8_t lun) {

@@ -80,6 +80,12 @@ constexpr CommandCode kGetSelTimeUtcOffset{kNetFnStorage, 0x5C};
 
 /// The command's name in the standard; empty for one that is not listed above.
 std::string_view CommandName(CommandCode code);
+/// Bytes that an answer without error has at least, the completion code included, to hold what is
+/// mandatory (for the information about log and repository: up to the count of the records); 1 for
+/// a command whose answer may be empty or is not listed above.
+std::size_t LeastAnswer(CommandCode code);
+/// Where that count stands, in the data after the completion code (tables 31-2 and 33-3).
+inline constexpr std::size_t kRecordCountAt = 1;
 
 /// A request: where to, which command, and its data as they stand on the wire.
 struct Command {

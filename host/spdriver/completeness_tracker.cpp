@@ -18,12 +18,6 @@ constexpr const char* kSensorsChanged = "the sensor repository has changed while
 
 constexpr std::size_t kMaxFaults = 1000;
 
-// Answers, completion code included: version and count; the count of FRU bytes; a reservation.
-constexpr std::size_t kInfoAnswer = 4;
-constexpr std::size_t kFruAnswer = 2;
-constexpr std::size_t kReservationAnswer = 3;
-constexpr std::size_t kCountAt = 2;
-
 const char* StopText(StopReason reason) {
     return reason == StopReason::kDeadline ? "deadline" : "interrupted";
 }
@@ -64,7 +58,8 @@ void CompletenessTracker::Note(const RequestFrame& request,
             break;
         case ipmi::kReserveSdrRepository.number:
             FinishWalk(&sensors_);
-            if (const std::string problem = ProblemOf(response, kReservationAnswer);
+            if (const std::string problem =
+                    ProblemOf(response, ipmi::LeastAnswer(ipmi::kReserveSdrRepository));
                 !problem.empty()) {
                 AddFault({"Reserve SDR Repository", "", problem, true});
             }
@@ -109,7 +104,7 @@ std::optional<ReadingState> CompletenessTracker::StateAfter(const RequestFrame& 
 void CompletenessTracker::NoteInfo(Source* source, bool askedAgain,
                                    const std::optional<Response>& response) {
     const std::string what = source->infoCommand;
-    const std::string problem = ProblemOf(response, kInfoAnswer);
+    const std::string problem = ProblemOf(response, ipmi::LeastAnswer(ipmi::kGetSelInfo));
     if (!problem.empty()) {
         AddFault({what, "", problem, true});
         return;
@@ -129,7 +124,7 @@ void CompletenessTracker::NoteInfo(Source* source, bool askedAgain,
     // By the count as it was then; the inventory's walk comes before anybody has asked for it.
     if (source->account->announced) FinishWalk(source);
     ipmisel::ByteReader in(*response);
-    in.Skip(kCountAt);
+    in.Skip(1 + ipmi::kRecordCountAt);
     source->account->announced = in.U16();
     FinishWalk(source);
 }
@@ -248,8 +243,9 @@ void CompletenessTracker::NoteFru(const RequestFrame& request,
     // A device may be smaller than what is asked for.
     if (response && response->front() == ipmi::kParameterOutOfRange && offset > 0) return;
     // The count, and as many bytes as it says.
-    const bool counts = response && response->size() >= kFruAnswer;
-    const std::size_t least = kFruAnswer + (counts ? response->at(1) : 0);
+    const std::size_t header = ipmi::LeastAnswer(ipmi::kReadFruData);
+    const bool counts = response && response->size() >= header;
+    const std::size_t least = header + (counts ? response->at(1) : 0);
     const std::string problem = ProblemOf(response, least);
     const bool askedAgain =
         refusedFru_ && refusedFru_->device == device && refusedFru_->offset == offset;

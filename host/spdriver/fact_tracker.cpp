@@ -9,32 +9,16 @@
 namespace tqrhost {
 namespace {
 
-/// Facts of the controller, and the least that their answers hold, completion code included.
-struct Fact {
-    ipmi::CommandCode code;
-    std::size_t least;
+constexpr ipmi::CommandCode kControllerFacts[] = {
+    ipmi::kGetDeviceId,         ipmi::kGetSelfTestResults,   ipmi::kGetSystemGuid,
+    ipmi::kGetDeviceGuid,       ipmi::kGetChassisStatus,     ipmi::kGetSelTime,
+    ipmi::kGetSelTimeUtcOffset, ipmi::kGetSelAllocationInfo, ipmi::kGetPefConfigurationParameters,
 };
-constexpr Fact kControllerFacts[] = {
-    {ipmi::kGetDeviceId, 12},
-    {ipmi::kGetSelfTestResults, 3},
-    {ipmi::kGetSystemGuid, 17},
-    {ipmi::kGetDeviceGuid, 17},
-    {ipmi::kGetChassisStatus, 4},
-    {ipmi::kGetSelTime, 5},
-    {ipmi::kGetSelTimeUtcOffset, 3},
-    {ipmi::kGetSelAllocationInfo, 10},
-    {ipmi::kGetPefConfigurationParameters, 3},
-};
-constexpr Fact kSensorFacts[] = {
-    {ipmi::kGetSensorReading, 3},
-    {ipmi::kGetSensorThresholds, 8},
-    {ipmi::kGetSensorReadingFactors, 8},
-};
+constexpr ipmi::CommandCode kSensorFacts[] = {ipmi::kGetSensorReading, ipmi::kGetSensorThresholds,
+                                              ipmi::kGetSensorReadingFactors};
 
-const Fact* FindFact(std::span<const Fact> facts, ipmi::CommandCode code) {
-    const auto fact = std::find_if(facts.begin(), facts.end(),
-                                   [&](const Fact& known) { return known.code == code; });
-    return fact == facts.end() ? nullptr : &*fact;
+bool IsAmong(std::span<const ipmi::CommandCode> facts, ipmi::CommandCode code) {
+    return std::find(facts.begin(), facts.end(), code) != facts.end();
 }
 
 /// A controller that does not know a command does not have the fact.
@@ -58,14 +42,15 @@ std::optional<ReadFault> FactTracker::Note(const RequestFrame& request,
     const std::uint8_t first = data.empty() ? 0 : data[0];
     const std::string name(ipmi::CommandName(code));
     if (response && IsUnknown(code, response->front())) return std::nullopt;
-    if (const Fact* fact = FindFact(kControllerFacts, code)) {
+    const std::size_t least = ipmi::LeastAnswer(code);
+    if (IsAmong(kControllerFacts, code)) {
         const unsigned which = data.size() < 2 ? first : first << 8 | data[1];
-        const std::string problem = problemOf(fact->least);
+        const std::string problem = problemOf(least);
         Count(&controller_, Key(code, which), problem.empty());
         if (!problem.empty()) return ReadFault{name, "", problem, false};
-    } else if (const Fact* sensor = FindFact(kSensorFacts, code)) {
+    } else if (IsAmong(kSensorFacts, code)) {
         const unsigned which = static_cast<unsigned>(request.lun()) << 8 | first;
-        const std::string problem = problemOf(sensor->least);
+        const std::string problem = problemOf(least);
         if (code == ipmi::kGetSensorReading) Count(&readings_, Key(code, which), problem.empty());
         // That the sensor is not there is an answer.
         if (!problem.empty() && !(response && response->front() == ipmi::kNotPresent)) {
@@ -73,8 +58,7 @@ std::optional<ReadFault> FactTracker::Note(const RequestFrame& request,
         }
     } else if (code == ipmi::kGetFruInventoryAreaInfo) {
         if (response && response->front() == ipmi::kNotPresent) return std::nullopt;
-        constexpr std::size_t kLeast = 4;
-        const std::string problem = problemOf(kLeast);
+        const std::string problem = problemOf(least);
         if (problem.empty()) {
             NoteArea(first, *response);
         } else {
