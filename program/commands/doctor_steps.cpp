@@ -221,7 +221,7 @@ void TryLog(DoctorController* controller, Steps* steps) {
             problem = "comes again: the log runs in a circle";
         }
         if (!problem.empty()) {
-            steps->Bad(kWhat, record + ": " + problem + kAdvice);
+            steps->Bad(kWhat, std::string(record).append(": ").append(problem).append(kAdvice));
             return;
         }
         id = ByteReader(std::span(*answer).subspan(1)).U16();

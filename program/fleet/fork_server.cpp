@@ -88,9 +88,10 @@ public:
     void Set(const std::string& text) const {
         if (begin_ == 0 || end_ <= begin_) return;
         const std::size_t room = end_ - begin_;
+        // NOLINTNEXTLINE(performance-no-int-to-ptr): the system gives the address as a number
         auto* const place = reinterpret_cast<char*>(begin_);
         std::memset(place, 0, room);
-        std::memcpy(place, text.data(), std::min(text.size(), room - 1));
+        std::copy_n(text.begin(), std::min(text.size(), room - 1), place);
     }
 
 private:

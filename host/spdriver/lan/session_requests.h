@@ -54,8 +54,7 @@ public:
         std::chrono::milliseconds timeout{20000};
         bool anySessionNumber = false;  ///< workaround: answers whose session numbers mean nothing
     };
-    explicit SessionRequests(Options options)
-        : options_(std::move(options)), window_(options_.window) {}
+    explicit SessionRequests(Options options) : options_(options), window_(options_.window) {}
 
     void Submit(ipmi::Command command, Handler handler);
     std::size_t Pending() const { return waiting_.size() + active_.size(); }
