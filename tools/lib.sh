@@ -63,7 +63,7 @@ inside() {
 # What the build needs, its tests need on top, and the tests that compare with other people's programs.
 build_packages=(g++ cmake ninja-build pkg-config libssl-dev libcli11-dev nlohmann-json3-dev
                 libpq-dev libsqlite3-dev)
-test_packages=(googletest libfreeipmi-dev openipmi python3)
+test_packages=(git googletest less libfreeipmi-dev openipmi python3)
 peer_packages=(ipmitool freeipmi-tools file fish zsh jq sqlite3 postgresql python3-jsonschema python3-pyghmi prometheus prometheus-node-exporter
                rsyslog tidy chromium)
 package_packages=(debhelper dh-python fakeroot help2man lintian lowdown)

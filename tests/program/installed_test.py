@@ -50,7 +50,7 @@ with tempfile.TemporaryDirectory() as folder:
                 sys.exit(f"{document.relative_to(documents)} links {link}, which is not installed")
 
     source = prefix / "share/doc/ipmisel/examples/plugin"
-    run("cmake", "-S", source, "-B", folder / "build", f"-DIPMISEL_PREFIX={prefix}",
+    run("cmake", "-G", "Ninja", "-S", source, "-B", folder / "build", f"-DIPMISEL_PREFIX={prefix}",
         f"-DCMAKE_CXX_COMPILER={compiler}", "-DCMAKE_CXX_FLAGS=-Wall -Wextra -Wpedantic -Werror")
     run("cmake", "--build", folder / "build")
     plugin = folder / "build/self_test.pi"
