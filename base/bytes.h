@@ -26,6 +26,10 @@ public:
         const std::uint16_t low = U8();
         return static_cast<std::uint16_t>(low | U8() << 8);
     }
+    std::uint32_t U24() {
+        const std::uint32_t low = U16();
+        return low | static_cast<std::uint32_t>(U8()) << 16;
+    }
     std::uint32_t U32() {
         const std::uint32_t low = U16();
         return low | static_cast<std::uint32_t>(U16()) << 16;

@@ -31,9 +31,7 @@ std::optional<DeviceId> ParseDeviceId(std::span<const std::uint8_t> response) {
     id.firmwareMinor = in.U8();
     id.ipmiVersion = in.U8();
     id.capabilities = in.U8();
-    // Bits 23..20 are reserved.
-    id.manufacturerId = in.U16();
-    id.manufacturerId |= static_cast<std::uint32_t>(in.U8() & 0x0F) << 16;
+    id.manufacturerId = in.U24() & 0x0FFFFF;  // bits 23..20 are reserved
     id.productId = in.U16();
     if (!in.ok()) return std::nullopt;
     std::array<std::uint8_t, 4> auxiliary{};

@@ -229,7 +229,7 @@ bool ReadConfirmation(Bytes bytes, SdrRecord* record) {
     confirmation.deviceRevision = where & 0x0F;
     for (std::uint8_t& byte : confirmation.firmwareRevision) byte = in.U8();
     confirmation.ipmiVersion = in.U8();
-    confirmation.manufacturerId = in.U16() | static_cast<std::uint32_t>(in.U8()) << 16;
+    confirmation.manufacturerId = in.U24();
     confirmation.productId = in.U16();
     for (std::uint8_t& byte : confirmation.guid) byte = in.U8();
     if (!in.ok()) return false;
@@ -251,7 +251,7 @@ bool ReadMessageChannel(Bytes bytes, SdrRecord* record) {
 bool ReadOem(Bytes bytes, SdrRecord* record) {
     ByteReader in(bytes.subspan(kSdrHeaderLength));
     OemSdr oem;
-    oem.manufacturerId = in.U16() | static_cast<std::uint32_t>(in.U8()) << 16;
+    oem.manufacturerId = in.U24();
     if (!in.ok()) return false;
     oem.data.assign(bytes.begin() + kSdrHeaderLength + 3, bytes.end());
     record->body = std::move(oem);

@@ -99,8 +99,7 @@ std::optional<SelRecord> ParseSelRecord(std::span<const std::uint8_t> bytes) {
         for (std::uint8_t& byte : record.data) byte = in.U8();
     } else if (record.kind == RecordKind::kOemTimestamped) {
         record.time = in.U32();
-        record.manufacturerId = in.U16();
-        record.manufacturerId |= static_cast<std::uint32_t>(in.U8()) << 16;
+        record.manufacturerId = in.U24();
     }
     return record;
 }

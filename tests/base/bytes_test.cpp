@@ -9,13 +9,14 @@ namespace {
 using namespace ::testing;
 
 TEST(ByteReader, ReadsLittleEndianAndStaysNotOkPastTheEnd) {
-    const std::vector<std::uint8_t> bytes{1, 2, 3, 4, 5, 6, 7, 8};
+    const std::vector<std::uint8_t> bytes{1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11};
     ByteReader in(bytes);
     EXPECT_EQ(in.U8(), 0x01);
     EXPECT_EQ(in.U16(), 0x0302);
     EXPECT_EQ(in.U32(), 0x07060504U);
+    EXPECT_EQ(in.U24(), 0x0A0908U);
     EXPECT_TRUE(in.ok());
-    EXPECT_EQ(in.U16(), 0x0008);
+    EXPECT_EQ(in.U16(), 0x000B);
     EXPECT_FALSE(in.ok());
     in.Skip(0);
     EXPECT_EQ(in.U8(), 0);

@@ -39,8 +39,7 @@ std::string PrintableRuns(std::span<const std::uint8_t> bytes) {
 
 std::string OemTimestampedText(std::span<const std::uint8_t> bytes) {
     ByteReader in(bytes);
-    const unsigned low = in.U16();
-    const unsigned manufacturer = low | static_cast<unsigned>(in.U8()) << 16;
+    const std::uint32_t manufacturer = in.U24();
     if (!in.ok()) return OemPlainText(bytes);
     return Format("Manufacturer ID: %u (0x%06X). OEM data: ", manufacturer, manufacturer) +
            HexBytes(bytes.subspan(3));
