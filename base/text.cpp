@@ -96,12 +96,12 @@ bool isPrintable(std::string text) {
 
 std::string GetPrintableString(std::string text) {
     constexpr std::string_view kMemoryCard = "Memory Card";
-    constexpr std::size_t kMost = 100;
+    constexpr std::size_t kMaxLength = 100;
     // Room for a blank and one digit after the words.
     if (text.find(kMemoryCard) != std::string::npos) return text.substr(0, kMemoryCard.size() + 2);
     std::string clean;
     for (const char c : text) {
-        if (static_cast<signed char>(c) > 31 && clean.size() < kMost) clean += c;
+        if (static_cast<signed char>(c) > 31 && clean.size() < kMaxLength) clean += c;
     }
     return clean;
 }

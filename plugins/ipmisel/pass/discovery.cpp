@@ -102,7 +102,7 @@ bool AnyStringHas(int type, std::string_view marker) {
 
 constexpr std::size_t kDeviceRecordRoom = 1024;
 
-/// What DiscoverBMC found, as the log says it; null when there is a BMC.
+/// Whether the machine has a BMC record; `finding` is what the log says of it.
 bool HasIpmiDevice(const SmbiosReader& reader, const char** finding) {
     if (!reader.ok()) {
         *finding = "Unable to read BMC type from SMBIOS. Invalid Handle was encountered.";

@@ -13,15 +13,15 @@ using namespace ipmisel;
 
 namespace {
 
-/// Compatibility: told to the transport as the reply's room, although the buffer ends earlier
-/// (Bounds.RoomThatIsToldTheTransport).
-constexpr int kToldLength = IPMIFRULocator::kFruDataLength;
+/// Compatibility: the room for the reply as the transport is given it, although the buffer ends
+/// earlier (Bounds.RoomThatIsClaimedForTheReply).
+constexpr int kClaimedLength = IPMIFRULocator::kFruDataLength;
 
 constexpr IPMICommand FruCommand(std::uint8_t command, const char* sendFailure,
                                  const char* errorPrefix) {
     return {.command = command,
             .bufferName = "fRspBuf",
-            .length = kToldLength,
+            .length = kClaimedLength,
             .sendFailure = sendFailure,
             .errorPrefix = errorPrefix,
             .errorSeverity = kInfo};

@@ -48,8 +48,8 @@ IPMICommand CommandOf(const FirmwareQuery& query) {
     return command;
 }
 
-/// The numbers with points between.
-std::string Pointed(std::span<const std::uint8_t> bytes) {
+/// The numbers with dots between.
+std::string Dotted(std::span<const std::uint8_t> bytes) {
     std::string text;
     for (const std::uint8_t byte : bytes) text += Format(text.empty() ? "%u" : ".%u", byte);
     return text;
@@ -72,8 +72,7 @@ std::optional<DeviceID> ReadDeviceID(std::span<const std::uint8_t> answer) {
     device.majorVersion = in.U8() & kMajorVersion;
     device.minorVersion = in.U8();
     in.Skip(2);  // IPMI version, device support
-    const std::uint32_t low = in.U16();
-    const std::uint32_t manufacturer = low | static_cast<std::uint32_t>(in.U8()) << 16;
+    const std::uint32_t manufacturer = in.U24();
     const std::uint16_t product = in.U16();
     if (answer.size() >= kManufacturerEnd) device.manufacturer = manufacturer & kManufacturer;
     if (answer.size() >= kProductEnd) device.product = product;
@@ -92,7 +91,7 @@ std::string VersionText(const FirmwareQuery& query, std::span<const std::uint8_t
     const auto version = query.versionLength == 0 ? rest : rest.first(query.versionLength);
     switch (query.form) {
         case VersionForm::kMajorMinor:
-            return Pointed(version);
+            return Dotted(version);
         case VersionForm::kHex:
             return HexText(version, HexCase::kUpper);
         case VersionForm::kText:

@@ -87,7 +87,7 @@ TEST(Bounds, ClaimedLengthsAreBelievedAsFarAsTheBufferReaches) {
     }
 }
 
-TEST(Bounds, RoomThatIsToldTheTransport) {
+TEST(Bounds, RoomThatIsClaimedForTheReply) {
     NQORTQR20::SPLibrary library(nullptr);
     gReply = {0};
     IPMIRequestFRULocator(&library).IPMIReserveSDR(nullptr);
