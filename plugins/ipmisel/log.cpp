@@ -1,6 +1,7 @@
 #include "plugins/ipmisel/log.h"
 
 #include <exception>
+#include <new>
 
 namespace ipmisel {
 
@@ -11,8 +12,11 @@ TraceScope::TraceScope(const char* name, const Words& words)
 
 TraceScope::~TraceScope() {
     if (ended_ || std::uncaught_exceptions() > exceptions_) return;
-    if (LogEnabled(words_.severity)) {
+    if (!LogEnabled(words_.severity)) return;
+    try {
         WriteLog(words_.severity, std::string(name_) + words_.completed);
+    } catch (const std::bad_alloc&) {
+        // No exception may leave a destructor: the line is lost, and the pass goes on.
     }
 }
 

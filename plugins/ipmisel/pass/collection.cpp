@@ -106,10 +106,10 @@ public:
 };
 
 /// Creates one object of a node; `name` is how the log calls it.
-template <typename Object, typename... Arguments>
-std::unique_ptr<Object> Create(const char* name, Arguments... arguments) {
+template <typename Pointer, typename... Arguments>
+void Create(Pointer* object, const char* name, Arguments... arguments) {
     try {
-        return std::make_unique<Object>(arguments...);
+        *object = std::make_unique<typename Pointer::element_type>(arguments...);
     } catch (const std::bad_alloc&) {
         WriteLog(kError, std::string("Could not allocate memory for ") + name + ".");
         throw SectionFailure{NQORTQR20::kStatusNoMemory};
@@ -118,17 +118,17 @@ std::unique_ptr<Object> Create(const char* name, Arguments... arguments) {
 
 void CreateObjects(Node* node) {
     NodeObjects& objects = node->objects;
-    objects.sdr = Create<IPMIRequestSDR>("ipmi_sdrp", node->library);
+    Create(&objects.sdr, "ipmi_sdrp", node->library);
     // Compatibility: the log calls both requests by one name
     // (Pass.ObjectThatCannotBeCreatedEndsThePass).
-    objects.sel = Create<IPMIRequestSEL>("ipmi_sdrp", node->library);
-    objects.vpd = Create<IPMIRequestVPD>("ipmi_vpdp", node->library);
-    objects.auxLog = Create<IPMIRequestAuxLog>("ipmi_auxlogp", node->library);
-    objects.sdrHead = Create<IPMISDREntry>("ipmi_sdr_headp");
-    objects.mapping = Create<IPMIMapping>("ipmi_mappingp");
-    objects.selEntry = Create<IPMISELEntry>("ipmi_selentryp");
-    objects.vpdEntry = Create<IPMIVPDEntry>("ipmi_vpdentryp");
-    objects.sdrCache = Create<OwnedSDRCache>("sdr_listp", node->context);
+    Create(&objects.sel, "ipmi_sdrp", node->library);
+    Create(&objects.vpd, "ipmi_vpdp", node->library);
+    Create(&objects.auxLog, "ipmi_auxlogp", node->library);
+    Create(&objects.sdrHead, "ipmi_sdr_headp");
+    Create(&objects.mapping, "ipmi_mappingp");
+    Create(&objects.selEntry, "ipmi_selentryp");
+    Create(&objects.vpdEntry, "ipmi_vpdentryp");
+    Create(&objects.sdrCache, "sdr_listp", node->context);
 }
 
 bool Wants(std::span<const char* const> classNames, std::string_view className) {

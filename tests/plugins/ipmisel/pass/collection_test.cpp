@@ -1,8 +1,11 @@
 #include "plugins/ipmisel/pass/collection.h"
 
 #include <cstdlib>
+#include <cstring>
+#include <memory>
 #include <new>
 
+#include "plugins/ipmisel/log.h"
 #include "plugins/ipmisel/records/sdr_entry.h"
 #include "plugins/ipmisel/requests/request_aux_log.h"
 #include "plugins/ipmisel/requests/request_sdr.h"
@@ -13,11 +16,15 @@
 namespace {
 int gRefusals = 0;  // so many allocations fail that have gRefusedSize
 std::size_t gRefusedSize = 0;
+std::size_t gArmingSize = 0;  // none fails before one of this size, where it is not 0
+std::size_t gLastSize = 0;    // of the allocation before
 }  // namespace
 
 // Not inlined: the compiler would take the two for a pair that does not match.
 [[gnu::noinline]] void* operator new(std::size_t size) {
-    if (gRefusals > 0 && size == gRefusedSize) {
+    gLastSize = size;
+    if (size == gArmingSize) gArmingSize = 0;
+    if (gRefusals > 0 && gArmingSize == 0 && size == gRefusedSize) {
         --gRefusals;
         throw std::bad_alloc();
     }
@@ -235,18 +242,26 @@ TEST_F(Pass, FruAndFirmwareAreReadInBandOnly) {
     }
 }
 
+/// What a shared pointer takes beside the object that it takes over.
+std::size_t SizeOfSharing() {
+    const std::shared_ptr<IPMIRequestAuxLog> shared = std::make_unique<IPMIRequestAuxLog>(nullptr);
+    return gLastSize;
+}
+
 TEST_F(Pass, ObjectThatCannotBeCreatedEndsThePass) {
     const struct {
         std::size_t size;
         const char* name;
         int status = 4;
         int refusals = 100;
+        std::size_t armingSize = 0;
     } cases[] = {
         {sizeof(IPMIVPDEntry), "fIpmiVpdentryFru", 3, 1},  // its line may have that size, too
         {sizeof(IPMIRequestSDR), "ipmi_sdrp"},
         {sizeof(IPMIRequestSEL), "ipmi_sdrp"},
         {sizeof(IPMIRequestVPD), "ipmi_vpdp"},
         {sizeof(IPMIRequestAuxLog), "ipmi_auxlogp"},
+        {SizeOfSharing(), "ipmi_auxlogp", 4, 100, sizeof(IPMIRequestAuxLog)},
         {sizeof(IPMISDREntry), "ipmi_sdr_headp"},
     };
     Collect({});
@@ -255,6 +270,7 @@ TEST_F(Pass, ObjectThatCannotBeCreatedEndsThePass) {
         log.Clear();
         const NQORTQR20::OutputHandle output(written);
         gRefusedSize = c.size;
+        gArmingSize = c.armingSize;
         gRefusals = c.refusals;
         const int status = IPMISELGetData(context.get(), output.get(), nullptr, 0).code;
         gRefusals = 0;
@@ -263,6 +279,17 @@ TEST_F(Pass, ObjectThatCannotBeCreatedEndsThePass) {
                     ElementsAre(std::string("Could not allocate memory for ") + c.name + "."));
         EXPECT_EQ(ipmisel::Module().fIpmiVpdentryFru, nullptr);
     }
+}
+
+TEST_F(Pass, CompletedLineForWhichThereIsNoMemoryIsLost) {
+    constexpr const char* kName = "IPMIRequestSEL::IPMIGetSELInfo()";
+    {
+        const ipmisel::TraceScope trace(kName);
+        gRefusedSize = std::strlen(kName) + 1;
+        gRefusals = 1;
+    }
+    EXPECT_EQ(gRefusals, 0);
+    EXPECT_THAT(log.Lines(4), ElementsAre(std::string(kName) + " entered."));
 }
 
 }  // namespace
