@@ -22,7 +22,7 @@ LanPlace ParseLanPlace(const std::string& place) {
     std::string port(kRmcpPort);
     const auto bracket = place.rfind(']');
     const auto colon = place.find(':', bracket == std::string::npos ? 0 : bracket);
-    if (place.front() == '[' && bracket == std::string::npos) {
+    if (place.starts_with('[') && bracket == std::string::npos) {
         RefusePlace(place, "the address has no closing bracket");
     }
     if (colon != std::string::npos) {

@@ -1,6 +1,7 @@
 #include "plugins/ipmisel/export/message_log.h"
 
-#include <initializer_list>
+#include <memory>
+#include <utility>
 
 #include "plugins/ipmisel/class_names.h"
 
@@ -13,25 +14,32 @@ namespace {
 
 constexpr const char* kLogName = "MessageLogEntry";
 
-/// An object path with one key; given back to the host with the object.
-class Reference {
-public:
-    Reference(fdriIOHandle* output, const char* className, const char* key, const char* value) {
-        NQORTQR20::fdrNewCIMReference(&reference_, output);
-        NQORTQR20::fdrSetReferenceClassName(reference_, className);
-        NQORTQR20::fdrReferenceAddString(reference_, key, value);
-    }
-    ~Reference() {
-        if (reference_ != nullptr) NQORTQR20::fdrDeleteCIMReference(reference_);
-    }
-    Reference(const Reference&) = delete;
-    Reference& operator=(const Reference&) = delete;
-
-    TCIMReference* get() const { return reference_; }
-
-private:
-    TCIMReference* reference_ = nullptr;
+struct DeleteReference {
+    void operator()(TCIMReference* reference) const { NQORTQR20::fdrDeleteCIMReference(reference); }
 };
+/// An object path; given back to the host with the object.
+using Reference = std::unique_ptr<TCIMReference, DeleteReference>;
+
+Reference NewReference(fdriIOHandle* output) {
+    TCIMReference* reference = nullptr;
+    NQORTQR20::fdrNewCIMReference(&reference, output);
+    return Reference(reference);
+}
+
+void SetPath(const Reference& reference, const char* className, const char* key,
+             const char* value) {
+    NQORTQR20::fdrSetReferenceClassName(reference.get(), className);
+    NQORTQR20::fdrReferenceAddString(reference.get(), key, value);
+}
+
+/// Fills and closes the open association.
+void Associate(fdriIOHandle* output, const Reference& log, Reference record, const char* recordId) {
+    SetPath(record, ipmisel::kLogRecordClass, "RecordID", recordId);
+    NQORTQR20::fdrAddReferenceProperty(output, "MessageLog", log.get());
+    NQORTQR20::fdrAddReferenceProperty(output, "LogRecord", record.get());
+    record.reset();
+    NQORTQR20::fdrAddInstance(output);
+}
 
 }  // namespace
 
@@ -44,17 +52,14 @@ int ExportMessageLog(TCPluginCallbacks* /*context*/, fdriIOHandle* output) {
 }
 
 int ExportReferences(TCPluginCallbacks* /*context*/, fdriIOHandle* output) {
-    const Reference log(output, kMessageLogClass, "Name", kLogName);
     // Compatibility: the records 1 and 2 whatever the log holds
     // (MessageLog.TwoReferencesWhateverTheLogHolds).
-    for (const char* recordId : {"1", "2"}) {
-        NQORTQR20::fdrGetInstance(output, ipmisel::kRecordInLogClass);
-        {
-            const Reference record(output, ipmisel::kLogRecordClass, "RecordID", recordId);
-            NQORTQR20::fdrAddReferenceProperty(output, "MessageLog", log.get());
-            NQORTQR20::fdrAddReferenceProperty(output, "LogRecord", record.get());
-        }
-        NQORTQR20::fdrAddInstance(output);
-    }
+    const Reference log = NewReference(output);
+    Reference record = NewReference(output);
+    NQORTQR20::fdrGetInstance(output, ipmisel::kRecordInLogClass);
+    SetPath(log, kMessageLogClass, "Name", kLogName);
+    Associate(output, log, std::move(record), "1");
+    NQORTQR20::fdrGetInstance(output, ipmisel::kRecordInLogClass);
+    Associate(output, log, NewReference(output), "2");
     return 0;
 }
