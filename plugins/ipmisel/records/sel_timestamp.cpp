@@ -14,7 +14,9 @@ using NQORTQR20::TCPluginCallbacks;
 namespace ipmisel {
 namespace {
 
-/// Time stamps up to here count from the initialisation of the BMC (IPMI 2.0, 37.1).
+/// Time stamps up to here are traced as counted from the initialisation of the BMC. Compatibility:
+/// the standard counts 0x20000000 among them (IPMI 2.0, 37.1), the trace line does not
+/// (Timestamp.IsTheCalendarTimeWithTheLocalOffset).
 constexpr std::int64_t kLastBeforeInitialisation = 0x1FFFFFFF;
 
 }  // namespace

@@ -140,12 +140,11 @@ std::string FindNumberedText(std::string_view contents, int number, std::size_t 
 std::optional<std::string> NumberedText(NQORTQR20::TCPluginCallbacks* context, int number,
                                         std::size_t capacity) {
     const char* pluginPath = nullptr;
-    if (NQORTQR20::fdrGetPluginPath(context, &pluginPath).code != NQORTQR20::kStatusOk ||
-        pluginPath == nullptr) {
+    if (NQORTQR20::fdrGetPluginPath(context, &pluginPath).code != NQORTQR20::kStatusOk) {
         WriteLog(kError, "fdrGetPluginPath failed.");
         return std::nullopt;
     }
-    std::string path(pluginPath);
+    std::string path(pluginPath == nullptr ? "" : pluginPath);
     // The last one: the tree that the plug-in stands in may have the word in its own path.
     const std::size_t name = path.rfind("ipmisel");
     if (name == std::string::npos) {

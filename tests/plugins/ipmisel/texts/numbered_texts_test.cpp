@@ -1,6 +1,9 @@
 #include "plugins/ipmisel/texts/numbered_texts.h"
 
+#include <dlfcn.h>
+
 #include <algorithm>
+#include <optional>
 
 #include "tests/plugins/ipmisel/texts/mapping_fixture.h"
 
@@ -8,6 +11,26 @@ namespace {
 
 using ipmiseltest::TextFolder;
 using ::testing::ElementsAre;
+
+/// The path that the host gives, when it is not its own.
+std::optional<const char*> gPath;
+
+}  // namespace
+
+/// In place of the host's own, to which it leads on.
+NQORTQR20::TTQRStatusCode NQORTQR20::fdrGetPluginPath(TCPluginCallbacks* context,
+                                                      const char** path) {
+    if (gPath) {
+        *path = *gPath;
+        return {kStatusOk};
+    }
+    using Operation = TTQRStatusCode (*)(TCPluginCallbacks*, const char**);
+    static const auto next = reinterpret_cast<Operation>(
+        dlsym(RTLD_NEXT, "_ZN9NQORTQR2016fdrGetPluginPathEPNS_17TCPluginCallbacksEPPKc"));
+    return next(context, path);
+}
+
+namespace {
 
 TEST(NumberedTexts, LookupRules) {
     const auto filler = [](std::size_t length, const char* rest) {
@@ -137,6 +160,22 @@ TEST(GetString, LogsWhyThereIsNoTextAndLeavesTheBufferEmpty) {
     EXPECT_EQ(log.Lines(0).back(), "Could not find data_number 7");
     EXPECT_EQ(log.Lines(3).back(),
               "Path found for ipmisel INI file: " + (texts.path() / "ipmisel.INI").string());
+}
+
+TEST(GetString, NeedsThePlugInsWordInThePath) {
+    const TextFolder folder("7=seven\n");
+    const NQORTQR20::PluginContext context(folder.path());
+    IPMIMapping mapping;
+    for (const char* const path : {static_cast<const char*>(nullptr), "", "/usr/lib/ipmi/sel"}) {
+        const ipmiseltest::LogRecorder log;
+        char out[16] = "stale";
+        gPath = path;
+        EXPECT_NE(mapping.GetString(context.get(), 7, out, sizeof out), 0);
+        gPath.reset();
+        EXPECT_STREQ(out, "");
+        EXPECT_THAT(log.All(),
+                    ElementsAre(::testing::Pair(1, "Path not found for ipmisel INI file.")));
+    }
 }
 
 TEST(GetString, ReadsTheFileAnewAndKeepsNoDescriptor) {
