@@ -1,6 +1,9 @@
 # What `cmake --install` puts where. The program finds its libraries and the plug-in from its own
 # place, so that the whole may go under any prefix and be moved afterwards.
 install(TARGETS ipmisel RUNTIME DESTINATION bin)
+if(TARGET ipmisel-simulator)
+  install(TARGETS ipmisel-simulator RUNTIME DESTINATION bin)
+endif()
 install(TARGETS tqrcore spdriver smbios ipmisel_plugin ipmistandard_plugin
         LIBRARY DESTINATION lib/ipmisel)
 install(DIRECTORY include/tqr DESTINATION include)

@@ -5,9 +5,7 @@
 #include <csignal>
 #include <exception>
 #include <new>
-#include <numeric>
 #include <string>
-#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -22,6 +20,7 @@
 #include "program/commands/failure.h"
 #include "program/commands/out_of_memory.h"
 #include "program/commands/report.h"
+#include "program/commands/unknown_words.h"
 #include "program/commands/watch.h"
 #include "program/reports/terminal_text.h"
 
@@ -32,38 +31,6 @@ namespace {
 constexpr Command (*kCommands[])(CLI::App* program) = {
     AddCollectCommand, AddReportCommand, AddDiffCommand,   AddCheckCommand,
     AddWatchCommand,   AddAckCommand,    AddDoctorCommand, AddClassesCommand};
-
-/// Letters to put in, take out or change to make one word the other.
-std::size_t Distance(std::string_view a, std::string_view b) {
-    std::vector<std::size_t> row(b.size() + 1);
-    std::iota(row.begin(), row.end(), 0U);
-    for (std::size_t i = 1; i <= a.size(); ++i) {
-        std::size_t diagonal = std::exchange(row[0], i);
-        for (std::size_t j = 1; j <= b.size(); ++j) {
-            const std::size_t changed = diagonal + (a[i - 1] == b[j - 1] ? 0 : 1);
-            diagonal = row[j];
-            row[j] = std::min({row[j] + 1, row[j - 1] + 1, changed});
-        }
-    }
-    return row.back();
-}
-
-/// The first word is a command, unless it is an option of the program's own.
-void RefuseUnknownCommand(const std::vector<Command>& commands, int argc, char** argv) {
-    if (argc < 2 || argv[1][0] == '-') return;
-    const std::string word = std::string(argv[1]).substr(0, 64);
-    std::string known;
-    std::string near;
-    for (const Command& command : commands) {
-        const std::string name = command.arguments->get_name();
-        if (name == argv[1]) return;
-        known += (known.empty() ? "" : ", ") + name;
-        if (near.empty() && Distance(word, name) <= 2) near = name;
-    }
-    throw Failure(kExitUsage, "there is no command \"" + word + "\"; " +
-                                  (near.empty() ? "" : "did you mean " + near + "? ") +
-                                  "There are " + known);
-}
 
 std::string OwnError(const std::exception& error) {
     if (dynamic_cast<const std::bad_alloc*>(&error) != nullptr) {
@@ -95,17 +62,21 @@ int Run(int argc, char** argv) {
                       "no command is named; ipmisel collect reads this machine, "
                       "ipmisel --help lists the others");
     }
-    RefuseUnknownCommand(commands, argc, argv);
+    RefuseUnknownCommand(commands, app, argc, argv);
     try {
         app.parse(argc, argv);
     } catch (const CLI::Success& wanted) {  // help or version
         return app.exit(wanted);
     } catch (const CLI::ParseError& error) {
         const auto command = named();
+        const bool isUnexpected = dynamic_cast<const CLI::ExtrasError*>(&error) != nullptr;
         const Failure failure(
             kExitUsage,
-            std::string(error.what()) + "; see ipmisel " +
-                (command == commands.end() ? "" : command->arguments->get_name() + " ") + "--help");
+            isUnexpected && command != commands.end()
+                ? AboutUnexpected(*command->arguments, app.remaining(true))
+                : std::string(error.what()) + "; see ipmisel " +
+                      (command == commands.end() ? "" : command->arguments->get_name() + " ") +
+                      "--help");
         if (command == commands.end() || !command->fail) throw failure;
         return command->fail(failure);
     }

@@ -1,5 +1,5 @@
-// ipmisel-simulator: BMCs of simulated servers behind UDP ports of 127.0.0.1, for tests and
-// measurements. User root, password secret.
+// ipmisel-simulator: BMCs of simulated servers behind UDP ports of 127.0.0.1. User root, password
+// secret.
 
 #include <poll.h>
 #include <sys/resource.h>
@@ -29,6 +29,8 @@ using ipmisim::Packet;
 
 constexpr unsigned kLongestLog = 65534;  // record IDs 1 to FFFEh
 
+constexpr int kExitFailed = 1, kExitUsage = 2;
+
 volatile std::sig_atomic_t gEnded = 0;
 
 struct Options {
@@ -43,6 +45,12 @@ struct Options {
     unsigned seed = 1;
     double latency = 0;
 };
+
+/// A number in this range, of which the help has no more to say.
+template <typename Number>
+CLI::Validator Between(Number min, Number max) {
+    return CLI::Range(min, max).description("");
+}
 
 /// A log of so many power supply events, one a second.
 std::vector<std::array<std::uint8_t, 16>> MakeLog(unsigned records) {
@@ -123,32 +131,61 @@ void Serve(const std::vector<std::unique_ptr<BmcPort>>& ports) {
 int main(int argc, char** argv) {
     Options options;
     CLI::App app(
-        "BMCs of simulated servers behind UDP ports of 127.0.0.1 (user root, password "
-        "secret)",
+        "Management controllers (BMC) of a simulated server behind UDP ports of 127.0.0.1, which "
+        "speak IPMI "
+        "2.0 (RMCP+): user root, password secret.",
         "ipmisel-simulator");
     app.add_option("--server", options.server,
-                   "description of a simulated server; else empty BMCs");
-    app.add_option("--records", options.records, "a made-up log of so many records instead")
-        ->check(CLI::Range(0U, kLongestLog));
-    app.add_option("--controllers", options.controllers, "how many BMCs, one port each")
-        ->check(CLI::Range(1U, 60000U))
+                   "The file that describes the server; without it a BMC has an empty log and "
+                   "nothing else")
+        ->type_name("FILE");
+    app.add_option("--records", options.records,
+                   "A made-up log of N records instead of the server's")
+        ->type_name("N")
+        ->check(Between(0U, kLongestLog));
+    app.add_option("--controllers", options.controllers, "How many BMCs, one per port")
+        ->type_name("N")
+        ->check(Between(1U, 60000U))
         ->capture_default_str();
-    app.add_option("--port", options.port, "of the first; 0 takes any")
-        ->check(CLI::Range(0U, 65535U))
+    app.add_option("--port", options.port, "UDP port of the first BMC; 0 takes any that are free")
+        ->type_name("N")
+        ->check(Between(0U, 65535U))
         ->capture_default_str();
-    app.add_option("--silent", options.silent, "so many of them, the last, answer nothing");
-    app.add_option("--cipher-suite", options.suite, "the only one that they have")
-        ->check(CLI::IsMember({1, 2, 3, 15, 16, 17}))
+    app.add_option("--silent", options.silent, "The last N of them answer nothing")->type_name("N");
+    app.add_option("--cipher-suite", options.suite, "The only one that they have")
+        ->type_name("N")
+        ->check(CLI::IsMember({1, 2, 3, 15, 16, 17}).description("1, 2, 3, 15, 16 or 17"))
         ->capture_default_str();
-    app.add_option("--delay", options.delay, "milliseconds of a round trip")
-        ->check(CLI::Range(0.0, 60000.0));
+    app.add_option("--delay", options.delay, "What the network adds to a round trip")
+        ->type_name("MILLISECONDS")
+        ->check(Between(0.0, 60000.0));
     app.add_option("--latency", options.latency,
-                   "milliseconds that a BMC takes for a request, one at a time")
-        ->check(CLI::Range(0.0, 60000.0));
-    app.add_option("--loss", options.loss, "percent of the packets, each way, that get lost")
-        ->check(CLI::Range(0.0, 100.0));
-    app.add_option("--seed", options.seed, "of what is lost")->capture_default_str();
-    CLI11_PARSE(app, argc, argv);
+                   "How long a BMC takes for a request, one at a time")
+        ->type_name("MILLISECONDS")
+        ->check(Between(0.0, 60000.0));
+    app.add_option("--loss", options.loss, "How many packets of a hundred get lost, each way")
+        ->type_name("PERCENT")
+        ->check(Between(0.0, 100.0));
+    app.add_option("--seed", options.seed, "Another one loses other packets")
+        ->type_name("N")
+        ->capture_default_str();
+    app.footer(
+        "It writes the place of each BMC on a line, as --from of ipmisel takes it, and serves "
+        "until "
+        "Ctrl-C or\nSIGTERM:\n"
+        "  ipmisel-simulator --server examples/rack-server.json &\n"
+        "  IPMISEL_PASSWORD=secret ipmisel collect --from lan:127.0.0.1:6230 --user root\n");
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::Success& wanted) {  // help
+        return app.exit(wanted);
+    } catch (const CLI::ParseError& error) {
+        const auto unexpected = app.remaining();
+        std::cerr << "ipmisel-simulator: "
+                  << (unexpected.empty() ? error.what() : "does not expect " + unexpected.front())
+                  << "; see ipmisel-simulator --help\n";
+        return kExitUsage;
+    }
     options.silent = std::min(options.silent, options.controllers);
     for (const int signal : {SIGINT, SIGTERM}) std::signal(signal, [](int) { gEnded = 1; });
     rlimit limit{};
@@ -163,7 +200,7 @@ int main(int argc, char** argv) {
         Serve(ports);
     } catch (const std::exception& error) {
         std::cerr << "ipmisel-simulator: " << error.what() << "\n";
-        return 1;
+        return kExitFailed;
     }
     return 0;
 }

@@ -5,7 +5,7 @@ usage: make_pages.py PROGRAM FOLDER      pages in FOLDER/man1, man5 and man7; ne
 
 A document's first heading goes, its other headings go up by one level, a link to another page becomes its name,
 any other its text, and a table of more columns than a terminal holds becomes a list. Of each command that PROGRAM
-lists there is a page, made of what the command says with --help.
+lists there is a page, made of what the command says with --help; so there is of ipmisel-simulator beside it.
 """
 import email.utils
 import pathlib
@@ -112,6 +112,12 @@ def command_page(program, command, what, version):
     return page.replace(f"ipmisel {command} \\-", f"ipmisel\\-{command} \\-", 1)
 
 
+def simulator_page(simulator, version):
+    page = run("help2man", "-N", "--no-discard-stderr", "-n", "simulated management controllers (BMC) behind network ports",
+               f"--version-string={version}", simulator)
+    return re.sub(r"^\.TH .*$", f'.TH ipmisel\\-simulator 1 "{release_date()}" "ipmisel {version}"', page, 1, re.MULTILINE)
+
+
 def main():
     program, folder = sys.argv[1], pathlib.Path(sys.argv[2])
     version = run(program, "--version").split()[-1]
@@ -121,6 +127,9 @@ def main():
             pages[f"{name}.{section}"] = document_page(DOCS / document, name, section, what, version)
     for command, what in commands(program):
         pages[f"ipmisel-{command}.1"] = command_page(program, command, what, version)
+    simulator = pathlib.Path(program).with_name("ipmisel-simulator")
+    if simulator.exists():  # a build without access over the network has none
+        pages["ipmisel-simulator.1"] = simulator_page(simulator, version)
     for name, page in pages.items():
         place = folder / f"man{name[-1]}" / name
         place.parent.mkdir(parents=True, exist_ok=True)

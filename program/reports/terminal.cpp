@@ -54,8 +54,9 @@ bool Pager::Start() {
     if (process_ >= 0 || isatty(STDOUT_FILENO) != 1 || IsDumb()) return process_ > 0;
     std::string pager = Environment("IPMISEL_PAGER");
     if (pager.empty()) pager = Environment("PAGER");
-    if (pager.empty()) pager = "less";
     if (pager == "cat") return false;
+    // Who named no pager is told nothing of one that is missing.
+    if (pager.empty()) pager = "command -v less >/dev/null && less";
     int ends[2];
     if (pipe2(ends, O_CLOEXEC) != 0) return false;
     // Through the shell, since PAGER may have arguments; without the pager the text goes on as it

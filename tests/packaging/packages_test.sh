@@ -34,7 +34,7 @@ while read -r file; do
     *) binaries=$((binaries + 1)) ;;
     esac
 done < <(find "$work/tree" -type f)
-[ "$binaries" -eq 6 ] || fail "$binaries binaries instead of 6"
+[ "$binaries" -eq 7 ] || fail "$binaries binaries instead of 7"
 python3 - "$work/tree" <<'PY'
 import pathlib, re, sys
 root = pathlib.Path(sys.argv[1])
@@ -71,6 +71,7 @@ inside "$root" sh -c 'apt-get -qq install -y --no-install-recommends /tmp/packag
 report=$(inside "$root" ipmisel collect --from sim:/usr/share/doc/ipmisel-simulator/examples/rack-server.json)
 [[ $report == *"DIMM 5: uncorrectable memory error"* ]] || fail "the installed program says: $report"
 inside "$root" gzip -t /usr/share/man/man1/ipmisel.1.gz /usr/share/man/man1/ipmisel-collect.1.gz \
+    /usr/share/man/man1/ipmisel-simulator.1.gz \
     /usr/share/man/man5/ipmisel.conf.5.gz /usr/share/man/man5/ipmisel-simulated-server.5.gz
 inside "$root" bash -c '. /usr/share/bash-completion/completions/ipmisel && complete -p ipmisel >/dev/null'
 inside "$root" python3 -c 'import ipmisel

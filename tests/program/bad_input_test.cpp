@@ -77,6 +77,16 @@ TEST_F(BadInput, WrongUsage) {
     ExpectRefused({"colect"}, 2,
                   "no command \"colect\"; did you mean collect? There are collect, ");
     ExpectRefused({"frobnicate"}, 2, "no command \"frobnicate\"; There are collect, ");
+    ExpectRefused({"--verison"}, 2, "no option \"--verison\"; did you mean --version? see ");
+    ExpectRefused({"--from", "sim:x"}, 2,
+                  "--from belongs behind a command, such as ipmisel collect");
+    ExpectRefused(
+        {"collect", "-o", "/dev/null"}, 2,
+        "collect has no option \"-o\"; did you mean --output? see ipmisel collect --help");
+    ExpectRefused({"collect", "plan", "--form=json"}, 2, "did you mean --format or --from? see");
+    ExpectRefused({"collect", "--no-such=1"}, 2, "no option \"--no-such\"; see ipmisel collect");
+    ExpectRefused({"collect", "lan:bmc17"}, 2, "\"lan:bmc17\"; did you mean --from lan:bmc17? ");
+    ExpectRefused({"doctor", "inband", "bmc17"}, 2, "doctor does not expect \"bmc17\"; see ");
     ExpectRefused({"collect", "--from", "tape:0"}, 2, "there is no source \"tape:0\"");
     ExpectRefused({"collect", "--from", "sim:"}, 2, "names no place");
 }

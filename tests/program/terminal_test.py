@@ -9,6 +9,7 @@ import pathlib
 import pty
 import re
 import select
+import shutil
 import signal
 import struct
 import subprocess
@@ -161,6 +162,15 @@ class Table(unittest.TestCase):
                 self.assertEqual(terminal.process.wait(20), 0)
         self.assertEqual(self.table(PAGER="sed s/^/PAGED:/").count("PAGED:"), len(self.table("--no-pager").splitlines()))
         self.assertNotIn("PAGED", self.table("--no-pager", PAGER="sed s/^/PAGED:/"))
+
+    def test_is_written_plainly_without_a_pager_and_a_missing_one_is_named_only_to_who_chose_it(self):
+        with tempfile.TemporaryDirectory() as folder:
+            pathlib.Path(folder, "cat").symlink_to(shutil.which("cat"))
+            plain = self.table("--no-pager", rows=20)
+            self.assertEqual(self.table(rows=20, PATH=folder), plain)
+            chosen = self.table(rows=20, PATH=folder, PAGER="no-such-pager")
+            self.assertIn("no-such-pager", chosen)
+            self.assertTrue(chosen.endswith(plain), chosen[:200])
 
     def test_shows_fewer_events_when_that_is_wanted(self):
         def events(*arguments):

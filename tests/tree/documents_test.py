@@ -50,7 +50,7 @@ class Commands(unittest.TestCase):
         with tempfile.TemporaryDirectory() as name:
             folder = pathlib.Path(name)
             (folder / "examples").symlink_to(ROOT / "examples")
-            found = [words for words in commands(document, "ipmisel")
+            found = [words for words in commands(document, "ipmisel ")
                      if not {"|", "<", ">", "&&", "||"} & set(words)]
             for words in (on_this_machine(words, folder) for words in found):
                 ended = subprocess.run([PROGRAM, *words[1:]], cwd=folder, capture_output=True, text=True,
@@ -136,6 +136,20 @@ class Commands(unittest.TestCase):
         self.assertEqual(ended.returncode, 0, ended.stderr)
         self.assertEqual(re.findall(r"^WRONG +(.*?)  ", ended.stdout, re.MULTILINE), ["clock", "cipher suite 0"])
         self.assertIn("Fan 1: below the lower critical threshold", ended.stdout)
+
+    @unittest.skipUnless((PROGRAM.parent / "ipmisel-simulator").exists(), "built without access over the network")
+    def test_recipe_with_the_simulator(self):
+        lines = re.search(r"^((?:    .*\n)*    ipmisel-simulator .*\n(?:    .*\n)*)", (ROOT / "docs/manual.md").read_text(),
+                          re.MULTILINE)[1].replace("    ", "")
+        script = "trap 'kill $!' EXIT\n" + re.sub(
+            r"^(ipmisel-simulator .*) &$", r'\1 --port 0 >"$PLACE" &\nuntil [ -s "$PLACE" ]; do sleep 0.05; done', lines,
+            flags=re.MULTILINE).replace("lan:127.0.0.1:6230", "$(cat $PLACE)")
+        with tempfile.TemporaryDirectory() as folder:
+            ended = subprocess.run(["bash", "-c", script], cwd=ROOT / "examples", capture_output=True, text=True, timeout=120,
+                                   env={**os.environ, "PLACE": f"{folder}/place",
+                                        "PATH": f"{PROGRAM.parent}:{os.environ['PATH']}"})
+        self.assertEqual(ended.returncode, 0, ended.stderr)
+        self.assertIn("Memory Module 6: uncorrectable memory error", ended.stdout)
 
     def test_scripts_and_presets_that_are_named_exist(self):
         presets = {preset["name"] for preset in
