@@ -12,10 +12,9 @@
 // The inventory of a FRU device: Platform Management FRU Information Storage Definition 1.0,
 // revision 1.3. Clauses are of that document.
 //
-//   common header (8)   0 format version (1), then where each area begins, in eights of bytes, 0
-//   for
-//                       none: 1 internal use, 2 chassis, 3 board, 4 product, 5 multi-records;
-//                       6 zero, 7 checksum
+//   common header (8)   0 format version (1), then where each area begins, in eights of bytes,
+//                       0 for none: 1 internal use, 2 chassis, 3 board, 4 product,
+//                       5 multi-records; 6 zero, 7 checksum
 //   area (10 to 12)     0 format version, 1 length in eights of bytes; chassis: 2 type; board:
 //                       2 language, 3-5 minutes since 1996; product: 2 language; then fields, C1h,
 //                       zeros, checksum

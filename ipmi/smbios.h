@@ -32,8 +32,7 @@ std::string SmbiosString(std::span<const std::uint8_t> structure, std::size_t nu
 std::string SmbiosStringAt(std::span<const std::uint8_t> structure, std::size_t offset);
 
 /// Texts below are without padding, and empty where the firmware says in words that it does not
-/// know
-/// ("Not Specified", "To Be Filled By O.E.M." and the like).
+/// know ("Not Specified", "To Be Filled By O.E.M." and the like).
 struct SmbiosSystem {
     std::string manufacturer;
     std::string product;

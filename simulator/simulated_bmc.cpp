@@ -196,13 +196,12 @@ std::optional<Bytes> SimulatedBmc::GetPefParameter(const Request& request) {
     if (!description_.pefFilters) return std::nullopt;
     constexpr std::uint8_t kRevision = 0x11;
     constexpr std::uint8_t kRevisionOnly = 0x80;
-    constexpr std::uint8_t kParameterNotSupported = 0x80;  // table 30-4
     const auto& filters = *description_.pefFilters;
     Bytes answer{kCompleted, kRevision};
     const std::uint8_t parameter = request.data[0] & 0x7F;
     const std::size_t entry = request.data[1] & 0x7F;  // from 1
     if (parameter != ipmi::kPefEventFilterCount && parameter != ipmi::kPefEventFilter) {
-        return Bytes{kParameterNotSupported};
+        return Bytes{ipmi::kParameterNotSupported};
     }
     if ((request.data[0] & kRevisionOnly) != 0) return answer;
     if (parameter == ipmi::kPefEventFilterCount) {

@@ -36,7 +36,6 @@ private:
     };
 
     void FindSensors();
-    std::optional<std::size_t> PositionOf(const ipmi::Command& command) const;
     void AskedOfSensor(const ipmi::Command& command);
     void AppendFruChunks(std::size_t count, std::vector<ipmi::Command>* commands) const;
     void AppendSensors(std::size_t count, std::vector<ipmi::Command>* commands) const;

@@ -10,10 +10,13 @@ namespace NQORTQR20 {
 
 /// One read that brought nothing, or too little.
 struct ReadFault {
-    std::string what;     ///< the command, as the IPMI standard calls it
-    std::string record;   ///< record or FRU device ID, four hexadecimal digits; empty without one
+    std::string what;  ///< the command, as the IPMI standard calls it
+    /// Record ID, FRU device ID or a sensor's LUN and number: four hexadecimal digits; empty
+    /// without one.
+    std::string record;
     std::string problem;  ///< "no response", "completion code cb", "short answer", ...
-    bool ofLogOrSensors;  ///< else of a FRU device
+    /// Something of event log or sensor repository is missing; else of what is read beside them.
+    bool ofLogOrSensors;
     bool operator==(const ReadFault&) const = default;
 };
 /// What a node announced of a source, and what was read of it.

@@ -48,7 +48,7 @@ public:
 private:
     enum class Phase { kCompare, kLog, kSensors, kCheck, kLogAgain, kCheckAgain, kDone };
 
-    /// Asks without data and hands on the answer.
+    /// Asks and hands on the answer, as long as the reader is there.
     void Ask(ipmi::Command command, std::function<void(std::optional<Response>)> take);
     void Pump();
     void StartWhole();

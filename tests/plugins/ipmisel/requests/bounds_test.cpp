@@ -19,7 +19,7 @@ namespace {
 /// there were.
 std::vector<unsigned char> gReply;
 int gLength;
-int gToldLength;  // the reply's room, as the last request told it
+int gClaimedLength;  // the room for the reply, as the last request claimed it
 unsigned gSends;
 
 }  // namespace
@@ -32,7 +32,7 @@ SPLibrary::~SPLibrary() = default;
 bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSize, bool) {
     std::fill_n(buffer, bufferSize, static_cast<unsigned char>(0x51));
     buffer[frame::kCompletionCodeAt] = 0;
-    gToldLength = *length;
+    gClaimedLength = *length;
     std::copy(gReply.begin(), gReply.end(), buffer + frame::kResponseAt);
     buffer[26] = static_cast<unsigned char>(++gSends);
     *length = gLength;
@@ -91,9 +91,9 @@ TEST(Bounds, RoomThatIsClaimedForTheReply) {
     NQORTQR20::SPLibrary library(nullptr);
     gReply = {0};
     IPMIRequestFRULocator(&library).IPMIReserveSDR(nullptr);
-    EXPECT_EQ(gToldLength, 312);
+    EXPECT_EQ(gClaimedLength, 312);
     IPMIRequestSDR(&library).IPMIReserveSDR(nullptr);
-    EXPECT_EQ(gToldLength, 256);
+    EXPECT_EQ(gClaimedLength, 256);
 }
 
 TEST(Bounds, WalksThatNeverEndAreEnded) {
