@@ -387,6 +387,22 @@ TEST(EnterpriseName, IsFoundByItsNumberAlone) {
     EXPECT_EQ(EnterpriseName(1, file + "x"), "");
 }
 
+TEST(EnterpriseName, IsFoundAnywhereInALongListAndBehindItsOrder) {
+    const ipmiseltest::TemporaryFolder folder;
+    std::string list = "Decimal\n";
+    for (unsigned number = 0; number < 6000; number += 2) {
+        list += std::to_string(number) + "\n  N" + std::to_string(number) +
+                std::string(number % 50, '.') + "\n    7\n";
+    }
+    const std::string file = folder.Write("numbers", list + "7\n  Late\n");
+    for (unsigned number = 0; number < 6000; number += 2) {
+        EXPECT_EQ(EnterpriseName(number, file),
+                  "N" + std::to_string(number) + std::string(number % 50, '.'));
+    }
+    EXPECT_EQ(EnterpriseName(7, file), "Late");
+    EXPECT_EQ(EnterpriseName(3001, file), "");
+}
+
 // An event of the temperature of kServer, one of its BIOS, an OEM record, and a supply that is
 // gone.
 constexpr const char* kEvents = R"({"local_time": "20240305130000.000000+000", "bmcs": [{
