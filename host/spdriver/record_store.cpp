@@ -25,17 +25,23 @@ bool RecordStore::Add(std::uint16_t id, std::uint16_t next, std::span<const std:
     entries_.push_back(
         {static_cast<std::uint32_t>(used_), static_cast<std::uint16_t>(bytes.size()), next});
     used_ += bytes.size();
-    if (index_.empty()) index_.resize(kIds);
-    index_[id] = static_cast<std::uint32_t>(entries_.size());
+    Index(id) = static_cast<std::uint32_t>(entries_.size());
     ipmisel::ByteReader in(bytes);
     const std::uint16_t own = in.U16();
-    if (entries_.size() == 1 && in.ok()) index_[own] = 1;
+    if (entries_.size() == 1 && in.ok()) Index(own) = 1;
     return true;
 }
 
 std::optional<RecordStore::Record> RecordStore::Find(std::uint16_t id) const {
-    if (index_.empty() || index_[id] == 0) return std::nullopt;
-    return At(index_[id] - 1);
+    const Page* const page = index_[id / kPage].get();
+    if (page == nullptr || (*page)[id % kPage] == 0) return std::nullopt;
+    return At((*page)[id % kPage] - 1);
+}
+
+std::uint32_t& RecordStore::Index(std::uint16_t id) {
+    std::unique_ptr<Page>& page = index_[id / kPage];
+    if (!page) page = std::make_unique<Page>();
+    return (*page)[id % kPage];
 }
 
 RecordStore::Record RecordStore::At(std::size_t position) const {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <memory>
@@ -31,6 +32,8 @@ public:
     Record At(std::size_t position) const;
 
 private:
+    std::uint32_t& Index(std::uint16_t id);
+
     struct Entry {
         std::uint32_t at;
         std::uint16_t length;
@@ -40,7 +43,10 @@ private:
     std::vector<std::unique_ptr<std::uint8_t[]>> blocks_;
     std::size_t used_ = 0;  ///< of all blocks, gaps at their ends included
     std::vector<Entry> entries_;
-    std::vector<std::uint32_t> index_;  ///< by ID: position plus 1; 0 for none
+    /// By ID: position plus 1; 0 for none. In pages, as most stores use few IDs.
+    static constexpr std::size_t kPage = 256;
+    using Page = std::array<std::uint32_t, kPage>;
+    std::array<std::unique_ptr<Page>, 0x10000 / kPage> index_;
 };
 
 }  // namespace tqrhost
