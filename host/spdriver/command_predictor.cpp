@@ -10,7 +10,12 @@ namespace {
 
 constexpr std::size_t kChunkRead = 4;         // device, offset, count
 constexpr std::size_t kUnknownFruSize = 256;  // tried that far when nobody has asked for the size
+constexpr std::size_t kFarthest = 32;         // requests ahead of the last one asked
 constexpr unsigned kMaxJumps = 4;             // then the reader has an order of its own
+
+bool IsFruChunk(const ipmi::Command& command) {
+    return command.code() == ipmi::kReadFruData && command.data.size() == kChunkRead;
+}
 
 std::size_t OffsetOf(const ipmi::Command& chunk) {
     ipmisel::ByteReader in(chunk.data);
@@ -57,68 +62,109 @@ void CommandPredictor::AskedOfSensor(const ipmi::Command& command) {
     ofThisSensor_.push_back(command.code());
 }
 
+void CommandPredictor::Announced(const ipmi::Command& command) {
+    if (command.code() != ipmi::kGetFruInventoryAreaInfo || command.data.size() != 1) return;
+    fruToCome_.push_back({command.data[0], command.lun});
+}
+
 void CommandPredictor::Asked(const ipmi::Command& command) {
     now_ = command;
     if (IsOfSensor(command)) AskedOfSensor(command);
+    if (IsFruChunk(command)) AskedOfFru(command);
+}
+
+void CommandPredictor::AskedOfFru(const ipmi::Command& command) {
+    const FruPlace place{command.data[0], command.lun};
+    const std::uint8_t chunk = command.data[3];
+    std::erase(fruToCome_, place);
+    const auto known = fruSizes_.find(place);
+    if (OffsetOf(command) != 0 || known == fruSizes_.end()) return;
+    // Asked for less the second time: the controller does not give so much.
+    if (std::exchange(fruBegun_, place) == place && chunk < fruChunk_) {
+        fruChunk_ = 0;
+    } else if (chunk < known->second.size && !known->second.byWords) {
+        fruChunk_ = chunk;
+    }
 }
 
 void CommandPredictor::Answered(const ipmi::Command& command, const Response& response) {
     if (command.code() != ipmi::kGetFruInventoryAreaInfo || command.data.size() != 1) return;
+    const FruPlace place{command.data[0], command.lun};
     ipmisel::ByteReader in(response);
-    if (in.U8() != ipmi::kCompleted) return;
-    std::size_t size = in.U16();
-    constexpr std::uint8_t kByWords = 0x01;  // then offsets and counts are in words, too
-    if ((in.U8() & kByWords) != 0) size /= 2;
-    if (in.ok()) fruSizes_[command.data[0]] = size;
+    const bool completed = in.U8() == ipmi::kCompleted;
+    FruSize size{.size = in.U16(), .byWords = (in.U8() & 0x01) != 0};
+    if (size.byWords) size.size /= 2;
+    if (completed && in.ok()) {
+        fruSizes_[place] = size;
+    } else {
+        std::erase(fruToCome_, place);
+    }
 }
 
-std::vector<ipmi::Command> CommandPredictor::Next(std::size_t count) const {
+std::vector<ipmi::Command> CommandPredictor::Next(std::size_t count, const IsAsked& isAsked) const {
     std::vector<ipmi::Command> commands;
     if (!now_ || count == 0) return commands;
-    if (now_->code() == ipmi::kReadFruData && now_->data.size() == kChunkRead) {
-        AppendFruChunks(count, &commands);
-    } else if (IsOfSensor(*now_)) {
-        AppendSensors(count, &commands);
-    }
+    std::size_t seen = 0;
+    const Add add = [&](ipmi::Command command) {
+        if (!isAsked(command)) commands.push_back(std::move(command));
+        return commands.size() < count && ++seen < kFarthest;
+    };
+    if (IsFruChunk(*now_)) AddFruChunks(add);
+    if (IsOfSensor(*now_)) AddSensors(add);
+    if (commands.size() < count) AddFruToCome(add);
     return commands;
 }
 
-void CommandPredictor::AppendFruChunks(std::size_t count,
-                                       std::vector<ipmi::Command>* commands) const {
-    const std::uint8_t device = now_->data[0];
+void CommandPredictor::AddFruChunks(const Add& add) const {
+    const FruPlace now{now_->data[0], now_->lun};
     const std::uint8_t chunk = now_->data[3];
-    if (chunk == 0) return;
-    const auto known = fruSizes_.find(device);
-    const std::size_t size = known != fruSizes_.end() ? known->second : kUnknownFruSize;
-    for (std::size_t offset = OffsetOf(*now_) + chunk; offset < size && commands->size() < count;
-         offset += chunk) {
-        // A reader that knows the size asks for no more than is left.
-        const std::size_t rest = known != fruSizes_.end() ? size - offset : chunk;
-        ipmi::Command next =
-            ipmi::ReadFruData(device, static_cast<std::uint16_t>(offset),
-                              static_cast<std::uint8_t>(std::min<std::size_t>(rest, chunk)));
-        next.lun = now_->lun;
-        commands->push_back(std::move(next));
+    if (chunk != 0) AddFruChunksFrom(OffsetOf(*now_) + chunk, chunk, now, add);
+}
+
+void CommandPredictor::AddFruToCome(const Add& add) const {
+    if (fruChunk_ == 0) return;
+    for (const FruPlace& next : fruToCome_) {
+        // How a device by words is read shows when it is.
+        const auto known = fruSizes_.find(next);
+        if (known == fruSizes_.end() || known->second.byWords) continue;
+        if (!AddFruChunksFrom(0, fruChunk_, next, add)) return;
     }
 }
 
-void CommandPredictor::AppendSensors(std::size_t count,
-                                     std::vector<ipmi::Command>* commands) const {
+/// The chunks of a device from an offset on, as many as are wanted; false when no more are.
+bool CommandPredictor::AddFruChunksFrom(std::size_t offset, std::uint8_t chunk, FruPlace place,
+                                        const Add& add) const {
+    const auto known = fruSizes_.find(place);
+    const std::size_t size = known != fruSizes_.end() ? known->second.size : kUnknownFruSize;
+    for (; offset < size; offset += chunk) {
+        // A reader that knows the size asks for no more than is left.
+        const std::size_t rest = known != fruSizes_.end() ? size - offset : chunk;
+        ipmi::Command next =
+            ipmi::ReadFruData(place.device, static_cast<std::uint16_t>(offset),
+                              static_cast<std::uint8_t>(std::min<std::size_t>(rest, chunk)));
+        next.lun = place.lun;
+        if (!add(std::move(next))) return false;
+    }
+    return true;
+}
+
+void CommandPredictor::AddSensors(const Add& add) const {
     if (!sensor_ || !inOrder_ || jumps_ > kMaxJumps) return;
-    const auto append = [&](const Sensor& sensor, ipmi::CommandCode code) {
-        if (code == ipmi::kGetSensorThresholds && !sensor.hasThresholds) return;
-        commands->push_back(ipmi::MakeCommand(code, {sensor.number}, sensor.lun));
+    const auto addOne = [&](const Sensor& sensor, ipmi::CommandCode code) {
+        if (code == ipmi::kGetSensorThresholds && !sensor.hasThresholds) return true;
+        return add(ipmi::MakeCommand(code, {sensor.number}, sensor.lun));
     };
     // A sensor without thresholds shows nothing of what the reader asks of one that has them.
     const auto& pattern =
         ofThisSensor_.size() < ofLastSensor_.size() ? ofLastSensor_ : ofThisSensor_;
     for (std::size_t i = ofThisSensor_.size(); i < pattern.size(); ++i) {
-        append(sensors_[*sensor_], pattern[i]);
+        if (!addOne(sensors_[*sensor_], pattern[i])) return;
     }
-    for (std::size_t i = *sensor_ + 1; i < sensors_.size() && commands->size() < count; ++i) {
-        for (const ipmi::CommandCode code : pattern) append(sensors_[i], code);
+    for (std::size_t i = *sensor_ + 1; i < sensors_.size(); ++i) {
+        for (const ipmi::CommandCode code : pattern) {
+            if (!addOne(sensors_[i], code)) return;
+        }
     }
-    if (commands->size() > count) commands->resize(count);
 }
 
 }  // namespace tqrhost

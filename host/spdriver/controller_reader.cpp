@@ -255,6 +255,7 @@ void ControllerReader::StartWhole() {
             toldOfLog_ = true;
             if (Completed(info)) memory_.logInfo = std::move(info);
         });
+        log_->Pump();  // the first record
     }
     if (needs_.sensors) {
         // Beside the log: it costs no time there.
@@ -290,6 +291,11 @@ void ControllerReader::Pump() {
         }
         if (!log_ || (log_->Finished() && toldOfLog_ && comparing_ == 0)) {
             phase_ = Phase::kSensors;
+        } else if (!known_ && needs_.sensors && reserved_ && toldOfSensors_ &&
+                   log_->AskedForAll()) {
+            // In the room that the log's end leaves.
+            if (!sensors_) StartSensors();
+            sensors_->Pump();
         }
     }
     if (phase_ == Phase::kSensors && known_ && needs_.sensors && !sensors_ && !memory_.sensors) {

@@ -69,6 +69,7 @@ std::vector<ipmi::Command> MemoryTransport::EndPass() {
 std::optional<Response> MemoryTransport::ExchangeLive(const ipmi::Command& command) {
     if (Stopped() != StopReason::kNone) return std::nullopt;
     predictor_.Asked(command);
+    std::erase(announced_, command);
     std::optional<Response> response = TakeAhead(command);
     if (!response) {
         const auto answer = std::make_shared<Ahead>();
@@ -100,7 +101,7 @@ std::optional<Response> MemoryTransport::TakeAhead(const ipmi::Command& command)
     RequestPipeline* const pipelines[] = {pipeline_.get()};
     RunPipelines(pipelines, [&ahead] { return ahead->came; });
     const bool good = ahead->response && !ahead->response->empty() &&
-                      ahead->response->front() == ipmi::kCompleted &&
+                      (ahead->announced || ahead->response->front() == ipmi::kCompleted) &&
                       Clock::now() - ahead->at <= kMaxAge;
     return good ? std::move(ahead->response) : std::nullopt;
 }
@@ -109,16 +110,34 @@ void MemoryTransport::AskAhead() {
     if (ahead_.size() > kMaxAhead) {
         std::erase_if(ahead_, [](const auto& one) { return one.second->came; });
     }
-    for (ipmi::Command& command : predictor_.Next(pipeline_->Room())) {
-        if (ahead_.contains(command)) continue;
-        const auto ahead = std::make_shared<Ahead>();
-        ahead_.emplace(command, ahead);
-        pipeline_->Submit(std::move(command), [ahead](std::optional<Response> response) {
-            ahead->came = true;
-            ahead->at = Clock::now();
-            ahead->response = std::move(response);
-        });
+    while (!announced_.empty() && pipeline_->Room() > 0) {
+        AskAhead(std::move(announced_.front()), true);
+        announced_.pop_front();
     }
+    const auto isAsked = [this](const ipmi::Command& command) { return ahead_.contains(command); };
+    for (ipmi::Command& command : predictor_.Next(pipeline_->Room(), isAsked)) {
+        AskAhead(std::move(command), false);
+    }
+}
+
+void MemoryTransport::AskAhead(ipmi::Command command, bool announced) {
+    const auto ahead = std::make_shared<Ahead>();
+    ahead->announced = announced;
+    ahead_.emplace(command, ahead);
+    pipeline_->Submit(command, [this, ahead, command](std::optional<Response> response) {
+        if (response) predictor_.Answered(command, *response);
+        ahead->came = true;
+        ahead->at = Clock::now();
+        ahead->response = std::move(response);
+    });
+}
+
+void MemoryTransport::Announce(ipmi::Command command) {
+    const bool known = ahead_.contains(command) || memory_.Answer(command) ||
+                       std::ranges::find(announced_, command) != announced_.end();
+    if (known || announced_.size() >= kMaxAhead) return;
+    predictor_.Announced(command);
+    announced_.push_back(std::move(command));
 }
 
 std::optional<Response> MemoryTransport::ReadUnderNewReservation(const ipmi::Command& command) {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <deque>
 #include <map>
 #include <memory>
 #include <optional>
@@ -13,12 +14,14 @@
 namespace tqrhost {
 
 /// Answers from what was read of a controller before; what is not in there goes to the controller,
-/// with what will probably be asked next behind it. A prediction's answer counts only when it is a
-/// good one, so that the reader sees what it would have seen without.
+/// with what is announced, then what will probably be asked next behind it. A prediction's answer
+/// counts only when it is a good one, so that the reader sees what it would have seen without.
 class MemoryTransport : public Transport {
 public:
     MemoryTransport(std::unique_ptr<RequestPipeline> pipeline, ControllerMemory memory);
     std::optional<Response> Exchange(const RequestFrame& request) override;
+    /// A request that will come: it goes out with the next one that does not wait for its answer.
+    void Announce(ipmi::Command command);
     /// The pass is over. Get SEL Info and Get SDR Repository Info, where log or repository are
     /// known to have changed since they were read: from now on they are answered with the later
     /// state.
@@ -27,6 +30,7 @@ public:
 private:
     using Clock = RequestPipeline::Clock;
     struct Ahead {
+        bool announced = false;  ///< no guess: whatever comes is the answer
         bool came = false;
         Clock::time_point at;  ///< when it came
         std::optional<Response> response;
@@ -37,6 +41,7 @@ private:
     /// one.
     std::optional<Response> TakeAhead(const ipmi::Command& command);
     void AskAhead();
+    void AskAhead(ipmi::Command command, bool announced);
     /// A part of a record is refused because the controller holds the reservation from the reading
     /// no longer: the reader could not know, so a new one is taken for it.
     std::optional<Response> ReadUnderNewReservation(const ipmi::Command& command);
@@ -45,6 +50,7 @@ private:
     ControllerMemory memory_;
     CommandPredictor predictor_;
     std::map<ipmi::Command, std::shared_ptr<Ahead>> ahead_;
+    std::deque<ipmi::Command> announced_;  ///< and not asked yet
 };
 
 }  // namespace tqrhost

@@ -63,6 +63,9 @@ std::vector<NodeReading> ReadLiveNodes(Source& source, ReadingNeeds needs,
         readings[one.number] = one.reader->Result();
         auto transport = std::make_unique<tqrhost::MemoryTransport>(std::move(one.node->pipeline),
                                                                     one.reader->Take());
+        one.node->announce = [memory = transport.get()](ipmi::Command command) {
+            memory->Announce(std::move(command));
+        };
         one.node->endPass = [memory = transport.get()] { return memory->EndPass(); };
         one.node->transport = std::move(transport);
     }

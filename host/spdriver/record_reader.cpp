@@ -55,7 +55,7 @@ void RecordReader::Guess() {
             return;
         if (!incoming_.contains(next)) {
             if (isGuess && guesses_ - hits_ >= kMaxOpenGuesses + hits_ / kGuessesPerHit) return;
-            if (isGuess && store_->size() + incoming_.size() >= expected_.value_or(0)) return;
+            if (isGuess && (!expected_ || AskedForAll())) return;
             Ask(next, isGuess);
         }
         id = next;

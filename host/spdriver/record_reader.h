@@ -35,6 +35,10 @@ public:
     void Reserved(std::uint16_t reservation) { reservation_ = reservation; }
     /// Asks for what there is room for; to be called when there may be room.
     void Pump();
+    /// As many as are announced are there or on their way.
+    bool AskedForAll() const {
+        return expected_ && store_->size() + incoming_.size() >= *expected_;
+    }
     /// The last record has come, the next one could not be read, or the chain led back.
     bool Finished() const { return finished_; }
     /// It was read to its end: the last record named no next one.

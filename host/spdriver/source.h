@@ -29,6 +29,8 @@ struct SourceNode {
     std::string name;                           ///< the source as the user wrote it
     std::unique_ptr<Transport> transport;       ///< each request is answered by itself
     std::unique_ptr<RequestPipeline> pipeline;  ///< a live BMC, which is read ahead
+    /// A request that a plug-in will send soon. Null where it makes no difference.
+    std::function<void(ipmi::Command)> announce = {};
     /// The pass is over; what is to be asked a last time, since log or sensor repository are known
     /// to have changed after they were read: Get SEL Info, Get SDR Repository Info. Null for never.
     std::function<std::vector<ipmi::Command>()> endPass = {};

@@ -22,11 +22,15 @@ namespace NQORTQR20 {
 
 struct SPLibrary::Impl {
     std::unique_ptr<tqrhost::CompletenessTracker>
-        transport;  ///< null when there is no way to the BMC
+        transport;                                ///< null when there is no way to the BMC
+    std::function<void(ipmi::Command)> announce;  ///< null where it makes no difference
     bool integratedBmc;
 };
 
 struct HostAccess {
+    static void SetAnnounce(SPLibrary& library, std::function<void(ipmi::Command)> announce) {
+        library.impl_->announce = std::move(announce);
+    }
     static tqrhost::CompletenessTracker* TrackerOf(const SPLibrary& library) {
         return library.impl_->transport.get();
     }
@@ -92,6 +96,7 @@ void OpenMachine(Source source) {
     for (SourceNode& node : source.nodes) {
         auto library =
             std::make_unique<SPLibrary>(std::move(node.transport), GetMachineFacts().integratedBmc);
+        HostAccess::SetAnnounce(*library, std::move(node.announce));
         Nodes().push_back({std::move(node.name), std::move(library), std::move(node.endPass),
                            std::move(node.missing)});
     }
@@ -178,6 +183,12 @@ bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSi
     std::copy_n(response->begin(), fits, bytes.begin() + frame::kResponseAt);
     *length = static_cast<int>(fits) - 1;
     return true;
+}
+
+void SPLibrary::announceIPMICommand(const unsigned char* buffer, int bufferSize) {
+    if (buffer == nullptr || bufferSize <= 0 || !impl_->announce) return;
+    const auto request = RequestFrame::FromBuffer({buffer, static_cast<std::size_t>(bufferSize)});
+    if (request) impl_->announce(request->ToCommand());
 }
 
 }  // namespace NQORTQR20

@@ -18,7 +18,7 @@ struct TPluginManagerProvider;  ///< what the SMBIOS reader needs of the host
 
 /// Version of this interface. A plug-in states the oldest one that has what it uses; the host
 /// refuses one of another major or a newer minor version. 1.1 has the typed properties,
-/// fdrGetOption and fdrGetSystemName in addition.
+/// fdrGetOption, fdrGetSystemName and SPLibrary::announceIPMICommand in addition.
 inline constexpr const char* fdrPluginInterfaceVersion = "1.1";
 
 /// Answer of the information callback. The texts are static texts of the plug-in.

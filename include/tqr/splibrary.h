@@ -70,6 +70,12 @@ public:
     /// meaning here.
     bool sendIPMICommand(unsigned char* buffer, int* length, int bufferSize, bool flag);
 
+    /// Says that a request, laid out as sendIPMICommand wants it, will be sent soon. The host may
+    /// ask at once, several at a time, so that the answer is there by then; what is seen of the
+    /// BMC is the same. Only for requests that change nothing and that are sent unless the BMC
+    /// fails. Since 1.1.
+    void announceIPMICommand(const unsigned char* buffer, int bufferSize);
+
 private:
     friend struct HostAccess;  // the host's own
     struct Impl;

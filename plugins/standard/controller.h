@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <optional>
+#include <span>
 #include <vector>
 
 #include "ipmi/command.h"
@@ -21,6 +22,8 @@ struct Answer {
 class Controller {
 public:
     explicit Controller(NQORTQR20::SPLibrary& library) : library_(library) {}
+    /// Says what will be sent soon, so that the host may ask for all of it at once.
+    void Announce(std::span<const ipmi::Command> commands);
     /// Empty when nothing came. An answer is cut at what a message can hold.
     std::optional<Answer> Send(const ipmi::Command& command);
     /// The data of an answer that completed; empty for every other.

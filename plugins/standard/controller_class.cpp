@@ -1,5 +1,6 @@
 #include "plugins/standard/controller_class.h"
 
+#include <array>
 #include <iterator>
 
 #include "plugins/standard/classes.h"
@@ -59,6 +60,9 @@ const char* OrderName(ipmi::GuidOrder order) {
 
 void Write(NodePass& pass, Output& output) {
     Node& node = pass.node();
+    node.controller().Announce(std::to_array(
+        {ipmi::GetSystemGuid(), ipmi::GetFruInventoryAreaInfo(kOwnFruDevice), ipmi::GetDeviceId(),
+         ipmi::GetSelfTestResults(), ipmi::GetSelTimeUtcOffset(), ipmi::GetChassisStatus()}));
     if (!output.Begin(kName)) return;
     output.Integer("Node", node.number());
     const auto& system = pass.Smbios().system;

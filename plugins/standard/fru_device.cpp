@@ -37,6 +37,8 @@ std::string CodeText(const std::optional<Answer>& answer) {
 struct Place {
     FruDevice device;
     std::uint8_t lun = ipmi::kBmcLun;
+
+    bool IsHere() const { return device.controllerAddress == ipmi::kBmcAddress; }
 };
 
 std::vector<Place> FindDevices(const std::vector<ipmi::SdrRecord>& repository) {
@@ -186,6 +188,17 @@ std::optional<FruDevice> ReadOwnFruDevice(Controller& controller) {
     return std::move(place.device);
 }
 
+std::vector<ipmi::Command> FruAreaCommands(const std::vector<ipmi::SdrRecord>& repository) {
+    std::vector<ipmi::Command> commands;
+    const std::vector<Place> places = FindDevices(repository);
+    for (const Place& place : std::span(places).subspan(1)) {
+        if (!place.IsHere()) continue;
+        commands.push_back(ipmi::GetFruInventoryAreaInfo(place.device.deviceId));
+        commands.back().lun = place.lun;
+    }
+    return commands;
+}
+
 std::vector<FruDevice> ReadFruDevices(Controller& controller,
                                       const std::vector<ipmi::SdrRecord>& repository,
                                       const std::optional<FruDevice>& own) {
@@ -197,12 +210,11 @@ std::vector<FruDevice> ReadFruDevices(Controller& controller,
         device.entities = std::move(places[0].device.entities);
     }
     for (Place& place : std::span(places).subspan(1)) {
-        const bool here = place.device.controllerAddress == ipmi::kBmcAddress;
-        if (!here) {
+        if (!place.IsHere()) {
             place.device.problems.push_back(
                 Format("behind the controller at %02xh: not read", place.device.controllerAddress));
         }
-        if (!here || Read(controller, &place)) devices.push_back(std::move(place.device));
+        if (!place.IsHere() || Read(controller, &place)) devices.push_back(std::move(place.device));
     }
     return devices;
 }

@@ -28,9 +28,12 @@ struct EntityKey {
     auto operator<=>(const EntityKey&) const = default;
 };
 
+/// The controller's own inventory (IPMI 2.0, clause 34).
+constexpr std::uint8_t kOwnFruDevice = 0;
+
 /// A FRU device and what it holds: an inventory, or the presence detect data of a memory module.
 struct FruDevice {
-    std::uint8_t deviceId = 0;
+    std::uint8_t deviceId = kOwnFruDevice;
     std::uint8_t controllerAddress = ipmi::kBmcAddress;  ///< through which it is reached
     std::string name;                                    ///< of its locator; empty without one
     std::vector<EntityKey> entities;  ///< that it is the inventory of; of every locator
@@ -51,6 +54,8 @@ struct FruDevice {
 /// The controller's own FRU device 0, without what a locator tells of it. Get FRU Inventory Area
 /// Info comes first, then all of the device is read. Empty for a device that is not there, by the
 /// controller's own answer.
+/// What ReadFruDevices begins with.
+std::vector<ipmi::Command> FruAreaCommands(const std::vector<ipmi::SdrRecord>& repository);
 std::optional<FruDevice> ReadOwnFruDevice(Controller& controller);
 
 /// The FRU devices of a controller: `own`, as ReadOwnFruDevice had it, then the logical devices of

@@ -1,6 +1,7 @@
 #include "plugins/standard/node.h"
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <cstddef>
 #include <set>
@@ -31,6 +32,13 @@ auto Ask(Controller& controller, const ipmi::Command& command, Parse parse)
     const auto data = controller.Completed(command);
     if (!data) return std::nullopt;
     return parse(*data);
+}
+
+bool HasThresholds(const ipmi::Sensor& sensor) { return sensor.IsThreshold() && sensor.IsAnalog(); }
+
+bool HasReadableThresholds(const ipmi::Sensor& sensor) {
+    return HasThresholds(sensor) && (sensor.thresholdAccess == ipmi::LimitAccess::kReadable ||
+                                     sensor.thresholdAccess == ipmi::LimitAccess::kSettable);
 }
 
 /// A record's own ID, and that of the next one.
@@ -133,6 +141,17 @@ const SensorState& Node::StateOf(const ipmi::Sensor& sensor) {
     return states_.emplace(which, ReadState(sensor)).first->second;
 }
 
+void Node::AnnounceState(const ipmi::Sensor& sensor) {
+    if (!IsReadable(sensor)) return;
+    const ipmi::SensorKey& key = sensor.key;
+    if (!readings_.contains(key)) {
+        controller_.Announce(std::to_array({ipmi::GetSensorReading(key.number, key.lun)}));
+    }
+    if (HasReadableThresholds(sensor) && !thresholds_.contains(key)) {
+        controller_.Announce(std::to_array({ipmi::GetSensorThresholds(key.number, key.lun)}));
+    }
+}
+
 std::optional<double> Node::ValueOf(const ipmi::Sensor& sensor, std::uint8_t raw) {
     if (!sensor.IsAnalog()) return std::nullopt;
     const ipmi::Conversion& conversion = sensor.analog->conversion;
@@ -175,10 +194,9 @@ SensorState Node::ReadState(const ipmi::Sensor& sensor) {
             state.reading = reading;
         }
     }
-    if (!sensor.IsThreshold() || !sensor.IsAnalog()) return state;
+    if (!HasThresholds(sensor)) return state;
     state.thresholds = sensor.FixedThresholds();
-    if (sensor.thresholdAccess == ipmi::LimitAccess::kReadable ||
-        sensor.thresholdAccess == ipmi::LimitAccess::kSettable) {
+    if (HasReadableThresholds(sensor)) {
         if (const auto& asked = ThresholdsOf(sensor.key)) state.thresholds = *asked;
     }
     for (std::size_t i = 0; i < ipmi::kThresholdCount; ++i) {
@@ -232,9 +250,14 @@ std::vector<ipmi::EventFilter> Node::ReadFilters() {
         controller_.Completed(ipmi::GetPefConfigurationParameters(ipmi::kPefEventFilterCount));
     if (!count || count->size() <= kRevisionLength) return filters;
     const unsigned last = (*count)[kRevisionLength] & 0x7F;
+    std::vector<ipmi::Command> entries;
     for (unsigned number = 1; number <= last; ++number) {
-        const auto entry = controller_.Completed(ipmi::GetPefConfigurationParameters(
-            ipmi::kPefEventFilter, static_cast<std::uint8_t>(number)));
+        entries.push_back(ipmi::GetPefConfigurationParameters(ipmi::kPefEventFilter,
+                                                              static_cast<std::uint8_t>(number)));
+    }
+    controller_.Announce(entries);
+    for (const ipmi::Command& command : entries) {
+        const auto entry = controller_.Completed(command);
         if (!entry || entry->size() <= kRevisionLength) return filters;
         const auto filter = ipmi::EventFilter::Parse(std::span(*entry).subspan(kRevisionLength));
         if (!filter) return filters;

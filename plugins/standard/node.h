@@ -73,6 +73,8 @@ public:
     static bool IsReadable(const ipmi::Sensor& sensor);
     /// What a sensor of Sensors() says now, and its limits; nothing for one that is not readable.
     const SensorState& StateOf(const ipmi::Sensor& sensor);
+    /// StateOf will be wanted.
+    void AnnounceState(const ipmi::Sensor& sensor);
     /// A raw reading or threshold of a sensor in its unit; factors are asked for where they vary.
     std::optional<double> ValueOf(const ipmi::Sensor& sensor, std::uint8_t raw);
 

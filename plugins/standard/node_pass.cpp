@@ -1,5 +1,6 @@
 #include "plugins/standard/node_pass.h"
 
+#include <array>
 #include <set>
 #include <utility>
 #include <variant>
@@ -55,6 +56,11 @@ const Events& NodePass::GetEvents() {
     facts_.number = node_.number();
     facts_.systemName = systemName_;
     facts_.log = node_.ReadLog();
+    if (!facts_.log.empty()) {
+        node_.controller().Announce(
+            std::to_array({ipmi::GetPefConfigurationParameters(ipmi::kPefEventFilterCount)}));
+    }
+    if (!fruDevices_) node_.controller().Announce(FruAreaCommands(node_.Repository()));
     facts_.guid = node_.Guid();
     const Clock& clock = node_.GetClock();
     facts_.utcOffsetMinutes = clock.utcOffsetMinutes;
@@ -73,6 +79,9 @@ const Events& NodePass::GetEvents() {
         if (event.state == EventState::kOpen && event.sensor != nullptr) {
             open.insert(event.sensor->sensor.key);
         }
+    }
+    for (const SensorFacts& facts : facts_.sensors) {
+        if (open.contains(facts.sensor.key)) node_.AnnounceState(facts.sensor);
     }
     for (SensorFacts& facts : facts_.sensors) {
         if (open.contains(facts.sensor.key)) ReadSensorOf(&facts);

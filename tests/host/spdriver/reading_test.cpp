@@ -351,5 +351,46 @@ TEST_F(Reading, WhatFollowsIsAskedForBehindWhatThePassWants) {
     EXPECT_EQ(asked.size(), 8u);  // the size, and seven chunks once each
 }
 
+TEST_F(Reading, WhatIsAnnouncedGoesOutWithTheNextRequestAndIsAskedOnce) {
+    Describe(0, 3);
+    Read({.window = 8});
+    asked.clear();
+    const auto& announce = source.nodes[0].announce;
+    for (const ipmi::Command& command :
+         {ipmi::GetDeviceId(), ipmi::GetSdr(1), ipmi::GetSelfTestResults(), ipmi::GetDeviceId()}) {
+        announce(command);
+    }
+    Ask(ipmi::GetChassisStatus());
+    EXPECT_EQ(Ask(ipmi::GetSelfTestResults()), Response{ipmi::kInvalidCommand});
+    Ask(ipmi::GetDeviceId());
+    // The record is in the memory; a refusal is an answer as well.
+    EXPECT_THAT(asked, ElementsAre(ipmi::GetChassisStatus(), ipmi::GetDeviceId(),
+                                   ipmi::GetSelfTestResults()));
+}
+
+TEST_F(Reading, AnnouncedFruDevicesAreReadInTheChunksOfTheFirst) {
+    Describe(0, 0);
+    for (const std::uint8_t device : {0, 1, 2}) bmc.fru[device] = ipmisim::Bytes(100, 0x42);
+    const auto readDevice = [&](std::uint8_t device) {
+        Ask(ipmi::GetFruInventoryAreaInfo(device));
+        for (std::uint16_t offset = 0; offset < 100; offset += 32) {
+            const auto count = static_cast<std::uint8_t>(std::min(32, 100 - offset));
+            const Answer chunk = Ask(ipmi::ReadFruData(device, offset, count));
+            ASSERT_TRUE(chunk && chunk->size() == 2u + count);
+        }
+    };
+    Read({.window = 32});
+    asked.clear();
+    for (const std::uint8_t device : {1, 2, 3}) {  // the last is not there
+        source.nodes[0].announce(ipmi::GetFruInventoryAreaInfo(device));
+    }
+    readDevice(0);
+    readDevice(1);
+    // Its turn has not come, and there is nothing of it left to ask for.
+    EXPECT_THAT(asked, Contains(ipmi::ReadFruData(2, 0, 32)));
+    readDevice(2);
+    EXPECT_EQ(asked.size(), 4u + 3 * 4);
+}
+
 }  // namespace
 }  // namespace ipmiseltest
