@@ -95,6 +95,10 @@ std::string HostOf(const std::string& source) {
     return port == place.rfind(':') ? place.substr(0, port) : place;  // several: an IPv6 address
 }
 
+std::string NameOfSource(const std::string& source, std::size_t sourcesOfHost) {
+    return sourcesOfHost < 2 ? HostOf(source) : source.substr(source.find(':') + 1);
+}
+
 NQORTQR20::Source OpenSource(const AccessOptions& options) {
     NQORTQR20::SourceOptions access = options.source;
     access.password = [&options] {

@@ -34,6 +34,9 @@ std::string WorkaroundHelp();
 /// The host that a source names, as the user calls it: of a network source without its port, of a
 /// file without its folder and ending; else this machine.
 std::string HostOf(const std::string& source);
+/// What a system is called that the user gave no name: its host; where several sources have that
+/// host, with its port.
+std::string NameOfSource(const std::string& source, std::size_t sourcesOfHost);
 
 /// Opens the sources; asks for a password where one is needed and not given. Throws Failure.
 NQORTQR20::Source OpenSource(const AccessOptions& options);

@@ -32,7 +32,7 @@ std::string UserName() {
 }
 
 int Acknowledge(const AckOptions& options) {
-    Store store(options.store);
+    Store store(options.store, IfMissing::kRefuse);
     const auto now = std::chrono::duration_cast<std::chrono::seconds>(
         std::chrono::system_clock::now().time_since_epoch());
     for (const std::string& key : options.keys) {

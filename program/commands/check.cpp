@@ -55,7 +55,7 @@ std::vector<SystemSummary> Saved(const std::vector<std::string>& files) {
 /// What is open in a store and not acknowledged, as it was at the last visits.
 std::vector<SystemSummary> Stored(const std::string& uri, const std::vector<std::string>& names,
                                   double maxAgeSeconds) {
-    Store store(uri);
+    Store store(uri, IfMissing::kRefuse);
     const auto now = std::chrono::duration_cast<std::chrono::seconds>(
         std::chrono::system_clock::now().time_since_epoch());
     std::vector<SystemSummary> systems;

@@ -95,7 +95,21 @@ NQORTQR20::ReadingNeeds NeedsOf(const std::vector<std::string>& wanted,
     return needs;
 }
 
-/// One for each node, named as the user says, else by its source.
+/// What a system is called: as the user says, else by its source.
+std::string NameOf(const std::string& source, const CollectOptions& options) {
+    const std::vector<std::string> sources = options.access.Sources();
+    const auto place = std::find(sources.begin(), sources.end(), source);
+    const auto index = static_cast<std::size_t>(place - sources.begin());
+    if (options.names.size() == sources.size() && index < sources.size()) {
+        return options.names[index];
+    }
+    const auto sameHost = std::count_if(sources.begin(), sources.end(), [&](const auto& each) {
+        return HostOf(each) == HostOf(source);
+    });
+    return NameOfSource(source, static_cast<std::size_t>(sameHost));
+}
+
+/// One for each node.
 std::vector<SystemInfo> SystemsOf(const NQORTQR20::Source& source, const CollectOptions& options) {
     const std::vector<std::string> sources = options.access.Sources();
     const std::vector<std::string>& names = options.names;
@@ -110,10 +124,7 @@ std::vector<SystemInfo> SystemsOf(const NQORTQR20::Source& source, const Collect
     for (const NQORTQR20::SourceNode& node : source.nodes) {
         SystemInfo& system = systems.emplace_back();
         system.source = node.name.empty() ? sources.front() : node.name;
-        const auto place = std::find(sources.begin(), sources.end(), system.source);
-        const auto index =
-            byNode ? systems.size() - 1 : static_cast<std::size_t>(place - sources.begin());
-        system.name = index < names.size() ? names[index] : HostOf(system.source);
+        system.name = byNode ? names[systems.size() - 1] : NameOf(system.source, options);
     }
     return systems;
 }
@@ -199,15 +210,8 @@ private:
 /// The names of the systems behind these sources, which could not be opened.
 std::vector<std::string> NamesOf(const std::vector<std::string>& unopened,
                                  const CollectOptions& options) {
-    const std::vector<std::string> sources = options.access.Sources();
     std::vector<std::string> names;
-    for (const std::string& source : unopened) {
-        const auto place = std::find(sources.begin(), sources.end(), source);
-        const auto index = static_cast<std::size_t>(place - sources.begin());
-        names.push_back(index < options.names.size() && options.names.size() == sources.size()
-                            ? options.names[index]
-                            : HostOf(source));
-    }
+    for (const std::string& source : unopened) names.push_back(NameOf(source, options));
     return names;
 }
 
@@ -337,7 +341,12 @@ Outcome CollectTo(const CollectOptions& options, LogLines& log, ReportOutput& ou
         throw Failure(kExitUsage, "the capture " + *options.record +
                                       " is cut short; make room there, or name another --record");
     }
-    if (store) store->Finish(end, std::move(readings));
+    try {
+        if (store) store->Finish(end, std::move(readings));
+    } catch (const Failure& failure) {
+        return {failure.exitStatus, failure.what(),
+                ""};  // the report is what was read all the same
+    }
     return OutcomeOf(end);
 }
 
@@ -409,7 +418,7 @@ Outcome CollectOutcome(const CollectOptions& options) {
 
 int Collect(const CollectOptions& options) {
     const Outcome outcome = CollectOutcome(options);
-    if (outcome.exitStatus != kExitCollected) Say(outcome.problem + "; " + outcome.advice);
+    if (outcome.exitStatus != kExitCollected) Say(LineOf(outcome));
     return outcome.exitStatus;
 }
 

@@ -161,7 +161,7 @@ private:
 int Diff(const DiffOptions& options) {
     State before, after;
     if (options.store) {
-        Store store(*options.store);
+        Store store(*options.store, IfMissing::kRefuse);
         before = StateOf(store, options.sides.at(0), options);
         after = StateOf(store, options.sides.at(1), options);
     } else {

@@ -55,7 +55,7 @@ int WriteSaved(const Saved& saved, const SavedOptions& options) {
 
 int Report(const SavedOptions& options) {
     if (options.store) {
-        const Store store(*options.store);
+        const Store store(*options.store, IfMissing::kRefuse);
         // Where a name has one place, that is of the controller which answers now.
         const std::string& format = options.report.format;
         const bool past = format != "prometheus" && format != "redfish";

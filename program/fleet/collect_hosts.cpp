@@ -34,6 +34,7 @@ constexpr int kMaxJobs = 4096;
 /// Beyond its deadline, for a worker to write what it has.
 constexpr std::chrono::seconds kTimeToEnd{5};
 constexpr std::chrono::seconds kMaxWait{1};
+constexpr std::chrono::seconds kStorePause{60};
 
 /// What goes with one machine only.
 void RefuseOptions(const CollectOptions& options) {
@@ -75,7 +76,7 @@ class Collection {
 public:
     Collection(ForkServer& server, const CollectOptions& common, std::size_t jobs,
                FleetReport& report)
-        : report_(report), store_(common.store), pool_(server, jobs, PassLogLine) {
+        : report_(report), lostVisits_(common.store), pool_(server, jobs, PassLogLine) {
         if (common.progress) progress_.emplace();
     }
 
@@ -116,10 +117,9 @@ private:
         const auto& [source, name] = names_[end.id];
         const Outcome& outcome = end.result.outcome;
         if (outcome.exitStatus != kExitCollected) {
-            Say(name + ": " + outcome.problem +
-                (outcome.advice.empty() ? "" : "; " + outcome.advice));
+            Say(name + ": " + LineOf(outcome));
         }
-        if (end.lost && store_) StoreLostVisit(*store_, name, end);
+        lostVisits_.Add(name, end);
         Add({end.id, source, name, std::move(end.result), std::move(end.report)});
     }
     void Add(const ControllerEnd& end) {
@@ -139,7 +139,7 @@ private:
     }
 
     FleetReport& report_;
-    std::optional<std::string> store_;
+    LostVisits lostVisits_;
     FleetOutcome outcome_;
     std::optional<ProgressLine> progress_;
     std::size_t done_ = 0, failed_ = 0;
@@ -174,13 +174,19 @@ void StartWorker(WorkerPool* pool, std::size_t id, const CollectOptions& options
     pool->Start(id, options.names.front(), WriteWorkerRequest(options), limit);
 }
 
-void StoreLostVisit(const std::string& uri, const std::string& name, const WorkerEnd& end) {
+LostVisits::LostVisits(std::optional<std::string> uri) : uri_(std::move(uri)) {
+    if (uri_) const Store store(*uri_);
+}
+
+void LostVisits::Add(const std::string& name, const WorkerEnd& end) {
+    if (!uri_ || !end.lost || Clock::now() < notBefore_) return;
     const auto now = std::chrono::duration_cast<std::chrono::seconds>(
                          std::chrono::system_clock::now().time_since_epoch())
                          .count();
     try {
-        Store(uri).AddFailed(name, now, now, end.result.outcome.problem);
+        Store(*uri_).AddFailed(name, now, now, end.result.outcome.problem);
     } catch (const Failure& failure) {
+        notBefore_ = Clock::now() + kStorePause;
         Say(failure.what());
     }
 }
@@ -248,7 +254,7 @@ int CollectHosts(const CollectOptions& options, const HostsOptions& hosts) {
     report->Finish(outcome);
     out.Commit();
     pager.Wait();
-    if (outcome.exitStatus != kExitCollected) Say(outcome.problem + "; " + outcome.advice);
+    if (outcome.exitStatus != kExitCollected) Say(LineOf(outcome));
     return outcome.exitStatus;
 }
 

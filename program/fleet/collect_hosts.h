@@ -34,8 +34,18 @@ struct HostPlan {
 /// Starts a worker with these options, as HostOptions gives them, and kills it some time after its
 /// deadline.
 void StartWorker(WorkerPool* pool, std::size_t id, const CollectOptions& options);
-/// Stores that the visit failed of a worker that could not do so itself.
-void StoreLostVisit(const std::string& uri, const std::string& name, const WorkerEnd& end);
+/// Stores that visits failed whose workers could not do so themselves. A store that cannot be used
+/// is said to be so, and is not tried again for a while: many may be lost with it.
+class LostVisits {
+public:
+    /// Throws Failure when the store, if there is one, cannot be used from the beginning.
+    explicit LostVisits(std::optional<std::string> uri);
+    void Add(const std::string& name, const WorkerEnd& end);
+
+private:
+    std::optional<std::string> uri_;
+    WorkerPool::Clock::time_point notBefore_{};
+};
 /// Hands a worker's line on to standard error.
 void PassLogLine(std::string_view line);
 

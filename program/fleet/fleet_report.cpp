@@ -74,8 +74,7 @@ void ForEachPiece(int file, Take take) {
 
 /// A controller without a report of its own, as one that could not be opened.
 NQORTQR20::UnreachableNode AsUnreachable(const ControllerEnd& end) {
-    const Outcome& outcome = end.result.outcome;
-    return {end.source, outcome.problem + (outcome.advice.empty() ? "" : "; " + outcome.advice)};
+    return {end.source, LineOf(end.result.outcome)};
 }
 
 /// The lines of each controller as it wrote them, and a line for each that could not be read.
@@ -312,7 +311,7 @@ Outcome FleetOutcome::Get() const {
     const std::size_t inPart = all_ - whole_ - notReached_;
     if (inPart > 0) {
         problem += (problem.empty() ? "" : ", ") + count(inPart) +
-                   (problem.empty() ? " controllers" : "") + " not read whole";
+                   (problem.empty() ? " controllers" : "") + " not collected whole";
     }
     return {mixed_ ? kExitPart : common_, problem,
             "see the lines above, then collect from these again"};

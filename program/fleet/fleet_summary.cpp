@@ -23,14 +23,11 @@ std::string SeverityName(std::optional<Severity> severity) {
     return severity ? std::string(InfoOf(*severity).name) : "";
 }
 
-/// Not even in part.
+/// Not even in part. One that was read may still have failed later, as at the store.
 bool IsUnread(const SystemSummary& system) {
     const int status = system.outcome.exitStatus;
-    return status != kExitCollected && status != kExitPart;
-}
-
-std::string OutcomeText(const Outcome& outcome) {
-    return Listed({outcome.problem, outcome.advice}, "; ");
+    if (status == kExitNoSource) return true;
+    return !system.reported && status != kExitCollected && status != kExitPart;
 }
 
 std::string ModelText(const SystemInfo& system) {
@@ -68,7 +65,7 @@ std::string SystemHtml(const SystemSummary& system) {
     const std::string more = MoreText(system);
     if (!more.empty()) what += Element("li", more);
     if (!what.empty()) what = Element("ul", what, "class=\"findings\"");
-    const std::string outcome = OutcomeText(system.outcome);
+    const std::string outcome = LineOf(system.outcome);
     if (!outcome.empty()) what += Element("p", HtmlText(outcome), "class=\"soft\"");
     return Element("tr",
                    Element("th", HtmlText(system.name), "scope=\"row\"") +
@@ -86,6 +83,7 @@ std::optional<Severity> SystemSummary::Worst() const {
 }
 
 void Summarize(const SavedReport& report, SystemSummary* summary) {
+    summary->reported = true;
     if (!report.Head().systems.empty()) summary->system = report.Head().systems.front();
     report.ForEach([summary](const NQORTQR20::Instance& instance) {
         if (instance.className == kEventLogClass) {
@@ -169,7 +167,7 @@ void WriteTableOverview(const std::vector<SystemSummary>& systems, const Outcome
     for (const SystemSummary& system : systems) {
         for (const Finding& finding : system.findings) add(system, finding, finding.severity);
         Finding rest;
-        rest.title = Listed({MoreText(system), OutcomeText(system.outcome)}, "; ");
+        rest.title = Listed({MoreText(system), LineOf(system.outcome)}, "; ");
         if (!rest.title.empty()) add(system, rest, {});
     }
     if (!table.Empty()) {

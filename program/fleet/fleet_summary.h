@@ -19,6 +19,7 @@ struct SystemSummary {
     std::string name;
     SystemInfo system{};  ///< what it said of itself
     Outcome outcome{};
+    bool reported = false;                   ///< there is a report of it
     std::vector<Finding> findings{};         ///< the worst first, no more than are shown
     std::size_t problems = 0;                ///< all of them
     std::size_t critical = 0;                ///< that are critical or fatal

@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <set>
 #include <utility>
 
 #include "program/commands/arguments.h"
@@ -14,14 +15,15 @@ namespace {
 constexpr double kDefaultDeadline = 120;
 
 /// The options of a line of a list, checked as those of the command line are.
-void ApplyOwn(const HostEntry& host, CollectOptions* options, std::optional<std::string>* name) {
+void ApplyOwn(const HostEntry& host, CollectOptions* options) {
     CLI::App line;
     line.set_help_flag();
     AddAccessOptions(&line, &options->access);
     line.remove_option(line.get_option("--from"));
     line.add_option("--password", options->access.password);
     line.add_option("--deadline", options->deadlineSeconds)->check(Seconds(365 * kSecondsPerDay));
-    line.add_option("--name", *name)->check(NotEmpty("the name is empty; name the system"));
+    line.add_option("--name", options->names)
+        ->check(NotEmpty("the name is empty; name the system"));
     std::vector<std::string> arguments;
     for (const auto& [key, value] : host.options) {
         std::string argument = "--";
@@ -46,22 +48,28 @@ HostOptions::HostOptions(CollectOptions common, const std::vector<HostEntry>& al
     : common_(std::move(common)) {
     if (!common_.deadlineSeconds) common_.deadlineSeconds = kDefaultDeadline;
     for (const HostEntry& host : all) ++timesNamed_[HostOf(host.source)];
+    std::set<std::string> names;
+    for (const HostEntry& host : all) {
+        const std::string name = NameOf(host);
+        if (names.insert(name).second) continue;
+        throw Failure(kExitUsage, host.origin + (host.origin.empty() ? "" : ": ") +
+                                      "two controllers have the name " + name +
+                                      "; give each a name of its own");
+    }
 }
 
-std::string HostOptions::NameOf(const std::string& source) const {
-    std::string host = HostOf(source);
-    // Several controllers behind one address: the port tells them apart.
-    const auto times = timesNamed_.find(host);
-    if (times == timesNamed_.end() || times->second < 2) return host;
-    return source.substr(source.find(':') + 1);
+std::string HostOptions::NameOf(const HostEntry& host) const {
+    for (const auto& [key, value] : host.options) {
+        if (key == "name") return value;
+    }
+    return NameOfSource(host.source, timesNamed_.at(HostOf(host.source)));
 }
 
 CollectOptions HostOptions::Of(const HostEntry& host) {
     CollectOptions options = common_;
-    std::optional<std::string> name;
-    ApplyOwn(host, &options, &name);
+    ApplyOwn(host, &options);
     options.access.sources = {host.source};
-    options.names = {name ? *name : NameOf(host.source)};
+    options.names = {NameOf(host)};
     AccessOptions& access = options.access;
     if (!host.source.starts_with("lan:")) return options;
     if (access.password) {

@@ -38,10 +38,6 @@ std::string FindingText(const Finding& finding) {
                    OrderText(finding.partNumber, finding.serialNumber)});
 }
 
-std::string OutcomeText(const SystemSummary& system) {
-    return Listed({system.outcome.problem, system.outcome.advice}, "; ");
-}
-
 std::string PerformanceData(const std::vector<SystemSummary>& systems) {
     std::size_t problems = 0, critical = 0, notWhole = 0;
     Integer records;
@@ -91,7 +87,7 @@ CheckResult CheckSystems(const std::vector<SystemSummary>& systems) {
         text += Format(" in %zu systems", systems.size());
     }
     if (notWhole != systems.end()) {
-        text = Listed({text, named(*notWhole, OutcomeText(*notWhole))}, "; ");
+        text = Listed({text, named(*notWhole, LineOf(notWhole->outcome))}, "; ");
     }
     return {status, Line(status, text) + " | " + PerformanceData(systems)};
 }

@@ -64,6 +64,7 @@ public:
         : options_(options),
           schedule_(std::chrono::seconds(options.everySeconds)),
           server_([&] { PrepareWorkers(options.collect); }, RunWorker),
+          lostVisits_(options.collect.store),
           pool_(server_, options.hosts.jobs, PassLogLine) {
         options_.collect.report.format = WorkerFormat("json");
         options_.collect.report.classes = {std::string(kControllerClass), std::string(kEventClass)};
@@ -83,7 +84,10 @@ public:
             }
             if (!stopping && std::exchange(gReload, 0) != 0) Reload();
             if (!stopping) StartDue();
-            for (WorkerEnd& end : pool_.Wait(NextWake(stopping))) Take(end);
+            for (WorkerEnd& end : pool_.Wait(NextWake(stopping))) {
+                Take(end);
+                notifier_.Alive(Clock::now());
+            }
             notifier_.Alive(Clock::now());
         }
         StopSignals::EndCollecting();
@@ -133,14 +137,18 @@ private:
         const std::string source = std::exchange(underWay_[end.id], "");
         underWay_.erase(end.id);
         const bool wasRead = end.result.reported;
-        schedule_.Done(source, wasRead, Clock::now());
+        // What the options name, as the store, may be out of order: no fault of the controller.
+        const bool isOfAll = end.result.outcome.exitStatus == kExitUsage;
+        schedule_.Done(source, wasRead || isOfAll, Clock::now());
         const auto place = controllers_.find(source);
         if (place == controllers_.end()) return;  // no longer in the lists
         Watched& controller = place->second;
-        TellProblem(end.result.outcome, &controller);
-        if (end.lost && options_.collect.store) {
-            StoreLostVisit(*options_.collect.store, controller.options.names.front(), end);
+        if (isOfAll) {
+            TellProblemOfAll(LineOf(end.result.outcome));
+        } else {
+            TellProblem(end.result.outcome, &controller);
         }
+        lostVisits_.Add(controller.options.names.front(), end);
         if (wasRead) TakeEvents(source, end, &controller);
     }
     /// Once, and when it is over, not at each visit.
@@ -149,6 +157,14 @@ private:
         const std::string& name = controller->options.names.front();
         Say(name + ": " + (outcome.problem.empty() ? "read whole again" : outcome.problem));
         controller->problem = outcome.problem;
+    }
+    /// Not for each controller, and not at each visit.
+    void TellProblemOfAll(const std::string& problem) {
+        const auto now = Clock::now();
+        if (problem == problemOfAll_ && now < problemToldUntil_) return;
+        Say(problem);
+        problemOfAll_ = problem;
+        problemToldUntil_ = now + std::chrono::seconds(options_.everySeconds);
     }
     void TakeEvents(const std::string& source, const WorkerEnd& end, Watched* controller) {
         const SavedReport report = ReadWorkerReport(source, end.report.get());
@@ -174,7 +190,10 @@ private:
     std::map<std::string, Watched> controllers_;  ///< by source
     std::size_t started_ = 0;
     std::map<std::size_t, std::string> underWay_;  ///< source by worker
+    std::string problemOfAll_;
+    Clock::time_point problemToldUntil_{};
     ForkServer server_;
+    LostVisits lostVisits_;
     WorkerPool pool_;
 };
 

@@ -123,6 +123,10 @@ std::optional<std::int64_t> NodeOf(const NQORTQR20::Instance& instance, const Re
     return NodeOf(instance, NodeProperty(instance.className, head));
 }
 
+std::string LineOf(const Outcome& outcome) {
+    return outcome.problem + (outcome.advice.empty() ? "" : "; " + outcome.advice);
+}
+
 Outcome OutcomeOf(const ReportEnd& end) {
     if (end.recorded) return *end.recorded;
     if (!end.hasBmc && end.status.code == NQORTQR20::kStatusOk) {

@@ -109,5 +109,7 @@ MakeReport MakeTableReport, MakeJsonReport, MakeNdjsonReport, MakeEventsReport, 
     MakeHtmlReport, MakeRedfishReport, MakePrometheusReport, MakeOtlpReport;
 
 Outcome OutcomeOf(const ReportEnd& end);
+/// The problem and what to do about it, for standard error.
+std::string LineOf(const Outcome& outcome);
 
 }  // namespace ipmisel

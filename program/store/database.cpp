@@ -30,9 +30,9 @@ void LoadDatabaseLibrary(const std::string& uri) {
     if (uri.starts_with(kPostgresql)) LoadPostgresql();
 }
 
-std::unique_ptr<Database> OpenDatabase(const std::string& uri) {
+std::unique_ptr<Database> OpenDatabase(const std::string& uri, IfMissing ifMissing) {
     if (uri.starts_with(kSqlite) && uri.size() > kSqlite.size()) {
-        return OpenSqlite(uri.substr(kSqlite.size()), uri);
+        return OpenSqlite(uri.substr(kSqlite.size()), uri, ifMissing);
     }
     if (uri.starts_with(kPostgresql)) return OpenPostgresql(uri);
     throw Failure(kExitUsage,

@@ -42,16 +42,20 @@ public:
     }
 };
 
-/// Opens `sqlite:FILE`, which is made with mode 0600 when it is not there, or
-/// `postgresql://...`. Throws Failure.
-std::unique_ptr<Database> OpenDatabase(const std::string& uri);
+/// What is done where `sqlite:FILE` names a file that is not there.
+enum class IfMissing { kMake, kRefuse };
+
+/// Opens `sqlite:FILE`, which is made with mode 0600, or `postgresql://...`. Throws Failure.
+std::unique_ptr<Database> OpenDatabase(const std::string& uri,
+                                       IfMissing ifMissing = IfMissing::kMake);
 
 /// Loads the library that a store of this URI needs, for processes that are copied from this one.
 /// Throws Failure.
 void LoadDatabaseLibrary(const std::string& uri);
 
 /// The one and the other; `uri` is for messages.
-std::unique_ptr<Database> OpenSqlite(const std::string& file, const std::string& uri);
+std::unique_ptr<Database> OpenSqlite(const std::string& file, const std::string& uri,
+                                     IfMissing ifMissing);
 std::unique_ptr<Database> OpenPostgresql(const std::string& uri);
 void LoadSqlite();
 void LoadPostgresql();

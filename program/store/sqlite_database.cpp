@@ -73,8 +73,9 @@ constexpr Dialect kDialect{
 class SqliteDatabase : public Database {
 public:
     // By way of the other constructor: what is open when this one throws is closed.
-    SqliteDatabase(const std::string& file, std::string uri) : SqliteDatabase(std::move(uri)) {
-        MakeFile(file);
+    SqliteDatabase(const std::string& file, std::string uri, IfMissing ifMissing)
+        : SqliteDatabase(std::move(uri)) {
+        CheckFile(file, ifMissing);
         if (sqlite_.sqlite3_open_v2(file.c_str(), &handle_, SQLITE_OPEN_READWRITE, nullptr) !=
             SQLITE_OK) {
             Fail();
@@ -125,9 +126,10 @@ private:
         Fail(sqlite_.sqlite3_errmsg(handle_));
     }
 
-    /// SQLite would make it with what the umask leaves.
-    void MakeFile(const std::string& file) const {
-        const int descriptor = open(file.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NONBLOCK, 0600);
+    /// SQLite would make it with what the umask leaves, and for who only wants to read too.
+    void CheckFile(const std::string& file, IfMissing ifMissing) const {
+        const int make = ifMissing == IfMissing::kMake ? O_CREAT : 0;
+        const int descriptor = open(file.c_str(), O_RDWR | make | O_CLOEXEC | O_NONBLOCK, 0600);
         if (descriptor < 0) Fail(std::strerror(errno));
         struct stat status {};
         const bool regular = fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode);
@@ -205,8 +207,9 @@ private:
 
 void LoadSqlite() { Library::Get(); }
 
-std::unique_ptr<Database> OpenSqlite(const std::string& file, const std::string& uri) {
-    return std::make_unique<SqliteDatabase>(file, uri);
+std::unique_ptr<Database> OpenSqlite(const std::string& file, const std::string& uri,
+                                     IfMissing ifMissing) {
+    return std::make_unique<SqliteDatabase>(file, uri, ifMissing);
 }
 
 }  // namespace ipmisel

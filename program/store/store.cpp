@@ -130,13 +130,14 @@ private:
             " product = CASE WHEN excluded.product = '' THEN systems.product"
             "  ELSE excluded.product END,"
             " serial = CASE WHEN excluded.serial = '' THEN systems.serial ELSE excluded.serial END"
-            " RETURNING id, revision, log_read",
+            " RETURNING id, revision, log_read, gone",
             SqlText(visit_.name), SqlText(visit_.Identity()), SqlText(visit_.guid),
             SqlText(visit_.manufacturer), SqlText(visit_.product), SqlText(visit_.serial),
             SqlText(visit_.source), visit_.finished);
         system_ = IntegerOf(rows.at(0).at(0));
         const std::int64_t revision = IntegerOf(rows[0].at(1));
         logRead_ = MaybeInteger(rows[0].at(2));
+        isNewHere_ = revision == 0 || MaybeInteger(rows[0].at(3));
         // Somebody else has stored a visit since this one began: which of them saw the later log
         // is not known. What this one saw is added, and nothing of the other's is taken back.
         if (before_ && before_->id == system_) {
@@ -467,15 +468,15 @@ private:
         }
     }
 
+    /// Once: some manufacturers give the same one to all.
     void TellOfGuid() {
-        if (visit_.guid.empty()) return;
+        if (visit_.guid.empty() || !isNewHere_) return;
         const auto rows = db_.Query(
             "SELECT COUNT(*), MIN(name) FROM systems WHERE guid = $1 AND name <> $2"
             " AND gone IS NULL",
             SqlText(visit_.guid), SqlText(visit_.name));
         const auto others = static_cast<std::size_t>(IntegerOf(rows.at(0).at(0)));
         if (others == 0) return;
-        // Some manufacturers give the same one to all.
         Tell("its GUID " + visit_.guid + " is claimed by " + TextOf(rows[0].at(1)) +
              (others == 1 ? "" : " and " + Counted(others - 1, "other")) +
              " too; they are kept apart by their names");
@@ -488,6 +489,7 @@ private:
     std::int64_t system_ = 0;
     std::int64_t visitId_ = 0;
     std::optional<std::int64_t> logRead_;
+    bool isNewHere_ = false;  ///< under this name, or back
     bool stale_ = false;
     std::map<std::string, Stored, std::less<>> stored_;
     std::vector<std::string> present_;  ///< keys in the log's order
@@ -532,7 +534,10 @@ std::vector<SqlRow> ForNames(Database& db, const std::string& select, const std:
 
 }  // namespace
 
-Store::Store(const std::string& uri) : database_(OpenDatabase(uri)) { UpdateSchema(*database_); }
+Store::Store(const std::string& uri, IfMissing ifMissing)
+    : database_(OpenDatabase(uri, ifMissing)) {
+    UpdateSchema(*database_);
+}
 
 std::optional<StoredSystem> Store::Find(const std::string& name) {
     const auto rows = database_->Query(

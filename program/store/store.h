@@ -104,7 +104,7 @@ struct StoredState {
 class Store {
 public:
     /// `sqlite:FILE` or `postgresql://...`; the tables are made or brought up to date.
-    explicit Store(const std::string& uri);
+    explicit Store(const std::string& uri, IfMissing ifMissing = IfMissing::kMake);
 
     /// The controller that last answered under a name; empty when the name is new.
     std::optional<StoredSystem> Find(const std::string& name);

@@ -44,6 +44,9 @@ StoreReport::StoreReport(Database& database, const std::vector<std::string>& nam
         std::string(kSystems) + (past ? " WHERE 1 = 1" : " WHERE s.gone IS NULL");
     if (names.empty()) {
         for (const SqlRow& row : database.Query(select + std::string(kOrder))) Add(row);
+        if (systems_.empty()) {
+            throw Failure(kExitUsage, "the store has no system yet; collect with --store first");
+        }
     }
     for (const std::string& name : names) {
         const auto rows =

@@ -10,6 +10,7 @@ import os
 import pathlib
 import signal
 import socket
+import sqlite3
 import subprocess
 import sys
 import tempfile
@@ -155,6 +156,31 @@ class Fleet(unittest.TestCase):
             self.assertEqual(complete, {each: each != name for each in all_of_them.names})
             self.assertRegex(self.check("--store", uri, "--system", name).stdout, "UNKNOWN - its worker was ended by Killed")
 
+    def test_what_a_store_does_not_take_is_reported_and_comes_again(self):
+        with Controllers(2, "--records", "2") as all_of_them:
+            store = sqlite3.connect(self.folder.name + "/store.db")
+            self.addCleanup(store.close)
+            new = ("--store", "sqlite:" + self.folder.name + "/store.db", "--new", "--format", "events")
+            subprocess.run([IPMISEL, "collect", "--from", f"sim:{TREE}/examples/rack-server.json", *new], capture_output=True)
+            store.execute("CREATE TRIGGER full BEFORE INSERT ON events BEGIN SELECT RAISE(ABORT, 'no room'); END")
+            failed = self.collect(all_of_them.sources, *new)
+            self.assertEqual((failed.returncode, failed.stderr.count("no room")), (2, 2), failed.stderr)
+            lines = self.lines(failed)
+            self.assertEqual([line["summary"]["complete"] for line in lines if "summary" in line], [True] * 2)
+            self.assertEqual(len(lines), 2 * 2 + 2)
+            # A service says it once, and goes on.
+            command = [IPMISEL, "watch", "--hosts", ",".join(all_of_them.sources), "--user", "root", "--password-file",
+                       self.password, *new[:2]]
+            with subprocess.Popen(command, stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
+                                  env=self.environment) as run:
+                told = [run.stdout.readline() for _ in range(4)]
+                run.send_signal(signal.SIGTERM)
+                out, err = run.communicate(timeout=60)
+            self.assertEqual((run.returncode, err.count("\n"), out), (0, 1, ""), err)
+            store.execute("DROP TRIGGER full")
+            keys = {json.loads(line)["Key"] for line in told}
+            self.assertEqual({line["Key"] for line in self.lines(self.collect(all_of_them.sources, *new)) if "Key" in line}, keys)
+
     def workers(self, pid, count):
         """The worker processes, once there are so many."""
         for _ in range(1000):
@@ -227,6 +253,7 @@ class Fleet(unittest.TestCase):
                 ended = self.collect("@" + bad)
                 self.assertEqual(ended.returncode, 2)
                 self.assertIn(f"{bad}, line 1: ", ended.stderr)
+            self.assertIn("two controllers have the name", self.collect("@" + self.write("bad", "n[1-2] name=x\n")).stderr)
 
     def test_a_credential_of_the_service_manager_is_a_password_file(self):
         with Controllers(1, "--records", "1") as one:
@@ -252,6 +279,11 @@ class Fleet(unittest.TestCase):
             ended = self.collect(one.sources, "--from", f"sim:{TREE}/examples/rack-server.json", "--format", "json")
             systems = [system["name"] for system in json.loads(ended.stdout)["systems"]]
             self.assertEqual(systems, ["rack-server", "127.0.0.1"])
+        with Controllers(2, "--records", "1") as two:
+            sources = [word for source in two.sources for word in ("--from", source)]
+            ended = subprocess.run([IPMISEL, "collect", *sources, "--user", "root", "--password-file", self.password,
+                                    "--format", "ndjson"], capture_output=True, text=True, env=self.environment)
+            self.assertEqual({line["system"] for line in self.lines(ended)}, set(two.names))
 
     def check(self, *options):
         return subprocess.run([IPMISEL, "check", *options], capture_output=True, text=True, timeout=120,
@@ -316,7 +348,7 @@ class Fleet(unittest.TestCase):
 
     def test_what_does_not_go_with_many_is_refused(self):
         for options in (("--record", "x"), ("--name", "x"), ("--log-file", "x"), ("--jobs", "0"), ("--shard", "9/8"),
-                        ("--last", "3"), ("--format", "csv", "--class", "IPMI_Event", "--class", "IPMI_FRU")):
+                        ("--last", "3"), ("--store", "sqlite:/no/such/folder/store.db"), ("--format", "csv", "--class", "IPMI_Event", "--class", "IPMI_FRU")):
             ended = self.collect("host1", *options)
             self.assertEqual((ended.returncode, ended.stdout), (2, ""), options)
             self.assertEqual(ended.stderr.count("\n"), 1, ended.stderr)

@@ -136,6 +136,7 @@ TEST_P(StoreOf, TwoNamesThatClaimOneGuidAreReportedAndKeptApart) {
     EXPECT_EQ(Visit(bmc.Server(), {"--name", "one"}).err, "");
     const Result second = Visit(bmc.Server(), {"--name", "two"});
     EXPECT_THAT(second.err, HasSubstr("is claimed by one too"));
+    EXPECT_EQ(Visit(bmc.Server(), {"--name", "two"}).err, "") << "again";
     EXPECT_THAT(Column("SELECT s.name FROM events e JOIN systems s ON s.id = e.system"
                        " ORDER BY s.name"),
                 ElementsAre("one", "two"));
@@ -247,6 +248,8 @@ TEST_P(StoreOf, AReportHasEveryEventThatWasEverInALog) {
         result.out = ReadText(out);
         return result;
     };
+    ipmisel::Store{uri};
+    EXPECT_THAT(report({}).err, HasSubstr("no system yet"));
     bmc.Grow(true);
     bmc.Grow(true);
     Visit(bmc.Server());
@@ -319,6 +322,8 @@ TEST_P(StoreRoles, EachMayDoItsWorkAndNothingElse) {
         ipmisel::OpenDatabase(uri)->Query("CREATE ROLE test_" + role + " LOGIN IN ROLE ipmisel_" +
                                           role);
     }
+    EXPECT_THAT([&] { ipmisel::OpenDatabase(server.UriOf("nobody")); },
+                ThrowsMessage<ipmisel::Failure>(HasSubstr("\"nobody\" does not exist; correct")));
     // All that a collector writes: a log that grows, is cleared, and another controller's.
     uri = server.UriOf("test_collector");
     Controller bmc;
@@ -379,9 +384,14 @@ TEST(Store, RefusesWhatItShouldNotUse) {
     const std::string text = folder.Write("text", std::string(5000, 'x'));
     const std::string other = (folder.path() / "other.db").string();
     ipmisel::OpenDatabase("sqlite:" + other)->Query("CREATE TABLE mine (a INTEGER)");
+    const std::string pipe = (folder.path() / "pipe").string();
+    ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+    const std::string missing = (folder.path() / "missing.db").string();
     const struct {
         std::string uri, problem;
     } cases[] = {
+        {"sqlite:" + missing, "No such file"},
+        {"sqlite:" + pipe, "no regular file"},
         {"sqlite:" + file, "tables of version 999"},
         {"sqlite:" + text, "cannot be used"},
         {"sqlite:" + other, "holds something else"},
@@ -393,13 +403,14 @@ TEST(Store, RefusesWhatItShouldNotUse) {
     };
     for (const auto& c : cases) {
         try {
-            const ipmisel::Store store(c.uri);
+            const ipmisel::Store store(c.uri, ipmisel::IfMissing::kRefuse);
             ADD_FAILURE() << c.uri;
         } catch (const ipmisel::Failure& failure) {
             EXPECT_THAT(failure.what(), AllOf(HasSubstr(c.problem), Not(HasSubstr("hush"))));
             EXPECT_EQ(failure.exitStatus, 2);
         }
     }
+    EXPECT_FALSE(std::filesystem::exists(missing));
 }
 
 }  // namespace
