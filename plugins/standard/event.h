@@ -50,7 +50,7 @@ struct LoggedEvent {
     std::optional<std::int64_t> correctedTime;
     /// The step of the controller's clock that shows at this record.
     std::optional<std::int64_t> clockStep;
-    /// Whether the clock was or may have been set between the record before and this one.
+    /// Whether the clock was or may have been set or lost between the record before and this one.
     bool clockChanged = false;
 
     std::optional<ipmi::Severity> severity;

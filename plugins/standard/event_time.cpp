@@ -16,11 +16,16 @@ constexpr std::int64_t kResolution = 1;
 
 bool IsStep(std::int64_t seconds) { return seconds < -kResolution || seconds > kResolution; }
 
-// Goes through the log and marks where the clock was set.
+// Goes through the log and marks where the clock was set or lost.
 class ClockWatch {
 public:
     void See(LoggedEvent* event) {
-        if (event->timeKind() != ipmi::TimeKind::kClock) return;
+        const ipmi::TimeKind kind = event->timeKind();
+        if (kind == ipmi::TimeKind::kNone) return;
+        // A controller that started anew has lost its clock, until somebody sets it.
+        event->clockChanged = lastKind_ && *lastKind_ != kind;
+        lastKind_ = kind;
+        if (kind != ipmi::TimeKind::kClock) return;
         const std::int64_t now = *event->time;
         const std::optional<ipmi::ClockSet> set = ipmi::ClockSetOf(event->record);
         if (afterLoneFirst_ && set != ipmi::ClockSet::kSecond) {
@@ -28,8 +33,10 @@ public:
             event->clockChanged = true;
         } else if (set == ipmi::ClockSet::kSecond && beforeSetting_) {
             const std::int64_t step = now - *beforeSetting_;
-            event->clockChanged = IsStep(step);
-            if (event->clockChanged) event->clockStep = step;
+            if (IsStep(step)) {
+                event->clockChanged = true;
+                event->clockStep = step;
+            }
         } else if (set == ipmi::ClockSet::kSecond || set == ipmi::ClockSet::kUnspecified) {
             event->clockChanged = true;
         } else if (last_ && now < *last_ - kResolution) {
@@ -42,6 +49,7 @@ public:
     }
 
 private:
+    std::optional<ipmi::TimeKind> lastKind_;
     std::optional<std::int64_t> last_;
     std::optional<std::int64_t> beforeSetting_;  // time of the first record of a pair, just seen
     bool afterLoneFirst_ = false;

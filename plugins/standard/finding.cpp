@@ -373,10 +373,9 @@ std::vector<std::size_t> BurstsOf(std::span<const LoggedEvent> events) {
     std::size_t burst = 0;
     const LoggedEvent* before = nullptr;  // the last one with a time
     for (const LoggedEvent& event : events) {
-        const ipmi::TimeKind kind = event.timeKind();
-        if (kind != ipmi::TimeKind::kNone) {
+        if (event.timeKind() != ipmi::TimeKind::kNone) {
             if (before != nullptr &&
-                (before->timeKind() != kind || event.clockChanged ||
+                (event.clockChanged ||
                  std::int64_t{event.record.time} - before->record.time > kBurstGap)) {
                 ++burst;
             }

@@ -229,6 +229,29 @@ TEST(EventTime, IsCorrectedAfterTheLastPlaceWhereTheClockWasSet) {
     EXPECT_EQ(events[8].correctedTime, kNoon + 3603 - 120);
 }
 
+TEST(EventTime, IsNotCorrectedFromBeforeTheControllerLostItsClock) {
+    const struct {
+        std::vector<std::uint32_t> times;
+        std::vector<bool> corrected;
+    } cases[] = {{{kNoon, 100, kNoon + 60, kNoon + 61}, {false, false, true, true}},
+                 {{kNoon, 100, 0xFFFFFFFF}, {false, false, false}},
+                 {{100, kNoon, 0xFFFFFFFF, kNoon + 1}, {false, true, false, true}}};
+    for (const auto& c : cases) {
+        LogBuilder log;
+        log.node.clock = ClockFacts{.offset = 120, .uncertainty = 1};
+        for (const std::uint32_t time : c.times) {
+            log.At(time).Event(0x14, 0x01, kAsserted, {0x00, 0xFF, 0xFF});
+        }
+        std::vector<bool> corrected;
+        const auto events = log.Derive();
+        for (const LoggedEvent& event : events.Logged()) {
+            corrected.push_back(event.correctedTime.has_value());
+            EXPECT_EQ(event.clockStep, std::nullopt);
+        }
+        EXPECT_EQ(corrected, c.corrected);
+    }
+}
+
 TEST(EventTime, AStepOfOneSecondIsTheClocksResolutionAndOneOfTwoIsNot) {
     for (const std::uint32_t step : {1U, 2U}) {
         LogBuilder log;
