@@ -65,7 +65,7 @@ constexpr std::array<std::string_view, 26> kFirmwareStages{
     "calling the OS wake-up vector",
     "starting the OS boot process",
     "baseboard initialization",
-    "",
+    "code 15h",  // reserved
     "floppy initialization",
     "keyboard test",
     "pointing device test",
@@ -467,7 +467,7 @@ private:
                 if (Extends2()) {
                     const std::uint8_t byte = Data2();
                     if (High(byte) != kUnspecifiedNibble) SayCode(kWatchdogInterrupts, High(byte));
-                    Say("timer use ", At(kTimerUses, Low(byte)));
+                    if (Low(byte) != kUnspecifiedNibble) SayTimerUse(Low(byte));
                 }
                 break;
             case sensor_type::kManagementSubsystemHealth:
@@ -496,6 +496,11 @@ private:
         } else {
             Say(label, hasUnknown && state == kLegacyOff + 1 ? "unknown" : CodeText(state));
         }
+    }
+
+    void SayTimerUse(std::uint8_t use) {
+        const std::string_view words = At(kTimerUses, use);
+        Say("timer use ", words.empty() ? CodeText(use) : std::string(words));
     }
 
     void Vendors() {
