@@ -81,22 +81,24 @@ std::string_view ThresholdStatus(const ipmi::SensorReading& reading) {
     return ipmi::SeverityName(worst);
 }
 
+/// Nothing is said of a sensor that has a state which is neither good nor bad, or no others.
 std::string_view DiscreteStatus(const ipmi::Sensor& sensor, const ipmi::SensorReading& reading) {
-    bool isGraded = ipmi::ClassOfEventType(sensor.eventType) != ipmi::EventClass::kOem &&
-                    sensor.sensorType < ipmi::sensor_type::kFirstOem;
+    bool hasGraded = false;  // a state of the sensor's types
+    bool isUngraded = false;
     std::optional<ipmi::Severity> worst;
     for (unsigned offset = 0; offset < kStateCount; ++offset) {
-        if (!reading.Asserted(offset)) continue;
         const auto severity =
             ipmi::GradeOf(sensor.eventType, sensor.sensorType, static_cast<std::uint8_t>(offset))
                 .asserted;
-        if (!severity) isGraded = false;
+        hasGraded = hasGraded || severity;
+        if (!reading.Asserted(offset)) continue;
+        isUngraded = isUngraded || !severity;
         worst = std::max(worst, severity);
     }
     if (ipmi::IsFault(worst)) {
         return ipmi::SeverityName(std::min(*worst, ipmi::Severity::kCritical));
     }
-    return isGraded ? ipmi::SeverityName(ipmi::Severity::kOk) : "";
+    return hasGraded && !isUngraded ? ipmi::SeverityName(ipmi::Severity::kOk) : "";
 }
 
 void WriteRecord(Output& output, const ipmi::Sensor& sensor) {

@@ -361,6 +361,10 @@ TEST(SensorStatus, StatesAreJudgedByTheirSeverity) {
     EXPECT_EQ(status(0x6F, 0x0C, 0x0001), "warning");
     EXPECT_EQ(status(0x0B, 0x08, 0x0001), "ok");
     EXPECT_EQ(status(0x03, 0x01, 0x0002), "");  // "state asserted" tells neither
+    // Nothing is asserted: of types whose states tell neither that says nothing.
+    EXPECT_EQ(status(0x6F, 0x08, 0x0000), "ok");
+    EXPECT_EQ(status(0x03, 0x01, 0x0000), "");
+    EXPECT_EQ(status(0x6F, 0x0A, 0x0000), "");
     EXPECT_EQ(status(0x70, 0x01, 0x0000), "");
     EXPECT_EQ(status(0x6F, 0xC0, 0x0000), "");
 }
