@@ -252,11 +252,14 @@ void TrySensorRecords(DoctorController* controller, Steps* steps) {
 
 void TryClock(DoctorController* controller, Steps* steps) {
     constexpr std::string_view kWhat = "clock";
-    constexpr long long kTolerated = 60;
-    const auto answer = controller->Exchange(ipmi::GetSelTime());
-    const auto time = answer && answer->front() == ipmi::kCompleted
-                          ? ipmi::ParseSelTime(std::span(*answer).subspan(1))
-                          : std::nullopt;
+    constexpr long long kMaxOffset = 60;
+    const auto read = [&](const ipmi::Command& command, auto parse) {
+        const auto answer = controller->Exchange(command);
+        return answer && answer->front() == ipmi::kCompleted ? parse(std::span(*answer).subspan(1))
+                                                             : std::nullopt;
+    };
+    const auto utcOffset = read(ipmi::GetSelTimeUtcOffset(), ipmi::ParseSelTimeUtcOffset);
+    const auto time = read(ipmi::GetSelTime(), ipmi::ParseSelTime);
     if (!time) {
         steps->Bad(kWhat, "the BMC does not tell its time; times in the report cannot be compared");
         return;
@@ -267,10 +270,11 @@ void TryClock(DoctorController* controller, Steps* steps) {
                    "take the time from NTP");
         return;
     }
+    // A BMC that tells its UTC offset keeps local time.
     const long long offset =
-        static_cast<long long>(*time) - static_cast<long long>(std::time(nullptr));
+        static_cast<long long>(*time) - 60LL * utcOffset.value_or(0) - std::time(nullptr);
     const std::string text = Format("%+lld s against this machine's", offset);
-    if (offset > kTolerated || offset < -kTolerated) {
+    if (offset > kMaxOffset || offset < -kMaxOffset) {
         steps->Bad(kWhat, text + "; set it at the BMC, or let it take the time from NTP");
     } else {
         steps->Good(kWhat, text);

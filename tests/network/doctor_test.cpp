@@ -56,6 +56,8 @@ Finding ExamineBmc(const ipmisim::RmcpBmc::Options& options,
 
 TEST(Doctor, ABmcWithoutFaultIsWell) {
     ipmisim::BmcDescription bmc = Bmc();
+    bmc.utcOffsetMinutes = 60;  // local time, and not wrong
+    *bmc.selTime += 3600;
     // A compact record: owner, LUN and number of the sensor after the header.
     std::vector<std::uint8_t> sensor(32, 0);
     std::copy_n(std::array<std::uint8_t, 8>{1, 0, 0x51, 2, 27, 0x20, 0, 0x31}.begin(), 8,
