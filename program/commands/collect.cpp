@@ -255,6 +255,40 @@ void RefuseNewOfAll(const CollectOptions& options) {
                                   "format such as events");
 }
 
+/// The head of a report on the machine that is open.
+ReportHead HeadOf(const CollectOptions& options, const NQORTQR20::PluginSet& plugins,
+                  const std::vector<SystemInfo>& systems, const std::vector<std::string>& wanted) {
+    return {.source = Joined(options.access.Sources()),
+            .plugin = plugins.Plugins().front()->Info(),
+            .machineType = NQORTQR20::GetMachineFacts().machineType,
+            .nodes = static_cast<std::size_t>(NQORTQR20::SPLibrary::GetNumberBMCNode()),
+            .systems = systems,
+            .collected = {NQORTQR20::TOSSpecific::GetLocalTime().TotalMicroseconds() /
+                          kMicrosecondsPerSecond},
+            .classes = plugins.Classes(),
+            .wanted = wanted,
+            .named = !options.report.classes.empty()};
+}
+
+/// How the collection ended; says the plug-ins' notices.
+ReportEnd EndOf(const ReportHead& head, const ReportSink& sink,
+                const NQORTQR20::CollectionPlan& plan) {
+    ReportEnd end;
+    end.stopped = NQORTQR20::Stopped();
+    end.notices = TellNotices();
+    end.completeness = NQORTQR20::GetCompleteness();
+    end.hasBmc = HasBmc() || HasAnswered(end.completeness);
+    end.exported = sink.Exported();
+    for (std::size_t node = 0; node < end.exported.size(); ++node) {
+        end.completeness[node].log.exported = end.exported[node];
+    }
+    end.unreachable = NQORTQR20::GetUnreachable();
+    end.plugins = plan.Statuses();
+    end.status = plan.Status();
+    end.systems = head.systems;
+    return end;
+}
+
 Outcome CollectTo(const CollectOptions& options, LogLines& log, ReportOutput& output) {
     const auto begin = std::chrono::steady_clock::now();
     // The plug-ins first: without them nobody is asked for a password.
@@ -295,24 +329,13 @@ Outcome CollectTo(const CollectOptions& options, LogLines& log, ReportOutput& ou
     const std::shared_ptr<NQORTQR20::CaptureWriter> capture = Record(options, source, wanted);
     const Machine machine(std::move(source));
 
-    const auto nodes = static_cast<std::size_t>(NQORTQR20::SPLibrary::GetNumberBMCNode());
-    const ReportHead head{.source = Joined(options.access.Sources()),
-                          .plugin = plugins->Plugins().front()->Info(),
-                          .machineType = NQORTQR20::GetMachineFacts().machineType,
-                          .nodes = nodes,
-                          .systems = systems,
-                          .collected = {NQORTQR20::TOSSpecific::GetLocalTime().TotalMicroseconds() /
-                                        kMicrosecondsPerSecond},
-                          .classes = plugins->Classes(),
-                          .wanted = reported,
-                          .named = !options.report.classes.empty()};
+    const ReportHead head = HeadOf(options, *plugins, systems, reported);
     const std::unique_ptr<ReportWriter> report = output.Make(head);
     const bool unchanged = store && StoredCollection::Unchanged(readings);
     if (unchanged) wanted.clear();
     ReportWriter& taken = store && !unchanged ? store->Record(*report, reported) : *report;
-    ReportSink sink(taken, *plugins, wanted, nodes);
+    ReportSink sink(taken, *plugins, wanted, head.nodes);
     NQORTQR20::CollectionPlan plan(*plugins, wanted);
-    ReportEnd end;
     if (output.StreamsToTerminal()) progress.End();
     NQORTQR20::ObserveReading(progress.Observer());
     plan.RunPasses(sink, [] { return !OutputIsOver(); });
@@ -321,19 +344,8 @@ Outcome CollectTo(const CollectOptions& options, LogLines& log, ReportOutput& ou
     progress.End();
     StopSignals::EndCollecting();
     sink.Check();
-    end.stopped = NQORTQR20::Stopped();
-    end.notices = TellNotices();
+    ReportEnd end = EndOf(head, sink, plan);
     if (unchanged) end.notices = store->NoticesOfUnchanged();
-    end.completeness = NQORTQR20::GetCompleteness();
-    end.hasBmc = HasBmc() || HasAnswered(end.completeness);
-    end.exported = sink.Exported();
-    for (std::size_t node = 0; node < end.exported.size(); ++node) {
-        end.completeness[node].log.exported = end.exported[node];
-    }
-    end.unreachable = NQORTQR20::GetUnreachable();
-    end.plugins = plan.Statuses();
-    end.status = plan.Status();
-    end.systems = head.systems;
     end.seconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - begin).count();
     report->Finish(end);
     output.Commit();
