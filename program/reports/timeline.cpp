@@ -6,6 +6,8 @@
 #include <utility>
 
 #include "base/text.h"
+#include "ipmi/event_types.h"
+#include "ipmi/sensor_types.h"
 #include "program/reports/html_text.h"
 #include "program/reports/terminal_text.h"
 #include "program/reports/wording.h"
@@ -22,27 +24,53 @@ constexpr std::size_t kTextColumns = 70;     // of a mark's text
 constexpr std::int64_t kGapSeconds = 21600;  // six hours
 constexpr std::int64_t kJumpSeconds = -5;    // a clock that goes back by more has been set
 
+/// What an ACPI power state is to somebody in front of the machine; null for one that is not known.
+const char* PowerOf(std::int64_t offset) {
+    switch (offset) {
+        case 0:   // S0
+        case 11:  // legacy on
+            return "power on";
+        case 1:  // S1 to S3
+        case 2:
+        case 3:
+        case 8:  // one of them
+        case 9:  // S1 to S4
+            return "sleep";
+        case 4:   // S4, suspended to disk
+        case 5:   // S5
+        case 6:   // S4 or S5
+        case 7:   // G3
+        case 10:  // S5 by override
+        case 12:  // legacy off
+            return "power off";
+        default:
+            return nullptr;
+    }
+}
+
 /// What an event changes of the machine as a whole, by sensor type (IPMI 2.0 table 42-3); null for
 /// the others.
 const char* ChangeOf(const Event& event) {
-    if (event.eventTypeCode != 0x6F || !event.sensorTypeCode || !event.offset) return nullptr;
+    namespace type = ipmi::sensor_type;
+    if (event.eventTypeCode != ipmi::kSensorSpecificEvents || !event.sensorTypeCode ||
+        !event.offset) {
+        return nullptr;
+    }
     const bool asserted = !event.IsDeasserted();
     switch (*event.sensorTypeCode) {
-        case 0x09:  // power unit
+        case type::kPowerUnit:
             if (*event.offset == 0) return asserted ? "power off" : "power on";
-            if (*event.offset == 1 && asserted) return "power cycle";
-            return nullptr;
-        case 0x12:  // system event
+            return *event.offset == 1 && asserted ? "power cycle" : nullptr;
+        case type::kSystemEvent:
             return *event.offset == 5 && asserted ? "clock set" : nullptr;
-        case 0x1D:  // system boot or restart initiated
+        case type::kSystemBoot:
             return asserted ? "boot" : nullptr;
-        case 0x1F:  // base OS boot or installation status
+        case type::kOsBoot:
             return asserted ? "operating system" : nullptr;
-        case 0x20:  // OS stop or shutdown
-            return asserted ? "operating system stops" : nullptr;
-        case 0x22:  // system ACPI power state
-            if (!asserted) return nullptr;
-            return *event.offset == 0 ? "power on" : *event.offset <= 7 ? "power off" : nullptr;
+        case type::kOsStop:  // 5: no reaction to a shutdown request
+            return *event.offset != 5 && asserted ? "operating system stops" : nullptr;
+        case type::kAcpiPowerState:
+            return asserted ? PowerOf(*event.offset) : nullptr;
         default:
             return nullptr;
     }
@@ -85,94 +113,120 @@ std::vector<double> Timeline::Positions() const {
     return at;
 }
 
-std::string Timeline::Svg() const {
-    if (points_.empty()) return {};
-    // Lanes from the top: the worst first, of those that occur; below them the machine's.
-    std::vector<std::pair<std::optional<Severity>, double>> lanes;
-    double y = 18;
-    const auto addLane = [&](std::optional<Severity> severity) {
+/// One drawing, layer by layer: what comes later lies above.
+class Timeline::Drawing {
+public:
+    Drawing(const std::vector<Point>& points, std::vector<double> x)
+        : points_(points), x_(std::move(x)) {
+        AddLanes();
+        AddTimes();
+        AddMarks();
+    }
+    std::string Svg() const {
+        return Format(
+                   "<svg class=\"timeline\" role=\"group\" viewBox=\"0 0 %.0f %.0f\" "
+                   "aria-label=\"Events by time and severity\">",
+                   kWidth, Height()) +
+               gaps_ + lines_ + labels_ + marks_ + "</svg>";
+    }
+
+private:
+    double Height() const { return bottom_ + 16; }
+
+    // From the top: the worst first, of those that occur; below them the machine's.
+    void AddLanes() {
+        const auto all = Severities();
+        std::for_each(all.rbegin(), all.rend(), [&](const auto& info) { AddLane(info.severity); });
+        AddLane(std::nullopt);
+        if (std::any_of(points_.begin(), points_.end(),
+                        [](const Point& p) { return p.change != nullptr; })) {
+            machineLane_ = bottom_;
+            AddLine("power, boot");
+        }
+    }
+    void AddLane(std::optional<Severity> severity) {
         const bool occurs = std::any_of(points_.begin(), points_.end(),
                                         [&](const Point& p) { return p.severity == severity; });
         if (!occurs) return;
-        lanes.emplace_back(severity, y);
-        y += kLane;
-    };
-    const auto all = Severities();
-    std::for_each(all.rbegin(), all.rend(), [&](const auto& info) { addLane(info.severity); });
-    addLane(std::nullopt);
-    const bool changes = std::any_of(points_.begin(), points_.end(),
-                                     [](const Point& p) { return p.change != nullptr; });
-    const double machineLane = y;
-    if (changes) y += kLane;
-    const double height = y + 16;
-
-    std::string lines, gaps, labels, marks;
-    const auto label = [&](double x, double at, const char* anchor, const std::string& text) {
-        labels += Format("<text x=\"%.0f\" y=\"%.0f\" text-anchor=\"%s\">", x, at, anchor) +
-                  HtmlText(text) + "</text>";
-    };
-    const auto lane = [&](double at, const std::string& name) {
-        lines += Format("<line class=\"lane\" x1=\"%.0f\" x2=\"%.0f\" y1=\"%.0f\" y2=\"%.0f\"/>",
-                        kLeft, kWidth - kRight, at, at);
-        label(kLeft - 10, at + 4, "end", name);
-    };
-    for (const auto& [severity, at] : lanes) {
-        lane(at, severity ? std::string(InfoOf(*severity).name) : "not graded");
+        lanes_.emplace_back(severity, bottom_);
+        AddLine(severity ? std::string(InfoOf(*severity).name) : "not graded");
     }
-    if (changes) lane(machineLane, "power, boot");
+    void AddLine(const std::string& name) {
+        lines_ += Format("<line class=\"lane\" x1=\"%.0f\" x2=\"%.0f\" y1=\"%.0f\" y2=\"%.0f\"/>",
+                         kLeft, kWidth - kRight, bottom_, bottom_);
+        AddLabel(kLeft - 10, bottom_ + 4, "end", name);
+        bottom_ += kLane;
+    }
+    void AddLabel(double x, double y, const char* anchor, const std::string& text) {
+        labels_ += Format("<text x=\"%.0f\" y=\"%.0f\" text-anchor=\"%s\">", x, y, anchor) +
+                   HtmlText(text) + "</text>";
+    }
 
-    const std::vector<double> x = Positions();
+    // Where nothing happened for long, where the clock went back, and when it goes on.
+    void AddTimes() {
+        double lastLabel = -kWidth;
+        double lastX = 0;
+        MaybeTime last;
+        for (std::size_t i = 0; i < points_.size(); ++i) {
+            if (!points_[i].time) continue;
+            const NQORTQR20::Time time = *points_[i].time;
+            const std::int64_t pause = last ? time.seconds - last->seconds : 0;
+            if (last && pause < kJumpSeconds) {
+                AddJump(i == 0 ? x_[i] : (x_[i] + x_[i - 1]) / 2, -pause);
+            } else if (pause > kGapSeconds && x_[i] - x_[i - 1] > 6) {
+                AddGap(x_[i - 1] + 2, x_[i] - 2, pause);
+            }
+            const bool starts = !last || pause > kGapSeconds || pause < kJumpSeconds;
+            if (starts && x_[i] - lastLabel > 112 && x_[i] < kWidth - 110) {
+                AddLabel(x_[i], Height() - 3, "start", DateAndTime(time).substr(0, 16));
+                lastLabel = x_[i];
+            }
+            last = time;
+            lastX = x_[i];
+        }
+        if (last && lastX - lastLabel > 240) {
+            AddLabel(lastX, Height() - 3, "end", DateAndTime(*last).substr(0, 16));
+        }
+    }
+    void AddJump(double x, std::int64_t seconds) {
+        gaps_ += Format("<line class=\"jump\" x1=\"%.0f\" x2=\"%.0f\" y1=\"6\" y2=\"%.0f\"><title>",
+                        x, x, bottom_ - 8) +
+                 "the clock went back " + DurationText(static_cast<double>(seconds)) +
+                 "</title></line>";
+    }
+    void AddGap(double begin, double end, std::int64_t seconds) {
+        gaps_ += Format(
+                     "<rect class=\"gap\" x=\"%.0f\" y=\"6\" width=\"%.0f\" height=\"%.0f\">"
+                     "<title>",
+                     begin, end - begin, bottom_ - 14) +
+                 "nothing for " + DurationText(static_cast<double>(seconds)) + "</title></rect>";
+    }
+
     // A mark stands for all events of a lane that fall together.
     struct Mark {
         const Point* first;
         unsigned count = 0;
         double x = 0;
     };
-    std::map<std::pair<std::size_t, std::size_t>, Mark> bins;
-    double lastLabel = -kWidth;
-    double lastX = 0;
-    MaybeTime last;
-    for (std::size_t i = 0; i < points_.size(); ++i) {
-        const Point& point = points_[i];
-        const auto bin = static_cast<std::size_t>((x[i] - kLeft) / (kWidth - kLeft) * kBins);
-        const auto found = std::find_if(lanes.begin(), lanes.end(),
-                                        [&](const auto& l) { return l.first == point.severity; });
-        const auto index = static_cast<std::size_t>(found - lanes.begin());
-        Mark& mark = bins.try_emplace({index, bin}, Mark{&point, 0, x[i]}).first->second;
-        ++mark.count;
-        if (point.change != nullptr) {
-            bins.try_emplace({lanes.size(), bin}, Mark{&point, 1, x[i]});
+    void AddMarks() {
+        std::map<std::pair<std::size_t, std::size_t>, Mark> bins;  // by lane and place
+        for (std::size_t i = 0; i < points_.size(); ++i) {
+            const Point& point = points_[i];
+            const auto bin = static_cast<std::size_t>((x_[i] - kLeft) / (kWidth - kLeft) * kBins);
+            const auto lane = std::find_if(lanes_.begin(), lanes_.end(), [&](const auto& l) {
+                return l.first == point.severity;
+            });
+            const auto index = static_cast<std::size_t>(lane - lanes_.begin());
+            Mark& mark = bins.try_emplace({index, bin}, Mark{&point, 0, x_[i]}).first->second;
+            ++mark.count;
+            if (point.change != nullptr) {
+                bins.try_emplace({lanes_.size(), bin}, Mark{&point, 1, x_[i]});
+            }
         }
-        if (!point.time) continue;
-        const std::int64_t pause = last ? point.time->seconds - last->seconds : 0;
-        const double middle = i == 0 ? x[i] : (x[i] + x[i - 1]) / 2;
-        if (last && pause < kJumpSeconds) {
-            gaps +=
-                Format("<line class=\"jump\" x1=\"%.0f\" x2=\"%.0f\" y1=\"6\" y2=\"%.0f\"><title>",
-                       middle, middle, y - 8) +
-                "the clock went back " + DurationText(static_cast<double>(-pause)) +
-                "</title></line>";
-        } else if (pause > kGapSeconds && x[i] - x[i - 1] > 6) {
-            gaps += Format(
-                        "<rect class=\"gap\" x=\"%.0f\" y=\"6\" width=\"%.0f\" height=\"%.0f\">"
-                        "<title>",
-                        x[i - 1] + 2, x[i] - x[i - 1] - 4, y - 14) +
-                    "nothing for " + DurationText(static_cast<double>(pause)) + "</title></rect>";
-        }
-        const bool starts = !last || pause > kGapSeconds || pause < kJumpSeconds;
-        if (starts && x[i] - lastLabel > 112 && x[i] < kWidth - 110) {
-            label(x[i], height - 3, "start", DateAndTime(*point.time).substr(0, 16));
-            lastLabel = x[i];
-        }
-        last = point.time;
-        lastX = x[i];
+        for (const auto& [key, mark] : bins) AddMark(key.first, mark);
     }
-    if (last && lastX - lastLabel > 240) {
-        label(lastX, height - 3, "end", DateAndTime(*last).substr(0, 16));
-    }
-    for (const auto& [key, mark] : bins) {
-        const auto& [index, bin] = key;
-        const bool machine = index == lanes.size();
+    void AddMark(std::size_t lane, const Mark& mark) {
+        const bool machine = lane == lanes_.size();
         const Point& first = *mark.first;
         const std::string when = first.time ? DateAndTime(*first.time) + " UTC: " : "";
         const std::string more =
@@ -181,17 +235,24 @@ std::string Timeline::Svg() const {
                                  : first.severity ? std::string(InfoOf(*first.severity).name)
                                                   : "none";
         const double radius = std::min(9.0, 4 + std::log2(static_cast<double>(mark.count)));
-        marks += Link(first.row,
-                      Circle(mark.x, machine ? machineLane : lanes[index].second, radius, name) +
-                          "<title>" +
-                          HtmlText(Listed({when, machine ? first.change : first.text, more}, "")) +
-                          "</title></circle>");
+        marks_ += Link(first.row,
+                       Circle(mark.x, machine ? machineLane_ : lanes_[lane].second, radius, name) +
+                           "<title>" +
+                           HtmlText(Listed({when, machine ? first.change : first.text, more}, "")) +
+                           "</title></circle>");
     }
-    return Format(
-               "<svg class=\"timeline\" role=\"group\" viewBox=\"0 0 %.0f %.0f\" "
-               "aria-label=\"Events by time and severity\">",
-               kWidth, height) +
-           gaps + lines + labels + marks + "</svg>";
+
+    const std::vector<Point>& points_;
+    std::vector<double> x_;
+    std::vector<std::pair<std::optional<Severity>, double>> lanes_;  ///< and where each lies
+    double machineLane_ = 0;
+    double bottom_ = 18;  ///< of the lanes
+    std::string gaps_, lines_, labels_, marks_;
+};
+
+std::string Timeline::Svg() const {
+    if (points_.empty()) return {};
+    return Drawing(points_, Positions()).Svg();
 }
 
 }  // namespace ipmisel

@@ -27,6 +27,7 @@ private:
         std::string text;              ///< cut
         const char* change = nullptr;  ///< of the state of the machine: "power off"
     };
+    class Drawing;
     std::vector<double> Positions() const;
 
     std::vector<Point> points_;

@@ -3,6 +3,7 @@
 #include "program/commands/failure.h"
 #include "program/reports/output_file.h"
 #include "program/reports/report.h"
+#include "program/reports/timeline.h"
 
 namespace {
 
@@ -195,6 +196,41 @@ TEST(Outcome, SaysHowItWentAndWhatIsMissing) {
     EXPECT_EQ(OutcomeOf(end).exitStatus, 4);
     EXPECT_EQ(OutcomeOf(end).problem,
               partly + "lan:a could not be opened; lan:c could not be opened");
+}
+
+TEST(Timeline, MarksWhatAnEventChangesOfTheMachine) {
+    const struct {
+        std::int64_t sensorType, offset;
+        const char* direction;
+        const char* change;  // null: none
+    } cases[] = {{0x09, 0, "asserted", "power off"},
+                 {0x09, 0, "deasserted", "power on"},
+                 {0x09, 4, "asserted", nullptr},
+                 {0x12, 5, "asserted", "clock set"},
+                 {0x22, 0, "asserted", "power on"},
+                 {0x22, 3, "asserted", "sleep"},
+                 {0x22, 4, "asserted", "power off"},
+                 {0x22, 8, "asserted", "sleep"},
+                 {0x22, 11, "asserted", "power on"},
+                 {0x22, 12, "asserted", "power off"},
+                 {0x22, 14, "asserted", nullptr},
+                 {0x22, 0, "deasserted", nullptr},
+                 {0x20, 1, "asserted", "operating system stops"},
+                 {0x20, 5, "asserted", nullptr}};
+    for (const auto& c : cases) {
+        ipmisel::Event event;
+        event.eventTypeCode = 0x6F;
+        event.sensorTypeCode = c.sensorType;
+        event.offset = c.offset;
+        event.direction = c.direction;
+        ipmisel::Timeline timeline;
+        timeline.Add(event, "");
+        const std::string svg = timeline.Svg();
+        const auto at = svg.find("<circle class=\"mark\"");  // in the machine's lane
+        EXPECT_EQ(at != std::string::npos, c.change != nullptr) << c.sensorType << ' ' << c.offset;
+        if (c.change == nullptr || at == std::string::npos) continue;
+        EXPECT_THAT(svg.substr(at), testing::HasSubstr(std::string("<title>") + c.change + "<"));
+    }
 }
 
 }  // namespace
