@@ -5,15 +5,6 @@
 #include "base/bytes.h"
 
 namespace ipmi {
-namespace {
-
-/// Completion codes of a controller that cannot give so many bytes in one answer.
-bool TooMany(std::uint8_t completionCode) {
-    return completionCode == kRequestLengthInvalid || completionCode == kRequestLengthExceeded ||
-           completionCode == kCannotReturnBytes;
-}
-
-}  // namespace
 
 std::optional<FruAreaInfo> ParseFruAreaInfo(std::span<const std::uint8_t> data) {
     ipmisel::ByteReader in(data);
@@ -38,7 +29,7 @@ std::optional<Command> FruDeviceReader::NextRequest() const {
 
 void FruDeviceReader::TakeAnswer(std::uint8_t completionCode, std::span<const std::uint8_t> data) {
     if (ended_ || complete()) return;
-    if (TooMany(completionCode) && chunk_ > kLeastChunk) {
+    if (RefusesSoManyBytes(completionCode) && chunk_ > kLeastChunk) {
         chunk_ /= 2;
         return;
     }

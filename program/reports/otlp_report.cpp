@@ -1,6 +1,8 @@
 #include <algorithm>
 #include <iterator>
 
+#include "ipmi/event_types.h"
+#include "ipmi/sensor_types.h"
 #include "program/reports/json_text.h"
 #include "program/reports/report.h"
 #include "program/reports/systems.h"
@@ -36,13 +38,21 @@ std::string Nanoseconds(MaybeTime time) {
 
 /// hw.type by sensor type (IPMI 2.0 table 42-3); empty where there is none for it.
 std::string HardwareType(Integer sensorType) {
+    namespace type = ipmi::sensor_type;
     constexpr struct {
         std::int64_t sensorType;
         const char* hardware;
-    } kTypes[] = {{0x01, "temperature"}, {0x02, "voltage"},       {0x04, "fan"},
-                  {0x05, "enclosure"},   {0x07, "cpu"},           {0x08, "power_supply"},
-                  {0x0C, "memory"},      {0x0D, "physical_disk"}, {0x18, "enclosure"},
-                  {0x27, "network"},     {0x29, "battery"}};
+    } kTypes[] = {{type::kTemperature, "temperature"},
+                  {type::kVoltage, "voltage"},
+                  {type::kFan, "fan"},
+                  {type::kPhysicalSecurity, "enclosure"},
+                  {type::kProcessor, "cpu"},
+                  {type::kPowerSupply, "power_supply"},
+                  {type::kMemory, "memory"},
+                  {type::kDriveSlot, "physical_disk"},
+                  {type::kChassis, "enclosure"},
+                  {type::kLan, "network"},
+                  {type::kBattery, "battery"}};
     const auto* const row = std::find_if(std::begin(kTypes), std::end(kTypes),
                                          [&](const auto& t) { return t.sensorType == sensorType; });
     return row == std::end(kTypes) ? "" : row->hardware;
@@ -50,9 +60,11 @@ std::string HardwareType(Integer sensorType) {
 
 std::string HardwareState(const Event& event) {
     // "Predictive failure" as an event type, or as an offset of a power supply or a drive.
-    const bool predicted = (event.eventTypeCode == 0x04 && event.offset == 1) ||
-                           (event.eventTypeCode == 0x6F && event.offset == 2 &&
-                            (event.sensorTypeCode == 0x08 || event.sensorTypeCode == 0x0D));
+    const bool predicted =
+        (event.eventTypeCode == ipmi::kPredictiveFailureEvents && event.offset == 1) ||
+        (event.eventTypeCode == ipmi::kSensorSpecificEvents && event.offset == 2 &&
+         (event.sensorTypeCode == ipmi::sensor_type::kPowerSupply ||
+          event.sensorTypeCode == ipmi::sensor_type::kDriveSlot));
     if (!event.severity || *event.severity == Severity::kInformation) return {};
     if (*event.severity == Severity::kOk) return "ok";
     if (predicted) return "predicted_failure";
@@ -63,7 +75,7 @@ std::string HardwareState(const Event& event) {
 std::string LimitType(const Event& event) {
     constexpr const char* kLimits[] = {"low.degraded",  "low.critical",  "low.critical",
                                        "high.degraded", "high.critical", "high.critical"};
-    if (event.eventTypeCode != 0x01 || !event.offset) return {};
+    if (event.eventTypeCode != ipmi::kThresholdEvents || !event.offset) return {};
     const auto limit = static_cast<std::size_t>(*event.offset / 2);
     return limit < std::size(kLimits) ? kLimits[limit] : "";
 }

@@ -4,6 +4,8 @@
 #include <span>
 
 #include "base/text.h"
+#include "ipmi/event_types.h"
+#include "ipmi/sel_record.h"
 #include "program/reports/digest.h"
 #include "program/reports/json_text.h"
 #include "program/reports/report.h"
@@ -125,9 +127,6 @@ constexpr std::array<std::span<const std::string_view>, 13> kEntryCodes{
     kAvailability,
     kRedundancy,
     kPower};
-constexpr std::int64_t kSensorSpecific = 0x6F;
-constexpr std::int64_t kSystemEvent = 0x02;
-constexpr std::int64_t kSystemEventOfFirmware = 0x04;  // not of the standard, in its layout
 
 std::string_view SensorTypeName(std::int64_t code) {
     const auto index = static_cast<std::size_t>(code);
@@ -136,7 +135,9 @@ std::string_view SensorTypeName(std::int64_t code) {
 }
 
 std::string_view EntryCodeName(const Event& event) {
-    if (event.eventTypeCode == kSensorSpecific) return event.IsDeasserted() ? "Deassert" : "Assert";
+    if (event.eventTypeCode == ipmi::kSensorSpecificEvents) {
+        return event.IsDeasserted() ? "Deassert" : "Assert";
+    }
     const auto type = static_cast<std::size_t>(event.eventTypeCode.value_or(0));
     const auto offset = static_cast<std::size_t>(event.offset.value_or(0xFF));
     if (type >= kEntryCodes.size() || offset >= kEntryCodes[type].size()) return kOem;
@@ -184,7 +185,7 @@ Json EntryOf(const Event& event, const std::string& folder) {
                  {"Name", "Event log record " + id}};
     const auto record = event.Record();
     const std::int64_t type = event.recordType.value_or(record ? (*record)[2] : 0);
-    if (record && (type == kSystemEvent || type == kSystemEventOfFirmware)) {
+    if (record && (type == ipmi::kSystemEventType || type == ipmi::kNonStandardEventType)) {
         AddSystemEvent(event, *record, &json);
     } else {
         json["EntryType"] = "Oem";
