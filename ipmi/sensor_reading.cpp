@@ -37,11 +37,12 @@ std::optional<SensorThresholds> SensorThresholds::Parse(std::span<const std::uin
     return thresholds;
 }
 
-std::optional<AskedFactors> AskedFactors::Parse(std::span<const std::uint8_t> data) {
+std::optional<SensorReadingFactors> SensorReadingFactors::Parse(
+    std::span<const std::uint8_t> data) {
     if (data.empty()) return std::nullopt;
     const auto factors = ReadingFactors::Parse(data.subspan(1));
     if (!factors) return std::nullopt;
-    return AskedFactors{data[0], *factors};
+    return SensorReadingFactors{data[0], *factors};
 }
 
 }  // namespace ipmi

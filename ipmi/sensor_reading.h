@@ -54,11 +54,11 @@ struct SensorThresholds {
 
 /// Get Sensor Reading Factors (35.5): the factors that hold for the reading asked for, and the next
 /// reading for which others do.
-struct AskedFactors {
+struct SensorReadingFactors {
     std::uint8_t nextReading = 0;
     ReadingFactors factors;
 
-    static std::optional<AskedFactors> Parse(std::span<const std::uint8_t> data);
+    static std::optional<SensorReadingFactors> Parse(std::span<const std::uint8_t> data);
 };
 
 }  // namespace ipmi

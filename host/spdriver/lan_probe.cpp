@@ -46,30 +46,30 @@ std::string InNumbers(const Endpoint& endpoint) {
     return error == 0 ? name.data() : "";
 }
 
-/// One question at a time over a socket.
-class Questions {
+/// One request at a time over a socket.
+class ProbeRequests {
 public:
-    Questions(std::span<const Endpoint> endpoints, std::chrono::milliseconds patience)
+    ProbeRequests(std::span<const Endpoint> endpoints, std::chrono::milliseconds patience)
         : socket_(endpoints), patience_(patience) {}
 
     /// Sends the packet, three times when need be, until `take` says that an answer was the one.
     /// How long it took; empty when it did not come.
-    std::optional<std::chrono::microseconds> Ask(const Packet& packet,
-                                                 const std::function<bool(ByteView)>& take) {
-        return Ask(packet, patience_, take);
+    std::optional<std::chrono::microseconds> Exchange(const Packet& packet,
+                                                      const std::function<bool(ByteView)>& take) {
+        return Exchange(packet, patience_, take);
     }
     /// The same for an answer that many BMCs do not give.
-    std::optional<std::chrono::microseconds> AskBriefly(const Packet& packet,
-                                                        const std::function<bool(ByteView)>& take) {
+    std::optional<std::chrono::microseconds> ExchangeBriefly(
+        const Packet& packet, const std::function<bool(ByteView)>& take) {
         constexpr std::chrono::milliseconds kBrief{1000};
-        return Ask(packet, std::min(patience_, kBrief), take);
+        return Exchange(packet, std::min(patience_, kBrief), take);
     }
     bool refused() const { return refused_; }
 
 private:
-    std::optional<std::chrono::microseconds> Ask(const Packet& packet,
-                                                 std::chrono::milliseconds patience,
-                                                 const std::function<bool(ByteView)>& take) {
+    std::optional<std::chrono::microseconds> Exchange(const Packet& packet,
+                                                      std::chrono::milliseconds patience,
+                                                      const std::function<bool(ByteView)>& take) {
         constexpr int kTries = 3;
         for (int i = 0; i < kTries && !refused_ && Stopped() == StopReason::kNone; ++i) {
             const auto sent = ProbeClock::now();
@@ -98,7 +98,7 @@ private:
 /// Get Channel Cipher Suites (IPMI 2.0, 22.15): the records of the list follow each other in
 /// answers of 16 bytes. A record begins with C0h and the suite's number, or C1h, a vendor's number
 /// and its enterprise number; what follows up to the next one are its algorithms.
-std::vector<int> ListedSuites(Questions* questions) {
+std::vector<int> ListedSuites(ProbeRequests* requests) {
     constexpr std::size_t kFullAnswer = 16;
     constexpr std::uint8_t kListBySuite = 0x80, kStandard = 0xC0, kVendors = 0xC1;
     constexpr unsigned kMaxAnswers = 64;
@@ -108,16 +108,17 @@ std::vector<int> ListedSuites(Questions* questions) {
             ipmi::kGetChannelCipherSuites,
             {rmcpplus::kThisChannel, 0, static_cast<std::uint8_t>(kListBySuite | index)});
         std::optional<std::size_t> count;
-        questions->AskBriefly(rmcpplus::SessionlessRequest(command, index), [&](ByteView packet) {
-            const auto answer =
-                rmcpplus::ParseSessionlessAnswer(packet, index, command.code(), true);
-            if (!answer) return false;
-            // Completion code and channel come before the records.
-            if (answer->size() < 2 || (*answer)[0] != ipmi::kCompleted) return true;
-            count = answer->size() - 2;
-            records.insert(records.end(), answer->begin() + 2, answer->end());
-            return true;
-        });
+        requests->ExchangeBriefly(
+            rmcpplus::SessionlessRequest(command, index), [&](ByteView packet) {
+                const auto answer =
+                    rmcpplus::ParseSessionlessAnswer(packet, index, command.code(), true);
+                if (!answer) return false;
+                // Completion code and channel come before the records.
+                if (answer->size() < 2 || (*answer)[0] != ipmi::kCompleted) return true;
+                count = answer->size() - 2;
+                records.insert(records.end(), answer->begin() + 2, answer->end());
+                return true;
+            });
         if (!count || *count < kFullAnswer) break;
     }
     std::vector<int> suites;
@@ -153,9 +154,9 @@ LanProbe ProbeLan(const std::string& place, std::chrono::milliseconds patience) 
         probe.addresses.push_back(InNumbers(endpoint));
     }
     try {
-        Questions questions(found->endpoints, patience);
+        ProbeRequests requests(found->endpoints, patience);
         LanProbe::Capabilities capabilities;
-        const auto took = questions.Ask(
+        const auto took = requests.Exchange(
             rmcpplus::AuthenticationCapabilitiesRequest(kUser, kRqSeq), [&](ByteView packet) {
                 const auto answer = rmcpplus::ParseAuthenticationCapabilities(packet, kRqSeq, true);
                 if (answer) capabilities = {answer->ipmi20, answer->hasKey, {}};
@@ -164,10 +165,10 @@ LanProbe ProbeLan(const std::string& place, std::chrono::milliseconds patience) 
         if (took) {
             capabilities.took = *took;
             probe.capabilities = capabilities;
-            probe.cipherSuites = ListedSuites(&questions);
+            probe.cipherSuites = ListedSuites(&requests);
         }
-        if (!questions.refused()) probe.pong = questions.AskBriefly(PresencePing(), IsPong);
-        probe.refused = questions.refused();
+        if (!requests.refused()) probe.pong = requests.ExchangeBriefly(PresencePing(), IsPong);
+        probe.refused = requests.refused();
         if (probe.refused) probe.problem = Advice(name, OpeningError::kPortClosed);
         if (!took && !probe.refused) probe.problem = Advice(name, OpeningError::kNoAnswer);
     } catch (OpeningError error) {

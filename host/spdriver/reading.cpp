@@ -12,19 +12,19 @@
 namespace NQORTQR20 {
 namespace {
 
-struct Live {
+struct NodeReader {
     std::size_t number;
     SourceNode* node;
     std::shared_ptr<tqrhost::ControllerReader> reader;
 };
 
 /// The event logs for as long as one of them is read, then the sensor repositories.
-ReadingState StateOf(const std::vector<Live>& live) {
+ReadingState StateOf(const std::vector<NodeReader>& live) {
     const bool log = std::any_of(live.begin(), live.end(),
-                                 [](const Live& one) { return one.reader->ReadsLog(); });
+                                 [](const NodeReader& one) { return one.reader->ReadsLog(); });
     ReadingState state = log ? kEventLogReading : kSensorReading;
     state.announced = 0;
-    for (const Live& one : live) {
+    for (const NodeReader& one : live) {
         const tqrhost::ReadCount count = log ? one.reader->LogCount() : one.reader->SensorCount();
         state.read += count.read;
         if (!count.announced) state.announced.reset();
@@ -38,7 +38,7 @@ ReadingState StateOf(const std::vector<Live>& live) {
 std::vector<NodeReading> ReadLiveNodes(Source& source, ReadingNeeds needs,
                                        const ReadingProgress& progress,
                                        std::vector<std::optional<KnownController>> known) {
-    std::vector<Live> live;
+    std::vector<NodeReader> live;
     std::vector<RequestPipeline*> pipelines;
     std::vector<NodeReading> readings(source.nodes.size());
     known.resize(source.nodes.size());
@@ -53,13 +53,13 @@ std::vector<NodeReading> ReadLiveNodes(Source& source, ReadingNeeds needs,
                         std::make_shared<tqrhost::ControllerReader>(node.pipeline.get(), needs,
                                                                     std::move(known[i]))});
     }
-    for (const Live& one : live) one.reader->Start();
+    for (const NodeReader& one : live) one.reader->Start();
     tqrhost::RunPipelines(pipelines, [&] {
         if (progress && !live.empty()) progress(StateOf(live));
         return std::all_of(live.begin(), live.end(),
-                           [](const Live& one) { return one.reader->Done(); });
+                           [](const NodeReader& one) { return one.reader->Done(); });
     });
-    for (const Live& one : live) {
+    for (const NodeReader& one : live) {
         readings[one.number] = one.reader->Result();
         auto transport = std::make_unique<tqrhost::MemoryTransport>(std::move(one.node->pipeline),
                                                                     one.reader->Take());

@@ -27,7 +27,7 @@ const T& Once(std::optional<T>* slot, Read read) {
 
 /// The answer to a command, as a parse function of ipmi/ reads it.
 template <typename Parse>
-auto Ask(Controller& controller, const ipmi::Command& command, Parse parse)
+auto Query(Controller& controller, const ipmi::Command& command, Parse parse)
     -> decltype(parse(std::span<const std::uint8_t>())) {
     const auto data = controller.Completed(command);
     if (!data) return std::nullopt;
@@ -65,25 +65,25 @@ void Walk(Read read) {
 
 const std::optional<ipmi::DeviceId>& Node::DeviceId() {
     return Once(&deviceId_,
-                [&] { return Ask(controller_, ipmi::GetDeviceId(), ipmi::ParseDeviceId); });
+                [&] { return Query(controller_, ipmi::GetDeviceId(), ipmi::ParseDeviceId); });
 }
 
 const std::optional<ipmi::Guid>& Node::Guid() {
     return Once(&guid_, [&] {
-        auto guid = Ask(controller_, ipmi::GetSystemGuid(), ipmi::ParseGuid);
-        if (!guid) guid = Ask(controller_, ipmi::GetDeviceGuid(), ipmi::ParseGuid);
+        auto guid = Query(controller_, ipmi::GetSystemGuid(), ipmi::ParseGuid);
+        if (!guid) guid = Query(controller_, ipmi::GetDeviceGuid(), ipmi::ParseGuid);
         return guid;
     });
 }
 
 const std::optional<std::string>& Node::SelfTest() {
     return Once(&selfTest_,
-                [&] { return Ask(controller_, ipmi::GetSelfTestResults(), ipmi::SelfTestText); });
+                [&] { return Query(controller_, ipmi::GetSelfTestResults(), ipmi::SelfTestText); });
 }
 
 const std::optional<ipmi::ChassisStatus>& Node::Chassis() {
     return Once(&chassis_, [&] {
-        return Ask(controller_, ipmi::GetChassisStatus(), ipmi::ChassisStatus::Parse);
+        return Query(controller_, ipmi::GetChassisStatus(), ipmi::ChassisStatus::Parse);
     });
 }
 
@@ -93,13 +93,13 @@ const Clock& Node::GetClock() {
 
 const std::optional<ipmi::SelInfo>& Node::LogInfo() {
     return Once(&logInfo_,
-                [&] { return Ask(controller_, ipmi::GetSelInfo(), ipmi::ParseSelInfo); });
+                [&] { return Query(controller_, ipmi::GetSelInfo(), ipmi::ParseSelInfo); });
 }
 
 const std::optional<ipmi::SelAllocation>& Node::LogAllocation() {
     return Once(&allocation_, [&]() -> std::optional<ipmi::SelAllocation> {
         if (!LogInfo() || !LogInfo()->allocationSupported) return std::nullopt;
-        return Ask(controller_, ipmi::GetSelAllocationInfo(), ipmi::ParseSelAllocation);
+        return Query(controller_, ipmi::GetSelAllocationInfo(), ipmi::ParseSelAllocation);
     });
 }
 
@@ -159,9 +159,9 @@ std::optional<double> Node::ValueOf(const ipmi::Sensor& sensor, std::uint8_t raw
     if (!IsReadable(sensor)) return std::nullopt;
     const auto [asked, isNew] = factors_.try_emplace({sensor.key, raw});
     if (isNew) {
-        asked->second =
-            Ask(controller_, ipmi::GetSensorReadingFactors(sensor.key.number, raw, sensor.key.lun),
-                ipmi::AskedFactors::Parse);
+        asked->second = Query(controller_,
+                              ipmi::GetSensorReadingFactors(sensor.key.number, raw, sensor.key.lun),
+                              ipmi::SensorReadingFactors::Parse);
     }
     if (!asked->second) return std::nullopt;
     return conversion.ValueByFactors(raw, asked->second->factors);
@@ -176,8 +176,8 @@ const std::optional<Answer>& Node::ReadingOf(const ipmi::SensorKey& key) {
 const std::optional<ipmi::SensorThresholds>& Node::ThresholdsOf(const ipmi::SensorKey& key) {
     const auto [thresholds, isNew] = thresholds_.try_emplace(key);
     if (isNew) {
-        thresholds->second = Ask(controller_, ipmi::GetSensorThresholds(key.number, key.lun),
-                                 ipmi::SensorThresholds::Parse);
+        thresholds->second = Query(controller_, ipmi::GetSensorThresholds(key.number, key.lun),
+                                   ipmi::SensorThresholds::Parse);
     }
     return thresholds->second;
 }
@@ -211,9 +211,9 @@ Clock Node::ReadClock() {
     constexpr double kSecond = 1e6;  // microseconds
     Clock clock;
     clock.utcOffsetMinutes =
-        Ask(controller_, ipmi::GetSelTimeUtcOffset(), ipmi::ParseSelTimeUtcOffset);
+        Query(controller_, ipmi::GetSelTimeUtcOffset(), ipmi::ParseSelTimeUtcOffset);
     const std::int64_t before = NQORTQR20::TOSSpecific::GetLocalTime().TotalMicroseconds();
-    const auto seconds = Ask(controller_, ipmi::GetSelTime(), ipmi::ParseSelTime);
+    const auto seconds = Query(controller_, ipmi::GetSelTime(), ipmi::ParseSelTime);
     const std::int64_t after = NQORTQR20::TOSSpecific::GetLocalTime().TotalMicroseconds();
     if (!seconds || ipmi::KindOfTime(*seconds) != ipmi::TimeKind::kClock) return clock;
     clock.time = std::int64_t{*seconds} - std::int64_t{60} * clock.utcOffsetMinutes.value_or(0);
@@ -235,7 +235,7 @@ std::vector<ipmi::SelRecord> Node::ReadLog() {
         records.reserve(LogInfo()->records);
     }
     Walk([&](std::uint16_t id) -> std::optional<Link> {
-        const auto entry = Ask(controller_, ipmi::GetSelEntry(id), ipmi::ParseSelEntry);
+        const auto entry = Query(controller_, ipmi::GetSelEntry(id), ipmi::ParseSelEntry);
         if (!entry) return std::nullopt;
         records.push_back(entry->record);
         return Link{entry->record.id, entry->nextRecordId};
@@ -269,7 +269,7 @@ std::vector<ipmi::EventFilter> Node::ReadFilters() {
 std::vector<ipmi::SdrRecord> Node::ReadRepository() {
     std::vector<ipmi::SdrRecord> records;
     const auto info =
-        Ask(controller_, ipmi::GetSdrRepositoryInfo(), ipmi::SdrRepositoryInfo::Parse);
+        Query(controller_, ipmi::GetSdrRepositoryInfo(), ipmi::SdrRepositoryInfo::Parse);
     if (info && info->records == 0) return records;
     RepositoryReader reader(controller_);
     Walk([&](std::uint16_t id) -> std::optional<Link> {

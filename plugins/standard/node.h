@@ -102,7 +102,8 @@ private:
     // What the controller answered for a sensor, whichever of its records it was asked by.
     std::map<ipmi::SensorKey, std::optional<Answer>> readings_;
     std::map<ipmi::SensorKey, std::optional<ipmi::SensorThresholds>> thresholds_;
-    std::map<std::pair<ipmi::SensorKey, std::uint8_t>, std::optional<ipmi::AskedFactors>> factors_;
+    std::map<std::pair<ipmi::SensorKey, std::uint8_t>, std::optional<ipmi::SensorReadingFactors>>
+        factors_;
     std::map<std::pair<std::uint16_t, ipmi::SensorKey>, SensorState> states_;  // of each record
 };
 

@@ -45,7 +45,7 @@ public:
             return ILogger::kNotice;
         }
         if (!filesMissing_ || !filesMissing_()) return severity;
-        return std::exchange(missingTold_, true) ? ILogger::kNotice : severity;
+        return std::exchange(missingReported_, true) ? ILogger::kNotice : severity;
     }
 
 private:
@@ -59,7 +59,7 @@ private:
     unsigned command_ = 0;  ///< that was refused
     int lines_ = 0;         ///< of it
     const std::function<bool()>& filesMissing_;
-    bool missingTold_ = false;
+    bool missingReported_ = false;
 };
 
 [[noreturn]] void Fail(const std::string& name, int error) {

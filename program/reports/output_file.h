@@ -24,7 +24,7 @@ public:
     void Write(std::string_view text);
     /// What was written is with the reader, where the output is no regular file.
     void Flush();
-    /// Everything is on its way to the disk and stands in its place. Nothing may follow.
+    /// Flushes, syncs and renames into place. Nothing may follow.
     void Commit();
 
 private:

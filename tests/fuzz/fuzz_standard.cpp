@@ -110,7 +110,7 @@ void Decode(Input bytes) {
     if (const auto filter = ipmi::EventFilter::Parse(bytes)) filter->Matches({});
     ipmi::SensorReading::Parse(bytes);
     ipmi::SensorThresholds::Parse(bytes);
-    ipmi::AskedFactors::Parse(bytes);
+    ipmi::SensorReadingFactors::Parse(bytes);
 }
 
 }  // namespace

@@ -38,14 +38,14 @@ TEST(SensorThresholds, OnlyReadableOnesAreGiven) {
     EXPECT_FALSE(SensorThresholds::Parse(std::span(answer).first(6)).has_value());
 }
 
-TEST(AskedFactors, TheNextReadingStandsBeforeTheFactors) {
+TEST(SensorReadingFactors, TheNextReadingStandsBeforeTheFactors) {
     const Bytes answer{0x60, 7, 0, 9, 0, 0, 0x21};
-    const auto asked = AskedFactors::Parse(answer).value();
+    const auto asked = SensorReadingFactors::Parse(answer).value();
     EXPECT_EQ(asked.nextReading, 0x60);
     EXPECT_EQ(asked.factors.m, 7);
     EXPECT_EQ(asked.factors.resultExponent, 2);
-    EXPECT_FALSE(AskedFactors::Parse(std::span(answer).first(6)).has_value());
-    EXPECT_FALSE(AskedFactors::Parse({}).has_value());
+    EXPECT_FALSE(SensorReadingFactors::Parse(std::span(answer).first(6)).has_value());
+    EXPECT_FALSE(SensorReadingFactors::Parse({}).has_value());
 }
 
 }  // namespace

@@ -19,8 +19,8 @@ using Clock = std::chrono::steady_clock;
 class CommandTiming {
 public:
     using Duration = std::chrono::microseconds;
-    static constexpr Duration kLeast{30'000};
-    static constexpr Duration kMost{10'000'000};
+    static constexpr Duration kMinTime{30'000};
+    static constexpr Duration kMaxTime{10'000'000};
 
     /// `opening` is the round trip of the session's opening, if it is known.
     explicit CommandTiming(std::optional<Duration> opening) : opening_(opening) {}
@@ -45,24 +45,24 @@ public:
     /// A try was not answered in its time; of those that were out together one counts. `sent` and
     /// `lastSent` number all sends, as for SendWindow.
     void BackOff(std::uint64_t sent, std::uint64_t lastSent) {
-        if (sent <= backedOffAt_ || RetryTime() >= kMost) return;
+        if (sent <= backedOffAt_ || RetryTime() >= kMaxTime) return;
         ++backOff_;
         backedOffAt_ = lastSent;
     }
     /// Until a request that is sent now is sent again. A controller takes longer for a command than
     /// for the opening of a session, so that the opening alone says no less than a quarter of a
     /// second.
-    Duration RetryTime() const { return std::min(Expected() * (1 << backOff_), kMost); }
+    Duration RetryTime() const { return std::min(Expected() * (1 << backOff_), kMaxTime); }
     /// The same without the back-off: an answer comes within this time, as far as is known.
     Duration Expected() const {
         constexpr Duration kUnknown{1'000'000};
         constexpr Duration kUnmeasured{250'000};
         Duration time = opening_ ? std::clamp(3 * *opening_, kUnmeasured, kUnknown) : kUnknown;
-        if (smoothed_) time = std::max(*smoothed_ + 4 * variation_, kLeast);
+        if (smoothed_) time = std::max(*smoothed_ + 4 * variation_, kMinTime);
         return time;
     }
     /// Later tries that were answered this much after it was sent say that a try was lost.
-    Duration Disorder() const { return smoothed_ ? *smoothed_ / 4 : kMost; }
+    Duration Disorder() const { return smoothed_ ? *smoothed_ / 4 : kMaxTime; }
 
 private:
     std::optional<Duration> opening_;
