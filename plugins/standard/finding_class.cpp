@@ -23,7 +23,7 @@ constexpr fdrPropertyInfo kProperties[] = {
     {"LastTime", kTime, "time of its last event"},
     {"Count", kInteger, "number of its events; 0 where only the sensor tells"},
     {"Events", kTextList, "keys of its events"},
-    {"FirstCause", kText, "key of the event that began the burst of its first event"},
+    {"FirstCause", kText, "key of the first fault in the burst of its first event"},
     {"Evidence", kTextList, "what it is concluded from"},
     {"StillPresent", kBoolean, "by the present reading of the sensor"},
 };

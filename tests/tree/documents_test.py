@@ -171,6 +171,14 @@ class Links(unittest.TestCase):
                 with self.subTest(document=document.name, link=target):
                     self.assertTrue((document.parent / target).exists())
 
+    def test_tests_that_documents_name_are_there(self):
+        named = {name for document in [*ROOT.glob("*.md"), *ROOT.glob("docs/*.md"), *ROOT.glob("bench/*.md")]
+                 for name in re.findall(r"`(?:tests/)?((?:\w+/)+\w+_test\.\w+)`", document.read_text())}
+        self.assertGreater(len(named), 10)
+        for name in named:
+            with self.subTest(test=name):
+                self.assertTrue((ROOT / "tests" / name).exists())
+
 
 if __name__ == "__main__":
     unittest.main()
