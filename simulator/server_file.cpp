@@ -123,8 +123,10 @@ void ReadSensor(const std::string& key, const JsonValue& value, BmcDescription* 
         {"factors",
          [&](const JsonValue& v) {
              v.Members([&](const std::string& reading, const JsonValue& factors) {
-                 sensor.factors[HexKey(reading, factors, "a reading")] =
-                     Exactly<7>(factors, "an answer with factors");
+                 const std::uint8_t raw = HexKey(reading, factors, "a reading");
+                 if (!sensor.factors.emplace(raw, Exactly<7>(factors, "an answer with factors"))
+                          .second)
+                     factors.Refuse("the same reading stands here twice");
              });
          }},
         {"owner",
@@ -248,7 +250,8 @@ void ReadBmc(const JsonValue& value, BmcDescription* bmc) {
         {"fru",
          [&](const JsonValue& v) {
              v.Members([&](const std::string& key, const JsonValue& inventory) {
-                 bmc->fru[FruDevice(key, inventory)] = inventory.Hex();
+                 if (!bmc->fru.emplace(FruDevice(key, inventory), inventory.Hex()).second)
+                     inventory.Refuse("the same FRU device stands here twice");
              });
          }},
         {"aux_log", readAuxLog},

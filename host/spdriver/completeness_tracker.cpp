@@ -126,6 +126,9 @@ void CompletenessTracker::NoteInfo(Source* source, bool askedAgain,
     ipmisel::ByteReader in(*response);
     in.Skip(1 + ipmi::kRecordCountAt);
     source->account->announced = in.U16();
+    if (source->noFirst && *source->account->announced == 0) {
+        std::erase(account_.faults, *source->noFirst);
+    }
     FinishWalk(source);
 }
 
@@ -191,7 +194,12 @@ void CompletenessTracker::NoteRecord(Source* source, const RequestFrame& request
     const std::string problem =
         ProblemOf(response, WholeAnswer(*source, record, offset, read.count));
     if (!problem.empty()) {
-        AddFault({source->readCommand, ipmisel::Format("%04x", record), problem, true});
+        const ReadFault fault{source->readCommand, ipmisel::Format("%04x", record), problem, true};
+        // The inventory's walk comes before anybody has asked how many records there are.
+        if (AddFault(fault) && read.IsOfFirst() && response &&
+            response->front() == ipmi::kNotPresent) {
+            source->noFirst = fault;
+        }
         if (wantedWhole && source->recordLength > 0)
             source->cutAt = ipmi::RecordIn(*response).size();
         return;

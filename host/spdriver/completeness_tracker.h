@@ -49,6 +49,8 @@ private:
         std::size_t recordLength = 0;
         /// How many bytes of it came, when it was wanted whole and was cut; else 0.
         std::size_t cutAt = 0;
+        /// What was noted of a first record that is not there: no fault once 0 are announced.
+        std::optional<ReadFault> noFirst{};
     };
 
     void NoteInfo(Source* source, bool askedAgain, const std::optional<Response>& response);

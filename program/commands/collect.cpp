@@ -60,7 +60,8 @@ bool HasBmc() {
 /// A controller that answered is one, whatever the machine's tables say of it.
 bool HasAnswered(const std::vector<NQORTQR20::NodeCompleteness>& nodes) {
     return std::ranges::any_of(nodes, [](const NQORTQR20::NodeCompleteness& node) {
-        return node.controller.read + node.log.read + node.sensors.read > 0;
+        return node.controller.read + node.log.read + node.sensors.read > 0 || node.log.announced ||
+               node.sensors.announced;
     });
 }
 

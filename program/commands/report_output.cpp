@@ -74,7 +74,7 @@ void AddReportOptions(CLI::App* command, ReportOptions* options) {
     command->add_option("--severity", options->severity, "Only events of this severity or worse")
         ->type_name("SEVERITY")
         ->check(OneOf(Names(Severities())));
-    command->add_option("--last", options->last, "Only the last N events")
+    command->add_option("--last", options->last, "Only the last N events of each node")
         ->type_name("N")
         ->check(Number(1, 65535));
 }

@@ -81,7 +81,7 @@ void RefuseUnknownCommand(const std::vector<Command>& commands, const CLI::App& 
     }
     throw Failure(kExitUsage, "there is no command \"" + word + "\"; " +
                                   (near.empty() ? "" : "did you mean " + near + "? ") +
-                                  "There are " + known);
+                                  "use one of " + known);
 }
 
 std::string AboutUnexpected(const CLI::App& command, const std::vector<std::string>& words) {

@@ -2,6 +2,7 @@
 
 #include <charconv>
 #include <deque>
+#include <map>
 #include <string>
 #include <utility>
 
@@ -20,17 +21,29 @@ public:
             report_->Add(instance);
             return;
         }
-        if (!IsWished(EventOf(instance))) return;
+        const Event event = EventOf(instance);
+        if (!IsWished(event)) {
+            ++hidden_;
+            return;
+        }
         if (!wish_.last) {
             report_->Add(instance);
             return;
         }
-        newest_.push_back(instance);
-        if (newest_.size() > *wish_.last) newest_.pop_front();
+        auto& newest = newest_[event.node];
+        newest.push_back(instance);
+        if (newest.size() > *wish_.last) {
+            newest.pop_front();
+            ++hidden_;
+        }
     }
     void Finish(const ReportEnd& end) override {
-        for (const NQORTQR20::Instance& instance : newest_) report_->Add(instance);
-        report_->Finish(end);
+        for (const auto& [node, newest] : newest_) {
+            for (const NQORTQR20::Instance& instance : newest) report_->Add(instance);
+        }
+        ReportEnd told = end;
+        told.hiddenEvents = hidden_;
+        report_->Finish(told);
     }
 
 private:
@@ -43,7 +56,8 @@ private:
     std::unique_ptr<ReportWriter> report_;
     EventWish wish_;
     MaybeTime last_;
-    std::deque<NQORTQR20::Instance> newest_;
+    std::map<Integer, std::deque<NQORTQR20::Instance>> newest_;  ///< by node
+    std::size_t hidden_ = 0;
 };
 
 }  // namespace

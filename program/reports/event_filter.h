@@ -15,7 +15,7 @@ namespace ipmisel {
 struct EventWish {
     std::optional<NQORTQR20::Time> since{};
     std::optional<Severity> severity{};  ///< this one or worse
-    std::optional<std::size_t> last{};   ///< so many, the newest
+    std::optional<std::size_t> last{};   ///< so many of each node, the newest
     bool Everything() const { return !since && !severity && !last; }
 };
 

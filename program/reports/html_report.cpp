@@ -2,6 +2,7 @@
 #include <cmath>
 #include <map>
 #include <memory>
+#include <numeric>
 #include <unordered_map>
 
 #include "base/text.h"
@@ -166,6 +167,7 @@ public:
 
     void Finish(const ReportEnd& end) override {
         outcome_ = OutcomeOf(end);
+        hidden_ = end.hiddenEvents;
         WriteTop();
         WriteProblems();
         WriteParts();
@@ -276,11 +278,7 @@ private:
                 "\"");
     }
 
-    std::string Verdict() const {
-        const std::string verdict = VerdictText(machine_.findings);
-        const bool partly = machine_.findings.empty() && outcome_.exitStatus != 0;
-        return verdict + (partly ? " in what could be read" : "");
-    }
+    std::string Verdict() const { return VerdictText(machine_.findings, outcome_.exitStatus != 0); }
 
     void WriteTop() {
         const SystemInfo& first = systems_.All().front();
@@ -511,6 +509,12 @@ private:
         out_.Write(
             "<section id=\"events\" aria-labelledby=\"events-title\">\n"
             "<h2 id=\"events-title\">Events</h2>\n");
+        if (hidden_ > 0) {
+            const std::size_t shown =
+                std::accumulate(logs_.begin(), logs_.end(), std::size_t{0},
+                                [](std::size_t sum, const Log& log) { return sum + log.count; });
+            out_.Write("<p>" + HtmlText(ShownText(shown, hidden_)) + "</p>\n");
+        }
         const bool any =
             std::any_of(logs_.begin(), logs_.end(), [](const Log& l) { return l.count > 0; });
         if (any) {
@@ -684,6 +688,7 @@ private:
     std::vector<Log> logs_;
     std::unordered_map<std::string, Integer> records_;  ///< IDs by the keys of their events
     Outcome outcome_{};
+    std::size_t hidden_ = 0;  ///< events that are not wanted
     bool zoneUnknown_ = false;
 };
 

@@ -63,6 +63,7 @@ struct ReportEnd {
     std::vector<NQORTQR20::PluginStatus> plugins{};
     std::vector<SystemInfo> systems{};  ///< by node, with what the controllers said of themselves
     std::optional<double> seconds{};    ///< that the collection took
+    std::size_t hiddenEvents = 0;       ///< that the reader did not want to see
     std::optional<Outcome> recorded{};  ///< of a report that is read again
 };
 

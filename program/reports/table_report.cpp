@@ -59,7 +59,7 @@ public:
     void Finish(const ReportEnd& end) override {
         PrintHead();
         if (Shows(kFindingClass)) PrintFindings(end);
-        for (std::size_t i = 0; i < systems_.All().size(); ++i) PrintSystem(i);
+        for (std::size_t i = 0; i < systems_.All().size(); ++i) PrintSystem(i, end);
         if (!otherClass_.empty()) other_.CopyTo(out_);
         PrintEnd(end);
     }
@@ -112,6 +112,7 @@ private:
         for (std::string& cell : row.cells) cell = TerminalText(cell);
         table->Add(row);
         zoneUnknown_ = zoneUnknown_ || event.timeZoneKnown == false;
+        zoneKnown_ = zoneKnown_ || event.timeZoneKnown == true;
     }
     std::vector<TextTable::Column> EventColumns() const {
         if (look_.width < kWide) {
@@ -190,8 +191,7 @@ private:
 
     void PrintFindings(const ReportEnd& end) {
         const std::vector<Finding>& findings = machine_.findings;
-        std::string verdict = VerdictText(findings);
-        if (findings.empty() && OutcomeOf(end).exitStatus != 0) verdict += " in what could be read";
+        const std::string verdict = VerdictText(findings, OutcomeOf(end).exitStatus != 0);
         const std::optional<Severity> worst =
             findings.empty() ? std::nullopt : findings.front().severity;
         PrintLine("\n" + Painted(verdict + ".", worst, look_));
@@ -216,7 +216,7 @@ private:
         if (!text.empty()) PrintWrapped(text, indent);
     }
 
-    void PrintSystem(std::size_t index) {
+    void PrintSystem(std::size_t index, const ReportEnd& end) {
         if (systems_.All().size() > 1) {
             PrintHeading("Node " + std::to_string(index + 1) +
                          (systems_.All()[index].name.empty() ? "" : ": ") +
@@ -225,7 +225,7 @@ private:
         PrintParts(index);
         PrintController(index);
         PrintSensors(index);
-        PrintEvents(index);
+        PrintEvents(index, end);
     }
 
     void PrintParts(std::size_t index) {
@@ -307,9 +307,10 @@ private:
         return low.empty() && high.empty() ? "" : low + " .. " + high;
     }
 
-    void PrintEvents(std::size_t index) {
+    void PrintEvents(std::size_t index, const ReportEnd& end) {
         if (!events_[index]) {
-            if (Shows(kEventClass)) PrintLine("\nNo events.");
+            if (Shows(kEventClass))
+                PrintLine(end.hiddenEvents > 0 ? "\nNo such events." : "\nNo events.");
             return;
         }
         PrintLine("");
@@ -332,6 +333,13 @@ private:
         PrintLine("");
         if (zoneUnknown_) {
             PrintWrapped("Times are those of the controller's clock; its time zone is not known.");
+        } else if (zoneKnown_) {
+            PrintWrapped("Times are UTC.");
+        }
+        if (end.hiddenEvents > 0) {
+            std::size_t& count = counts_[std::string(kEventClass)];
+            PrintWrapped(ShownText(count, end.hiddenEvents));
+            count += end.hiddenEvents;
         }
         std::string last;
         for (const auto& [name, count] : counts_) {
@@ -355,8 +363,9 @@ private:
     std::vector<std::unique_ptr<TextTable>> events_;  ///< by system
     Spool other_;
     std::string otherClass_;
-    std::map<std::string, unsigned, std::less<>> counts_;
+    std::map<std::string, std::size_t, std::less<>> counts_;
     bool zoneUnknown_ = false;
+    bool zoneKnown_ = false;
 };
 
 }  // namespace

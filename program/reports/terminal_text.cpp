@@ -94,7 +94,13 @@ std::vector<std::string> Wrap(std::string_view text, std::size_t width) {
     while (Columns(text) > width) {
         const std::size_t limit = ByteAt(text, width);
         std::size_t at = text.rfind(' ', limit);
-        if (at == std::string_view::npos || at == 0) at = limit;
+        if (at == std::string_view::npos || at == 0) {
+            const std::size_t mark = text.find_last_of("/-", limit - 1);
+            const std::size_t next = mark == std::string_view::npos ? 0 : mark + 1;
+            const std::string_view rest = text.substr(next);
+            const bool fits = Columns(rest.substr(0, rest.find_first_of(" /-"))) <= width;
+            at = next > 1 && fits ? next : limit;
+        }
         lines.emplace_back(text.substr(0, at));
         text.remove_prefix(at < text.size() && text[at] == ' ' ? at + 1 : at);
     }

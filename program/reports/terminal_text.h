@@ -25,7 +25,8 @@ std::string TerminalText(std::string_view text);
 
 /// Columns that a text of TerminalText takes: one a code point.
 std::size_t Columns(std::string_view text);
-/// The text in lines of at most `width` columns, broken at blanks where there are some.
+/// The text in lines of at most `width` columns, broken at blanks where there are some, else after
+/// a slash or hyphen where that keeps the next word whole.
 std::vector<std::string> Wrap(std::string_view text, std::size_t width);
 /// The text cut or filled with blanks to `width` columns.
 std::string Fit(std::string_view text, std::size_t width);

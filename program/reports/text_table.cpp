@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <numeric>
+#include <string_view>
 
 #include "base/text.h"
 #include "program/reports/terminal_text.h"
@@ -24,6 +25,18 @@ std::string Rendered(const std::string& text, const char* code) {
     return Format("\x1b[%sm", code) + text + "\x1b[0m";
 }
 
+/// Of what Wrap does not break where there is room for it.
+std::size_t LongestWord(std::string_view text) {
+    std::size_t longest = 0;
+    while (!text.empty()) {
+        const std::size_t end = text.find_first_of(" /-");
+        const bool marked = end != std::string_view::npos && text[end] != ' ';
+        longest = std::max(longest, Columns(text.substr(0, marked ? end + 1 : end)));
+        text.remove_prefix(end == std::string_view::npos ? text.size() : end + 1);
+    }
+    return longest;
+}
+
 std::string TrimmedLine(std::string text) {
     text.erase(text.find_last_not_of(' ') + 1);
     return text + '\n';
@@ -44,7 +57,8 @@ std::string Bold(const std::string& text, const ReportLook& look) {
 TextTable::TextTable(std::vector<Column> columns, std::size_t painted)
     : columns_(std::move(columns)),
       painted_(painted),
-      lengths_(columns_.size(), std::vector<std::size_t>(kMaxCell + 1)) {}
+      lengths_(columns_.size(), std::vector<std::size_t>(kMaxCell + 1)),
+      words_(lengths_) {}
 
 void TextTable::Add(const Row& row) {
     std::string text(
@@ -54,6 +68,7 @@ void TextTable::Add(const Row& row) {
         std::string cell = i < row.cells.size() ? row.cells[i] : "";
         if (Columns(cell) > kMaxCell) cell = Fit(cell, kMaxCell - 3) + "...";
         ++lengths_[i][Columns(cell)];
+        ++words_[i][LongestWord(cell)];
         text += kBetweenCells + cell;
     }
     spool_.Append(text);
@@ -75,6 +90,12 @@ std::size_t TextTable::ExtraLines(std::size_t column, std::size_t width) const {
     return lines;
 }
 
+std::size_t TextTable::Cost(std::size_t column, std::size_t width) const {
+    const auto& words = words_[column];
+    const auto broken = words.begin() + static_cast<std::ptrdiff_t>(std::min(width, kMaxCell)) + 1;
+    return std::accumulate(broken, words.end(), ExtraLines(column, width));
+}
+
 std::vector<std::size_t> TextTable::Widths(std::size_t width) const {
     std::vector<std::size_t> widths(columns_.size());
     std::size_t columns = 0;
@@ -89,7 +110,7 @@ std::vector<std::size_t> TextTable::Widths(std::size_t width) const {
         std::size_t leastCost = 0;
         for (std::size_t i = 0; i < widths.size(); ++i) {
             if (!columns_[i].yields || widths[i] <= kMinWidth) continue;
-            const std::size_t cost = ExtraLines(i, widths[i] - 1) - ExtraLines(i, widths[i]);
+            const std::size_t cost = Cost(i, widths[i] - 1) - Cost(i, widths[i]);
             if (least && (cost > leastCost || (cost == leastCost && widths[i] <= widths[*least]))) {
                 continue;
             }
@@ -99,7 +120,35 @@ std::vector<std::size_t> TextTable::Widths(std::size_t width) const {
         if (!least) break;
         --widths[*least];
     }
+    Balance(&widths);
     return widths;
+}
+
+void TextTable::Balance(std::vector<std::size_t>* widths) const {
+    constexpr std::size_t kMaxMoved = 8;
+    const auto move = [&](std::size_t from, std::size_t to) {
+        std::size_t& wide = widths->at(from);
+        std::size_t& narrow = widths->at(to);
+        const std::size_t before = Cost(from, wide) + Cost(to, narrow);
+        for (std::size_t moved = 1; moved <= kMaxMoved && wide >= kMinWidth + moved; ++moved) {
+            if (Cost(from, wide - moved) + Cost(to, narrow + moved) >= before) continue;
+            wide -= moved;
+            narrow += moved;
+            return true;
+        }
+        return false;
+    };
+    // Each move costs less than the one before it: this ends.
+    for (bool moved = true; moved;) {
+        moved = false;
+        for (std::size_t from = 0; from < widths->size(); ++from) {
+            for (std::size_t to = 0; to < widths->size(); ++to) {
+                const bool may = from != to && columns_[from].yields && columns_[to].yields &&
+                                 widths->at(from) > 0 && widths->at(to) > 0;
+                moved = (may && move(from, to)) || moved;
+            }
+        }
+    }
 }
 
 void TextTable::PrintRow(OutputFile& out, const ReportLook& look,

@@ -43,10 +43,15 @@ private:
 
     std::size_t Longest(std::size_t column) const;
     std::size_t ExtraLines(std::size_t column, std::size_t width) const;
+    /// What a width costs: lines, and a word that is broken is as bad as one.
+    std::size_t Cost(std::size_t column, std::size_t width) const;
+    /// Moves columns from one to another where that costs less.
+    void Balance(std::vector<std::size_t>* widths) const;
 
     std::vector<Column> columns_;
     std::size_t painted_;
     std::vector<std::vector<std::size_t>> lengths_;  ///< by column: how many cells are so long
+    std::vector<std::vector<std::size_t>> words_;    ///< how many have a longest word so long
     Spool spool_;
     std::size_t rows_ = 0;
 };

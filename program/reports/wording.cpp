@@ -85,24 +85,44 @@ std::string CourseText(const Finding& finding) {
     return Listed({when, finding.stillPresent == true ? "still present now" : ""});
 }
 
-std::string VerdictText(const std::vector<Finding>& findings) {
-    if (findings.empty()) return "No problem found";
+std::string VerdictText(const std::vector<Finding>& findings, bool inPart) {
+    if (findings.empty()) {
+        return std::string("No problem found") + (inPart ? " in what could be read" : "");
+    }
     std::optional<Severity> worst;
     for (const Finding& finding : findings) worst = std::max(worst, finding.severity);
     return Counted(static_cast<std::int64_t>(findings.size()), "problem") +
            (worst
                 ? (findings.size() == 1 ? ", " : ", the worst ") + std::string(InfoOf(*worst).name)
-                : "");
+                : "") +
+           (inPart ? "; not everything could be read" : "");
+}
+
+std::string ShownText(std::size_t shown, std::size_t hidden) {
+    return Format("Shown: %zu of %zu events, as --since, --severity and --last ask.", shown,
+                  shown + hidden);
 }
 
 std::string ClockText(const Controller& controller) {
-    std::string text = controller.time ? DateAndTime(*controller.time) + " UTC" : "";
+    // What local time can be away from UTC: from a quarter of an hour to fourteen hours, and what a
+    // clock is often wrong by beside it.
+    constexpr double kMinZone = 14 * 60;
+    constexpr double kMaxZone = (14 * 60 + 1) * 60;
+    const double offset = controller.clockOffset.value_or(0);
+    const bool otherZone =
+        !controller.utcOffset && std::fabs(offset) >= kMinZone && std::fabs(offset) <= kMaxZone;
+    std::string text =
+        controller.time ? DateAndTime(*controller.time) + (otherZone ? "" : " UTC") : "";
     if (controller.clockOffset) {
-        const double offset = *controller.clockOffset;
         const bool within = std::fabs(offset) <= controller.clockUncertainty.value_or(0);
         text += text.empty() ? "" : ", ";
-        text +=
-            within ? "right" : DurationText(std::fabs(offset)) + (offset > 0 ? " fast" : " slow");
+        if (otherZone) {
+            text += DurationText(std::fabs(offset)) + (offset > 0 ? " ahead of" : " behind") +
+                    " UTC, its time zone not known";
+        } else {
+            text += within ? "right"
+                           : DurationText(std::fabs(offset)) + (offset > 0 ? " fast" : " slow");
+        }
     }
     if (controller.utcOffset) {
         const auto minutes = static_cast<int>(*controller.utcOffset);

@@ -28,8 +28,10 @@ std::string PartText(const std::string& part, const Texts& candidates);
 std::string OrderText(const std::string& partNumber, const std::string& serialNumber);
 /// From when to when, still present.
 std::string CourseText(const Finding& finding);
-/// "no problem", "2 problems, the worst critical".
-std::string VerdictText(const std::vector<Finding>& findings);
+/// "No problem found", "2 problems, the worst critical"; says so when not everything was read.
+std::string VerdictText(const std::vector<Finding>& findings, bool inPart);
+/// How many events are shown, of all that there are.
+std::string ShownText(std::size_t shown, std::size_t hidden);
 /// A controller's clock beside the collector's.
 std::string ClockText(const Controller& controller);
 /// How full the log is and since when it runs.

@@ -75,8 +75,8 @@ TEST_F(BadInput, WrongUsage) {
                   "Is a directory");
     ExpectRefused({}, 2, "no command is named");
     ExpectRefused({"colect"}, 2,
-                  "no command \"colect\"; did you mean collect? There are collect, ");
-    ExpectRefused({"frobnicate"}, 2, "no command \"frobnicate\"; There are collect, ");
+                  "no command \"colect\"; did you mean collect? use one of collect, ");
+    ExpectRefused({"frobnicate"}, 2, "no command \"frobnicate\"; use one of collect, ");
     ExpectRefused({"--verison"}, 2, "no option \"--verison\"; did you mean --version? see ");
     ExpectRefused({"--from", "sim:x"}, 2,
                   "--from belongs behind a command, such as ipmisel collect");

@@ -306,10 +306,13 @@ TEST_F(Collecting, AMachineWithoutABmcGivesAnEmptyReport) {
 TEST_F(Collecting, AControllerThatAnswersIsOneWhateverTheTablesOfTheMachineSay) {
     Json server = Server();
     server.erase("smbios");
-    const Ended ended = Collect(Write(server), {"--format", "json", "--class", "IPMI_EventLog"});
-    EXPECT_EQ(ended.exitStatus, 0);
-    EXPECT_EQ(Json::parse(ended.out)["instances"].size(), 1U);
-    EXPECT_EQ(ended.err, "");
+    server["bmcs"][0].erase("sdr");
+    for (const auto& [name, instances] : {std::pair("IPMI_EventLog", 1U), {"IPMI_Sensor", 0U}}) {
+        const Ended ended = Collect(Write(server), {"--format", "json", "--class", name});
+        EXPECT_EQ(ended.exitStatus, 0);
+        EXPECT_EQ(Json::parse(ended.out)["instances"].size(), instances);
+        EXPECT_EQ(ended.err, "");
+    }
 }
 
 TEST_F(Collecting, AReaderThatLeavesEndsItQuietly) {

@@ -71,6 +71,23 @@ TEST_F(Completeness, ALogThatNobodyReadIsNotMissing) {
     EXPECT_EQ(Account().log.Missing(), 2u);
 }
 
+TEST_F(Completeness, AnEmptyRepositoryIsWholeWhoeverReadsItBeforeItIsCounted) {
+    Send(ipmi::kGetSdr, {0, 0, 0, 0, 0, 5});
+    EXPECT_EQ(Faults(), Texts{"Get SDR 0000: completion code cb"});
+    Send(ipmi::kGetSdrRepositoryInfo);
+    EXPECT_EQ(Faults(), Texts{});
+    EXPECT_TRUE(Account().Whole());
+}
+
+TEST_F(Completeness, ARepositoryWhoseFirstRecordIsNotThereIsNotWhole) {
+    bmc.sdrRecords = {{1, 0, 0x51, 1, 0}};
+    FailWith(ipmi::kGetSdr, 1, 0xCB);
+    Send(ipmi::kGetSdr, {0, 0, 0, 0, 0, 5});
+    Send(ipmi::kGetSdrRepositoryInfo);
+    EXPECT_EQ(Faults(), Texts{"Get SDR 0000: completion code cb"});
+    EXPECT_FALSE(Account().Whole());
+}
+
 TEST_F(Completeness, ASensorRecordInPartsIsAsGoodAsAWholeOne) {
     bmc.sdrRecords = {{1, 0, 0x51, 1, 5, 6, 7, 8, 9, 10}};
     bmc.faults.push_back({0x0A, 0x23, 2, ipmisim::Fault::Kind::kTruncate, 0, 2 + 6, {}});

@@ -57,6 +57,9 @@ TEST(Text, LinesBreakAtBlanksWhereTheyCan) {
         {"one two three", 7, {"one two", "three"}},
         {"one two three", 8, {"one two", "three"}},
         {"longest word", 4, {"long", "est", "word"}},
+        {"OS Boot/Installation", 12, {"OS", "Boot/", "Installation"}},
+        {"OS Boot/Installation", 11, {"OS", "Boot/Instal", "lation"}},
+        {"/longest", 4, {"/lon", "gest"}},
         {"\u00B0\u00B0\u00B0\u00B0 \u00B0", 3, {"\u00B0\u00B0\u00B0", "\u00B0 \u00B0"}},
     };
     for (const auto& c : cases) {

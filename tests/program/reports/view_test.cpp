@@ -124,7 +124,9 @@ public:
         const auto record = ipmisel::EventOf(instance).recordId;
         *seen_ += record ? std::to_string(*record) : "x";
     }
-    void Finish(const ipmisel::ReportEnd&) override { *seen_ += "."; }
+    void Finish(const ipmisel::ReportEnd& end) override {
+        *seen_ += "-" + std::to_string(end.hiddenEvents);
+    }
 
 private:
     std::string* seen_;
@@ -136,11 +138,11 @@ TEST(View, FewerEventsAreShownWhenFewerAreWanted) {
         ipmisel::EventWish wish;
         const char* seen;
     } cases[] = {
-        {{}, "12345x."},
-        {{.since = Time{20}}, "234x."},  // a record without a time is as old as the one before it
-        {{.severity = Severity::kWarning}, "24x."},
-        {{.last = 2}, "x45."},
-        {{.since = Time{20}, .severity = Severity::kWarning, .last = 1}, "x4."},
+        {{}, "12345x-0"},
+        {{.since = Time{20}}, "234x-2"},  // a record without a time is as old as the one before it
+        {{.severity = Severity::kWarning}, "24x-3"},
+        {{.last = 2}, "x345-2"},  // of each node
+        {{.since = Time{20}, .severity = Severity::kWarning, .last = 1}, "x4-4"},
     };
     const std::vector<std::pair<std::optional<Time>, const char*>> events = {
         {Time{10}, "ok"},
@@ -154,7 +156,9 @@ TEST(View, FewerEventsAreShownWhenFewerAreWanted) {
         std::int64_t record = 0;
         for (const auto& [time, severity] : events) {
             Instance event{"IPMI_Event",
-                           {{"RecordID", ++record}, {"Severity", std::string(severity)}}};
+                           {{"Node", std::int64_t{record < 4 ? 1 : 2}},
+                            {"RecordID", ++record},
+                            {"Severity", std::string(severity)}}};
             if (time) event.properties.emplace_back("Time", *time);
             report->Add(event);
         }
@@ -171,17 +175,22 @@ TEST(Wording, SaysHowAClockGoes) {
     const struct {
         double offset;
         const char* text;
-    } cases[] = {{0.4, "right"},
-                 {-0.5, "right"},
-                 {1.5, "1.5 seconds fast"},
-                 {-119, "119 seconds slow"},
-                 {-121, "2 minutes slow"},
-                 {7300, "2 hours fast"},
-                 {-200000, "2 days slow"}};
+    } cases[] = {{0.4, " UTC, right"},
+                 {-0.5, " UTC, right"},
+                 {1.5, " UTC, 1.5 seconds fast"},
+                 {-119, " UTC, 119 seconds slow"},
+                 {-121, " UTC, 2 minutes slow"},
+                 {7300, ", 2 hours ahead of UTC, its time zone not known"},  // wrong, or local time
+                 {-18000, ", 5 hours behind UTC, its time zone not known"},
+                 {-200000, " UTC, 2 days slow"}};
     for (const auto& c : cases) {
         controller.clockOffset = c.offset;
-        EXPECT_EQ(ClockText(controller), "2026-03-09 02:31:44 UTC, " + std::string(c.text));
+        EXPECT_EQ(ClockText(controller), std::string("2026-03-09 02:31:44") + c.text);
     }
+    controller.utcOffset = 0;
+    EXPECT_EQ(ClockText(controller), "2026-03-09 02:31:44 UTC, 2 days slow, time zone UTC+00:00");
+    controller.clockOffset = 7300;
+    EXPECT_EQ(ClockText(controller), "2026-03-09 02:31:44 UTC, 2 hours fast, time zone UTC+00:00");
     controller.time.reset();
     controller.clockOffset.reset();
     controller.utcOffset = -330;
