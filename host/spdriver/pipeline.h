@@ -35,6 +35,9 @@ public:
     /// submits no more than that, so that a guess never stands before a request that somebody waits
     /// for.
     virtual std::size_t Room() const = 0;
+    /// Answers that somebody waited for and that were dropped since their session sequence numbers
+    /// had come before; none where the transport has no such numbers.
+    virtual unsigned WronglyNumbered() const { return 0; }
 
     /// What to wait on with poll(2) for input; -1 when Advance is to be called without waiting.
     virtual int Descriptor() const = 0;

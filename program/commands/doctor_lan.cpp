@@ -133,6 +133,35 @@ Attempt TryWorkarounds(AccessOptions* access, Refusal refused, Steps* steps) {
     return TryOpening(*access);
 }
 
+/// Some BMCs number their first answers as they should and begin again after some; those are
+/// dropped as ones that were heard before, until the session is opened anew. Where it is so, opens
+/// one that takes them, and leaves the workaround in `access`.
+void TrySessionNumbers(AccessOptions* access, Attempt* session, Steps* steps) {
+    constexpr unsigned kAnswers = 256;  // they may be counted in a byte
+    constexpr unsigned kCertain = 2;    // of a good line, one may be an old packet
+    constexpr const char* kWorkaround = "sessionnumbers";
+    const RequestPipeline* const pipeline = session->controller->Pipeline();
+    const auto until = Clock::now() + kPatience;
+    unsigned answers = 0;
+    while (answers < kAnswers && Clock::now() < until && pipeline->WronglyNumbered() < kCertain) {
+        if (!session->controller->Exchange(ipmi::GetDeviceId()))
+            return;  // as the commands will tell
+        ++answers;
+    }
+    if (pipeline->WronglyNumbered() < kCertain) {
+        steps->Good("session numbers", Format("as they should be in %u answers", answers));
+        return;
+    }
+    steps->Bad(
+        "known deviation",
+        Format("the BMC numbers its answers wrongly, here after %u, and each time the session has "
+               "to be opened anew; give --workaround %s, or look for newer firmware of the BMC",
+               answers, kWorkaround));
+    access->source.workarounds.emplace_back(kWorkaround);
+    Attempt with = TryOpening(*access);
+    if (with.Works()) *session = std::move(with);
+}
+
 /// Each suite that can be used with each privilege, in sessions of their own.
 void TrySuites(const AccessOptions& access, const std::vector<int>& listed, Steps* steps) {
     constexpr std::array kSupported = {17, 3, 16, 15, 2, 1};
@@ -309,6 +338,7 @@ int ExamineLan(AccessOptions access, Steps* steps) {
         if (!session.controller) session = TryWorkarounds(&access, refusal, steps);
         if (!session.controller) return kExitNoSource;
     }
+    TrySessionNumbers(&access, &session, steps);
     if (!TryCommands(&*session.controller, steps)) return kExitNoSource;
     TryLog(&*session.controller, steps);
     TrySensorRecords(&*session.controller, steps);

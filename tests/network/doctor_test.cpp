@@ -89,6 +89,7 @@ TEST(Doctor, AKnownDeviationIsRecognisedByTheWorkaroundThatHelps) {
         {{.badChecksums = true}, "nochecksumcheck"},
         {{.numbers = Numbers::kStandStill}, "sessionnumbers"},
         {{.numbers = Numbers::kZero}, "sessionnumbers"},
+        {{.numbers = Numbers::kStartOver}, "sessionnumbers"},
         {{.longRakp2Code = true, .noPrivilege = true}, "sun20"},
     };
     for (const auto& c : cases) {
@@ -99,6 +100,16 @@ TEST(Doctor, AKnownDeviationIsRecognisedByTheWorkaroundThatHelps) {
             ExamineBmc({.deviations = c.deviations}, {"--workaround", c.workaround});
         EXPECT_EQ(with.exitStatus, 0) << c.workaround << "\n" << with.lines;
     }
+}
+
+TEST(Doctor, ALineThatDoublesPacketsIsNoDeviationOfTheBmc) {
+    const NetworkBmc peer(Bmc(), {.send = [](NetworkBmc&, const ipmisim::Packet& answer) {
+                              return std::vector<ipmisim::Packet>(2, answer);
+                          }});
+    const Finding found = Examine({peer.Place(), "--user", ipmisim::kUser});
+    EXPECT_EQ(found.exitStatus, 0) << found.lines;
+    EXPECT_THAT(found.lines,
+                ContainsRegex("ok +session numbers +as they should be in [0-9]+ answers"));
 }
 
 TEST(Doctor, WhatIsRefusedIsSaidAndWhatToDo) {

@@ -46,6 +46,7 @@ public:
     void Submit(ipmi::Command command, Handler handler) override;
     std::size_t Pending() const override { return requests_.Pending(); }
     std::size_t Room() const override { return dead_ ? 0 : requests_.Room(); }
+    unsigned WronglyNumbered() const override { return requests_.Repeated(); }
     /// The BMC has fallen silent: it answered nothing at all for as long as one request may go
     /// unanswered, and could not be reached anew within that time. What is pending and what is
     /// submitted from then on is answered with nothing at once.

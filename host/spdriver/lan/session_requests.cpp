@@ -90,7 +90,7 @@ SessionRequests::Request* SessionRequests::Find(std::uint64_t id) {
 void SessionRequests::Handle(const rmcpplus::Answer& answer, Clock::time_point now) {
     if (!options_.anySessionNumber && !received_.IsNew(answer.sequence)) {
         const Try& said = tries_[answer.rqSeq];
-        if (said.request) ++repeated_;
+        if (said.request && Find(*said.request) != nullptr) ++repeated_;
         return;
     }
     lastHeard_ = now;

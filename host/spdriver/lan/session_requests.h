@@ -85,7 +85,7 @@ public:
     };
     std::optional<Silence> SilentSince() const;
     Clock::time_point LastHeard() const { return lastHeard_; }
-    /// Answers of this session that were dropped for their session sequence number alone.
+    /// Answers that were waited for and dropped for their session sequence number alone.
     unsigned Repeated() const { return repeated_; }
     /// A request has failed since whose first try nothing at all was answered.
     bool HeardNothing() const { return heardNothing_; }
