@@ -4,8 +4,9 @@
 usage: make_pages.py PROGRAM FOLDER      pages in FOLDER/man1, man5 and man7; needs lowdown and help2man
 
 A document's first heading goes, its other headings go up by one level, a link to another page becomes its name,
-any other its text, and a table of more columns than a terminal holds becomes a list. Of each command that PROGRAM
-lists there is a page, made of what the command says with --help; so there is of ipmisel-simulator beside it.
+one to another document its place, any other its text, and a table of more columns than a terminal holds becomes a list. Of each command that PROGRAM
+lists there is a page, made of what the command says with --help; so there is of ipmisel-simulator beside it. A list of
+the commands and the references from page to page are made here.
 """
 import email.utils
 import pathlib
@@ -65,7 +66,7 @@ def reference(match):
     for name, page, section, _ in DOCUMENTS:
         if document == name and (DOCS / name).exists():
             return f"{page}({section})" if text == name else f"{text} ({page}({section}))"
-    return text
+    return f"share/doc/ipmisel/docs/{document}" if text == document else text
 
 
 def markdown_of_page(text, name, what):
@@ -93,6 +94,9 @@ def document_page(path, name, section, what, version):
     # whatis wants a heading on the line of its request, and no paragraph begins twice.
     page = re.sub(r"^\.(S[HS])\n", r".\1 ", page, flags=re.MULTILINE)
     page = re.sub(r"^(\.S[HS] (?!NAME).*)\n\.[LP]P\n", r"\1\n", page, flags=re.MULTILINE)
+    # lowdown moves back up for what a definition says, which goes wrong at the end of a page.
+    page = re.sub(r'^(?:\.[LP]P\n)?(.*)\n\.if n \\\n\.sp -1v\n\.if t \\\n\.sp -0\.25v\n\.IP "" 5n\n', r".TP 5n\n\1\n", page,
+                  flags=re.MULTILINE)
     return page.replace(
         ".SH NAME\n.LP\n", ".ad l\n.SH NAME\n").replace(f"{name} - {what}", f"{name} \\- {what}", 1)
 
@@ -101,6 +105,25 @@ def commands(program):
     """Name and description of each command that the program lists."""
     listed = run(program, "--help").split("Subcommands:\n")[1]
     return re.findall(r"^  (\w[\w-]*) +(\S.*)$", listed, re.MULTILINE)
+
+
+def with_commands(page, listed):
+    """The program's own page with a list of its commands before the first section of its document."""
+    rows = "".join(f".TP\n\\fBipmisel {command}\\fR\n{what[0].lower() + what[1:]}\n" for command, what in listed)
+    before, section, after = re.split(r"^(\.SH (?!NAME|DESCRIPTION).*\n)", page, 1, re.MULTILINE)
+    return f"{before}.SH COMMANDS\n{rows}{section}{after}"
+
+
+def with_references(pages):
+    """Each page names the others: those of the commands the program's, which names them all."""
+    def reference(page):
+        name, section = page.rsplit(".", 1)
+        return f"\\fB{name}\\fR({section})".replace("-", "\\-")
+    order = sorted(pages, key=lambda page: (page[-1], page))
+    for page, text in pages.items():
+        is_command = page.endswith(".1") and page != "ipmisel.1"
+        others = ["ipmisel.1"] if is_command else [other for other in order if other != page]
+        yield page, f"{text.rstrip()}\n.SH SEE ALSO\n{', '.join(map(reference, others))}\n"
 
 
 def command_page(program, command, what, version):
@@ -125,12 +148,14 @@ def main():
     for document, name, section, what in DOCUMENTS:
         if (DOCS / document).exists():
             pages[f"{name}.{section}"] = document_page(DOCS / document, name, section, what, version)
-    for command, what in commands(program):
+    listed = commands(program)
+    pages["ipmisel.1"] = with_commands(pages["ipmisel.1"], listed)
+    for command, what in listed:
         pages[f"ipmisel-{command}.1"] = command_page(program, command, what, version)
     simulator = pathlib.Path(program).with_name("ipmisel-simulator")
     if simulator.exists():  # a build without access over the network has none
         pages["ipmisel-simulator.1"] = simulator_page(simulator, version)
-    for name, page in pages.items():
+    for name, page in with_references(pages):
         place = folder / f"man{name[-1]}" / name
         place.parent.mkdir(parents=True, exist_ok=True)
         place.write_text(page)

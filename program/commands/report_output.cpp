@@ -66,7 +66,8 @@ void AddReportOptions(CLI::App* command, ReportOptions* options) {
         ->type_name("WHEN")
         ->capture_default_str()
         ->check(OneOf({"auto", "always", "never"}));
-    command->add_flag("!--no-pager", options->pager, "Show a long table without a pager");
+    command->add_flag_callback(
+        "--no-pager", [options] { options->pager = false; }, "Show a long table without a pager");
     command
         ->add_option("--since", options->since,
                      "Only events since a date, a date and time in UTC, or some time ago (12h, 7d)")
