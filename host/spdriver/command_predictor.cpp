@@ -48,7 +48,7 @@ void CommandPredictor::FindSensors() {
     }
 }
 
-void CommandPredictor::AskedOfSensor(const ipmi::Command& command) {
+void CommandPredictor::RequestedOfSensor(const ipmi::Command& command) {
     FindSensors();
     const auto found = positions_.find({command.lun, command.data[0]});
     if (found == positions_.end()) return;
@@ -67,13 +67,13 @@ void CommandPredictor::Announced(const ipmi::Command& command) {
     fruToCome_.push_back({command.data[0], command.lun});
 }
 
-void CommandPredictor::Asked(const ipmi::Command& command) {
+void CommandPredictor::Requested(const ipmi::Command& command) {
     now_ = command;
-    if (IsOfSensor(command)) AskedOfSensor(command);
-    if (IsFruChunk(command)) AskedOfFru(command);
+    if (IsOfSensor(command)) RequestedOfSensor(command);
+    if (IsFruChunk(command)) RequestedOfFru(command);
 }
 
-void CommandPredictor::AskedOfFru(const ipmi::Command& command) {
+void CommandPredictor::RequestedOfFru(const ipmi::Command& command) {
     const FruPlace place{command.data[0], command.lun};
     const std::uint8_t chunk = command.data[3];
     std::erase(fruToCome_, place);
@@ -101,12 +101,13 @@ void CommandPredictor::Answered(const ipmi::Command& command, const Response& re
     }
 }
 
-std::vector<ipmi::Command> CommandPredictor::Next(std::size_t count, const IsAsked& isAsked) const {
+std::vector<ipmi::Command> CommandPredictor::Next(std::size_t count,
+                                                  const IsRequested& isRequested) const {
     std::vector<ipmi::Command> commands;
     if (!now_ || count == 0) return commands;
     std::size_t seen = 0;
     const Add add = [&](ipmi::Command command) {
-        if (!isAsked(command)) commands.push_back(std::move(command));
+        if (!isRequested(command)) commands.push_back(std::move(command));
         return commands.size() < count && ++seen < kFarthest;
     };
     if (IsFruChunk(*now_)) AddFruChunks(add);

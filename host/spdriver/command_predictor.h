@@ -21,19 +21,19 @@ namespace tqrhost {
 class CommandPredictor {
 public:
     /// Whether a request is on its way, or its answer there.
-    using IsAsked = std::function<bool(const ipmi::Command&)>;
+    using IsRequested = std::function<bool(const ipmi::Command&)>;
 
     /// The repository whose order sensors are expected in; null for none. Borrowed.
     void SetSensors(const RecordStore* records) { records_ = records; }
     /// The reader will ask this.
     void Announced(const ipmi::Command& command);
     /// The reader asks this now.
-    void Asked(const ipmi::Command& command);
+    void Requested(const ipmi::Command& command);
     /// The answer to it, or to a prediction.
     void Answered(const ipmi::Command& command, const Response& response);
     /// At most `count` requests that are expected after the last one that was asked, in their
     /// order, and that are not asked already.
-    std::vector<ipmi::Command> Next(std::size_t count, const IsAsked& isAsked) const;
+    std::vector<ipmi::Command> Next(std::size_t count, const IsRequested& isRequested) const;
 
 private:
     struct Sensor {
@@ -43,7 +43,7 @@ private:
     };
 
     void FindSensors();
-    void AskedOfSensor(const ipmi::Command& command);
+    void RequestedOfSensor(const ipmi::Command& command);
     /// Takes a request; false when no further one is wanted.
     using Add = std::function<bool(ipmi::Command)>;
     struct FruPlace {
@@ -56,7 +56,7 @@ private:
         bool byWords = false;
     };
 
-    void AskedOfFru(const ipmi::Command& command);
+    void RequestedOfFru(const ipmi::Command& command);
     void AddFruChunks(const Add& add) const;
     void AddFruToCome(const Add& add) const;
     bool AddFruChunksFrom(std::size_t offset, std::uint8_t chunk, FruPlace place,

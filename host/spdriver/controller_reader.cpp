@@ -107,8 +107,8 @@ void AddChain(const std::vector<Record>& records, std::uint16_t end, RecordStore
 
 }  // namespace
 
-void ControllerReader::Ask(ipmi::Command command,
-                           std::function<void(std::optional<Response>)> take) {
+void ControllerReader::Send(ipmi::Command command,
+                            std::function<void(std::optional<Response>)> take) {
     pipeline_->Submit(std::move(command), [self = weak_from_this(), take = std::move(take)](
                                               std::optional<Response> response) {
         if (const auto reader = self.lock()) {
@@ -124,8 +124,8 @@ std::shared_ptr<RecordReader> ControllerReader::Reader(ipmi::CommandCode command
     });
 }
 
-void ControllerReader::AskGuid() {
-    Ask(ipmi::GetSystemGuid(), [this](std::optional<Response> guid) {
+void ControllerReader::RequestGuid() {
+    Send(ipmi::GetSystemGuid(), [this](std::optional<Response> guid) {
         if (IsAnswer(guid)) guid_ = std::move(guid);
         if (comparing_ > 0) --comparing_;
     });
@@ -135,7 +135,7 @@ void ControllerReader::Start() {
     if (known_ && needs_.log) {
         StartComparing();
     } else {
-        if (needs_.guid) AskGuid();
+        if (needs_.guid) RequestGuid();
         StartWhole();
     }
     Pump();
@@ -144,20 +144,20 @@ void ControllerReader::Start() {
 void ControllerReader::StartComparing() {
     phase_ = Phase::kCompare;
     comparing_ = 3;
-    Ask(ipmi::GetSelInfo(), [this](std::optional<Response> info) {
+    Send(ipmi::GetSelInfo(), [this](std::optional<Response> info) {
         --comparing_;
         toldOfLog_ = true;
         if (Completed(info)) memory_.logInfo = std::move(info);
     });
     if (!known_->log.empty()) {
         ++comparing_;
-        Ask(ipmi::GetSelEntry(IdOf(known_->log.back())), [this](std::optional<Response> entry) {
+        Send(ipmi::GetSelEntry(IdOf(known_->log.back())), [this](std::optional<Response> entry) {
             --comparing_;
             lastKnown_ = std::move(entry);
         });
     }
-    AskGuid();
-    Ask(ipmi::GetSdrRepositoryInfo(), [this](std::optional<Response> info) {
+    RequestGuid();
+    Send(ipmi::GetSdrRepositoryInfo(), [this](std::optional<Response> info) {
         --comparing_;
         sensorAnswer_ = info;
         if (Completed(info)) memory_.sensorInfo = std::move(info);
@@ -205,7 +205,7 @@ void ControllerReader::Compare() {
     log_ = Reader(ipmi::kGetSelEntry);
     log_->BeginAt(next);
     log_->Expect(records - known_->log.size());
-    Ask(ipmi::GetSelEntry(ipmi::kFirstRecordId), [this](std::optional<Response> entry) {
+    Send(ipmi::GetSelEntry(ipmi::kFirstRecordId), [this](std::optional<Response> entry) {
         --comparing_;
         first_ = std::move(entry);
     });
@@ -250,7 +250,7 @@ void ControllerReader::RecallSensors() {
 void ControllerReader::StartWhole() {
     if (needs_.log) {
         log_ = Reader(ipmi::kGetSelEntry);
-        Ask(ipmi::GetSelInfo(), [this](std::optional<Response> info) {
+        Send(ipmi::GetSelInfo(), [this](std::optional<Response> info) {
             log_->Expect(CountIn(info).value_or(kUnknownCount));
             toldOfLog_ = true;
             if (Completed(info)) memory_.logInfo = std::move(info);
@@ -259,12 +259,12 @@ void ControllerReader::StartWhole() {
     }
     if (needs_.sensors) {
         // Beside the log: it costs no time there.
-        Ask(ipmi::GetSdrRepositoryInfo(), [this](std::optional<Response> info) {
+        Send(ipmi::GetSdrRepositoryInfo(), [this](std::optional<Response> info) {
             sensorAnswer_ = info;
             if (Completed(info)) memory_.sensorInfo = std::move(info);
             toldOfSensors_ = true;
         });
-        Ask(ipmi::ReserveSdrRepository(), [this](std::optional<Response> reservation) {
+        Send(ipmi::ReserveSdrRepository(), [this](std::optional<Response> reservation) {
             if (Completed(reservation)) memory_.reservation = std::move(reservation);
             reserved_ = true;
         });
@@ -292,7 +292,7 @@ void ControllerReader::Pump() {
         if (!log_ || (log_->Finished() && toldOfLog_ && comparing_ == 0)) {
             phase_ = Phase::kSensors;
         } else if (!known_ && needs_.sensors && reserved_ && toldOfSensors_ &&
-                   log_->AskedForAll()) {
+                   log_->HasRequestedAll()) {
             // In the room that the log's end leaves.
             if (!sensors_) StartSensors();
             sensors_->Pump();
@@ -303,7 +303,7 @@ void ControllerReader::Pump() {
             RecallSensors();
         } else if (!std::exchange(reserving_, true)) {
             reserved_ = false;
-            Ask(ipmi::ReserveSdrRepository(), [this](std::optional<Response> reservation) {
+            Send(ipmi::ReserveSdrRepository(), [this](std::optional<Response> reservation) {
                 if (Completed(reservation)) memory_.reservation = std::move(reservation);
                 reserved_ = true;
             });
@@ -332,7 +332,7 @@ void ControllerReader::Pump() {
 void ControllerReader::CheckSensors() {
     if (!memory_.sensorInfo) return;
     checkingSensors_ = true;
-    Ask(ipmi::GetSdrRepositoryInfo(), [this](std::optional<Response> info) {
+    Send(ipmi::GetSdrRepositoryInfo(), [this](std::optional<Response> info) {
         checkingSensors_ = false;
         if (!Completed(info)) return;
         const auto before = ipmi::SdrRepositoryInfo::Parse(DataOf(*memory_.sensorInfo));
@@ -348,7 +348,7 @@ void ControllerReader::Check() {
         phase_ = Phase::kDone;
         return;
     }
-    Ask(ipmi::GetSelInfo(), [this](std::optional<Response> info) { Checked(std::move(info)); });
+    Send(ipmi::GetSelInfo(), [this](std::optional<Response> info) { Checked(std::move(info)); });
 }
 
 void ControllerReader::Checked(std::optional<Response> info) {

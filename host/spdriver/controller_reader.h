@@ -49,11 +49,11 @@ private:
     enum class Phase { kCompare, kLog, kSensors, kCheck, kLogAgain, kCheckAgain, kDone };
 
     /// Asks and hands on the answer, as long as the reader is there.
-    void Ask(ipmi::Command command, std::function<void(std::optional<Response>)> take);
+    void Send(ipmi::Command command, std::function<void(std::optional<Response>)> take);
     void Pump();
     void StartWhole();
     void StartComparing();
-    void AskGuid();
+    void RequestGuid();
     /// What is known and what the controller says now have come.
     void Compare();
     /// Puts the records that were known before those that were read; false when they do not make

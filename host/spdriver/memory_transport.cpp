@@ -68,7 +68,7 @@ std::vector<ipmi::Command> MemoryTransport::EndPass() {
 
 std::optional<Response> MemoryTransport::ExchangeLive(const ipmi::Command& command) {
     if (Stopped() != StopReason::kNone) return std::nullopt;
-    predictor_.Asked(command);
+    predictor_.Requested(command);
     std::erase(announced_, command);
     std::optional<Response> response = TakeAhead(command);
     if (!response) {
@@ -77,13 +77,13 @@ std::optional<Response> MemoryTransport::ExchangeLive(const ipmi::Command& comma
             answer->came = true;
             answer->response = std::move(got);
         });
-        AskAhead();
+        RequestAhead();
         RequestPipeline* const pipelines[] = {pipeline_.get()};
         RunPipelines(pipelines, [&answer] { return answer->came; });
         response = std::move(answer->response);
         if (response && response->empty()) response.reset();
     } else {
-        AskAhead();
+        RequestAhead();
     }
     if (response) {
         predictor_.Answered(command, *response);
@@ -106,21 +106,23 @@ std::optional<Response> MemoryTransport::TakeAhead(const ipmi::Command& command)
     return good ? std::move(ahead->response) : std::nullopt;
 }
 
-void MemoryTransport::AskAhead() {
+void MemoryTransport::RequestAhead() {
     if (ahead_.size() > kMaxAhead) {
         std::erase_if(ahead_, [](const auto& one) { return one.second->came; });
     }
     while (!announced_.empty() && pipeline_->Room() > 0) {
-        AskAhead(std::move(announced_.front()), true);
+        RequestAhead(std::move(announced_.front()), true);
         announced_.pop_front();
     }
-    const auto isAsked = [this](const ipmi::Command& command) { return ahead_.contains(command); };
-    for (ipmi::Command& command : predictor_.Next(pipeline_->Room(), isAsked)) {
-        AskAhead(std::move(command), false);
+    const auto isRequested = [this](const ipmi::Command& command) {
+        return ahead_.contains(command);
+    };
+    for (ipmi::Command& command : predictor_.Next(pipeline_->Room(), isRequested)) {
+        RequestAhead(std::move(command), false);
     }
 }
 
-void MemoryTransport::AskAhead(ipmi::Command command, bool announced) {
+void MemoryTransport::RequestAhead(ipmi::Command command, bool announced) {
     const auto ahead = std::make_shared<Ahead>();
     ahead->announced = announced;
     ahead_.emplace(command, ahead);

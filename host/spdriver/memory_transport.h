@@ -40,8 +40,8 @@ private:
     /// A prediction's answer, waited for if it is on its way; empty when there is none, or no good
     /// one.
     std::optional<Response> TakeAhead(const ipmi::Command& command);
-    void AskAhead();
-    void AskAhead(ipmi::Command command, bool announced);
+    void RequestAhead();
+    void RequestAhead(ipmi::Command command, bool announced);
     /// A part of a record is refused because the controller holds the reservation from the reading
     /// no longer: the reader could not know, so a new one is taken for it.
     std::optional<Response> ReadUnderNewReservation(const ipmi::Command& command);

@@ -32,7 +32,7 @@ void RecordReader::Pump() {
     if (finished_) return;
     Drain();
     if (finished_ || reserving_) return;
-    if (!incoming_.contains(position_)) Ask(position_, false);
+    if (!incoming_.contains(position_)) RequestRecord(position_, false);
     Guess();
 }
 
@@ -55,31 +55,31 @@ void RecordReader::Guess() {
             return;
         if (!incoming_.contains(next)) {
             if (isGuess && guesses_ - hits_ >= kMaxOpenGuesses + hits_ / kGuessesPerHit) return;
-            if (isGuess && (!expected_ || AskedForAll())) return;
-            Ask(next, isGuess);
+            if (isGuess && (!expected_ || HasRequestedAll())) return;
+            RequestRecord(next, isGuess);
         }
         id = next;
     }
 }
 
-void RecordReader::Ask(std::uint16_t id, bool isGuess) {
+void RecordReader::RequestRecord(std::uint16_t id, bool isGuess) {
     Incoming& record = incoming_[id];
     record.isGuess = isGuess;
     if (isGuess) ++guesses_;
-    AskAgain(id, &record);
+    RequestAgain(id, &record);
 }
 
-void RecordReader::AskAgain(std::uint16_t id, Incoming* record) {
+void RecordReader::RequestAgain(std::uint16_t id, Incoming* record) {
     ++record->generation;
     record->pending = 0;
     record->headed = record->failed = false;
     record->length = 0;
     record->bytes.clear();
-    AskPart(id, record, 0, whole_ ? ipmi::kWholeRecord : part_);
+    RequestPart(id, record, 0, whole_ ? ipmi::kWholeRecord : part_);
 }
 
-void RecordReader::AskPart(std::uint16_t id, Incoming* record, std::size_t offset,
-                           std::size_t count) {
+void RecordReader::RequestPart(std::uint16_t id, Incoming* record, std::size_t offset,
+                               std::size_t count) {
     ++record->pending;
     const bool isLog = command_ == ipmi::kGetSelEntry;
     const auto offsetByte = static_cast<std::uint8_t>(offset);
@@ -133,7 +133,7 @@ bool RecordReader::Recovered(std::uint16_t id, Incoming* record, std::size_t off
         if (smaller == std::end(kSmallerParts)) return false;
         part_ = std::min(part_, *smaller);
     }
-    AskAgain(id, record);
+    RequestAgain(id, record);
     return true;
 }
 
@@ -151,7 +151,7 @@ void RecordReader::Reserve() {
                           // All that is on its way was asked for with the old one.
                           for (auto& [id, record] : reader->incoming_) {
                               if (record.pending != 0 || !record.headed)
-                                  reader->AskAgain(id, &record);
+                                  reader->RequestAgain(id, &record);
                           }
                           reader->progress_();
                       });
@@ -190,7 +190,7 @@ void RecordReader::TakeBytes(std::uint16_t id, Incoming* record, std::size_t off
         const std::size_t had = std::min(bytes.size(), record->length);
         record->bytes.resize(record->length);
         for (std::size_t at = had; at < record->length; at += part_) {
-            AskPart(id, record, at, std::min(part_, record->length - at));
+            RequestPart(id, record, at, std::min(part_, record->length - at));
         }
         return;
     }
@@ -199,7 +199,7 @@ void RecordReader::TakeBytes(std::uint16_t id, Incoming* record, std::size_t off
     if (fits == 0) {
         record->failed = true;
     } else if (fits < count) {
-        AskPart(id, record, offset + fits, count - fits);
+        RequestPart(id, record, offset + fits, count - fits);
     }
 }
 
@@ -215,7 +215,7 @@ void RecordReader::Drain() {
             record.isGuess = false;
             if (position_ == ipmi::kFirstRecordId && expected_ == 0u) return Finish(false);
             if (due && record.tries++ >= kMaxTries) return Finish(false);
-            AskAgain(position_, &record);
+            RequestAgain(position_, &record);
             return;
         }
         if (!record.headed || record.pending != 0) return;

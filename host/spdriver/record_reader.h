@@ -36,7 +36,7 @@ public:
     /// Asks for what there is room for; to be called when there may be room.
     void Pump();
     /// As many as are announced are there or on their way.
-    bool AskedForAll() const {
+    bool HasRequestedAll() const {
         return expected_ && store_->size() + incoming_.size() >= *expected_;
     }
     /// The last record has come, the next one could not be read, or the chain led back.
@@ -64,9 +64,9 @@ private:
         unsigned tries = 1;
     };
 
-    void Ask(std::uint16_t id, bool isGuess);
-    void AskAgain(std::uint16_t id, Incoming* record);
-    void AskPart(std::uint16_t id, Incoming* record, std::size_t offset, std::size_t count);
+    void RequestRecord(std::uint16_t id, bool isGuess);
+    void RequestAgain(std::uint16_t id, Incoming* record);
+    void RequestPart(std::uint16_t id, Incoming* record, std::size_t offset, std::size_t count);
     void Answered(std::uint16_t id, unsigned generation, std::size_t offset, std::size_t count,
                   const std::optional<Response>& response);
     /// What to do about a completion code; true when the record has been asked for again.
