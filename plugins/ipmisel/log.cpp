@@ -5,19 +5,28 @@
 
 namespace ipmisel {
 
+namespace {
+
+/// Without an exception: scopes end, and some begin, in destructors. A line for which there is no
+/// memory is lost, and the pass goes on.
+void WriteLine(Severity severity, const char* name, const char* what) noexcept {
+    if (!LogEnabled(severity)) return;
+    try {
+        WriteLog(severity, std::string(name) + what);
+    } catch (const std::bad_alloc&) {
+    }
+}
+
+}  // namespace
+
 TraceScope::TraceScope(const char* name, const Words& words)
     : name_(name), words_(words), exceptions_(std::uncaught_exceptions()) {
-    if (LogEnabled(words_.severity)) WriteLog(words_.severity, std::string(name_) + words_.entered);
+    WriteLine(words_.severity, name_, words_.entered);
 }
 
 TraceScope::~TraceScope() {
     if (ended_ || std::uncaught_exceptions() > exceptions_) return;
-    if (!LogEnabled(words_.severity)) return;
-    try {
-        WriteLog(words_.severity, std::string(name_) + words_.completed);
-    } catch (const std::bad_alloc&) {
-        // No exception may leave a destructor: the line is lost, and the pass goes on.
-    }
+    WriteLine(words_.severity, name_, words_.completed);
 }
 
 }  // namespace ipmisel
