@@ -68,7 +68,7 @@ void BmcPort::Receive() {
 void BmcPort::Take(const Packet& packet, const sockaddr_storage& client, Clock::time_point now) {
     const bool ofSession = RmcpBmc::IsOfSession(packet);
     const bool isFull =
-        ofSession && service_.mostOutstanding != 0 && outstanding_ >= service_.mostOutstanding;
+        ofSession && service_.maxOutstanding != 0 && outstanding_ >= service_.maxOutstanding;
     if (isFull && !service_.refusesWhenFull) return;
     Packet answer = bmc_.Answer(packet, isFull);
     if (answer.empty()) return;

@@ -18,7 +18,7 @@ struct Service {
     Duration perRequest{0};
     bool oneAtATime = false;       ///< requests wait for those before them
     bool slowerTogether = false;   ///< each takes as many times as long as there are outstanding
-    unsigned mostOutstanding = 0;  ///< those beyond are dropped; 0: any number
+    unsigned maxOutstanding = 0;   ///< those beyond are dropped; 0: any number
     bool refusesWhenFull = false;  ///< node busy is their answer instead
     /// Round trip of the line for the so-manieth packet; none when left out.
     std::function<Duration(unsigned number)> roundTrip{};

@@ -17,8 +17,8 @@ constexpr int kMinEverySeconds = 60;
 }  // namespace
 
 Command AddWatchCommand(CLI::App* program) {
-    CLI::App* const command =
-        program->add_subcommand("watch", "Visit controllers again and again, a line a new event");
+    CLI::App* const command = program->add_subcommand(
+        "watch", "Visit controllers again and again, a line for each new event");
     const auto options = std::make_shared<WatchOptions>();
     AddAccessOptions(command, &options->collect.access);
     AddHostsOptions(command, &options->hosts);

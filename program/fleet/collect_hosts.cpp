@@ -199,7 +199,7 @@ void PassLogLine(std::string_view line) {
 void AddHostsOptions(CLI::App* command, HostsOptions* options) {
     command
         ->add_option("--hosts", options->lists,
-                     "Many controllers: node[001-128]-bmc,rack7, @FILE with a host a line, "
+                     "Many controllers: node[001-128]-bmc,rack7, @FILE with a host per line, "
                      "%GROUP of the configuration; each in a process of its own")
         ->type_name("LIST")
         ->allow_extra_args(false)

@@ -11,7 +11,7 @@
 // Lists of controllers, as docs/fleet.md has them:
 //
 //   node[001-128]-bmc,rack7     hosts with an optional :PORT, and ranges of numbers
-//   @FILE                       a file with a host or a range a line, then options of its own:
+//   @FILE                       a file with a host or a range per line, then options of its own:
 //                               node[001-128]-bmc  user=admin  password-file=/etc/ipmisel/rack1
 //   %GROUP                      a list that the configuration has under this name
 

@@ -23,7 +23,7 @@ bool IsControl(char32_t character);
 /// U+FFFD; line feeds, tabs and runs of blanks become one blank.
 std::string TerminalText(std::string_view text);
 
-/// Columns that a text of TerminalText takes: one a code point.
+/// Columns that a text of TerminalText takes: one per code point.
 std::size_t Columns(std::string_view text);
 /// The text in lines of at most `width` columns, broken at blanks where there are some, else after
 /// a slash or hyphen where that keeps the next word whole.

@@ -184,7 +184,7 @@ TEST(Doctor, ASuiteOrAPrivilegeThatIsMissingIsNamed) {
 
 TEST(Doctor, MoreRequestsThanTheBmcCanTakeAreFound) {
     const NetworkBmc peer(Bmc(), {.service = {.perRequest = std::chrono::milliseconds(5),
-                                              .mostOutstanding = 4,
+                                              .maxOutstanding = 4,
                                               .refusesWhenFull = true}});
     const Finding found = Examine({peer.Place(), "--user", ipmisim::kUser});
     EXPECT_THAT(found.lines, ContainsRegex("requests at a time +[124]: "));

@@ -266,7 +266,7 @@ TEST_F(Network, ALineThatSpoilsPacketsCostsNothingOfTheReport) {
         {"one request at a time, the others dropped",
          Receiving([](Peer&, Packets* packets, unsigned) { packets->resize(1); }, 2)},
         {"one request at a time, busy for the others",
-         {.service = {.mostOutstanding = 1, .refusesWhenFull = true}, .gatherMilliseconds = 2}},
+         {.service = {.maxOutstanding = 1, .refusesWhenFull = true}, .gatherMilliseconds = 2}},
         {"session that expires",
          Receiving([expired = false](Peer& peer, Packets*, unsigned number) mutable {
              if (!expired && number > 100) peer.bmc().Expire();

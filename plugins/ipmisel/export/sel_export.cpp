@@ -85,7 +85,7 @@ CopiedText Copied(const Record& record, CopyTimeOperation copy) {
 }
 
 /// The text of an operation whose failure is logged and otherwise ignored.
-std::string Tolerated(const CopiedText& copied, const char* failure) {
+std::string LoggedOnly(const CopiedText& copied, const char* failure) {
     if (copied.result != kOk) WriteLog(kNotice, failure);
     return copied.text;
 }
@@ -209,25 +209,25 @@ bool AddSystemEvent(Record* record) {
     if (!AddRecordId(record) || !AddTimestamps(*record, Stamps::kBoth)) return false;
 
     const std::string source =
-        Tolerated(Copied(*record, &IPMISELEntry::CopyGeneratorID), "Error CopyGeneratorID().");
+        LoggedOnly(Copied(*record, &IPMISELEntry::CopyGeneratorID), "Error CopyGeneratorID().");
     if (!AddProperty(*record, "Source", source)) return false;
 
     EventMessage message;
     message.deassertion = (entry.EventDirectionAndType() & 0x80) != 0;
     message.sensorType =
-        Tolerated(Copied(*record, &IPMISELEntry::CopySensorType), "Error CopySensorType().");
+        LoggedOnly(Copied(*record, &IPMISELEntry::CopySensorType), "Error CopySensorType().");
     if (!AddProperty(*record, "SensorType", message.sensorType)) return false;
 
     const std::string eventType =
-        Tolerated(Copied(*record, &IPMISELEntry::CopyEventType), "Error CopyEventType().");
+        LoggedOnly(Copied(*record, &IPMISELEntry::CopyEventType), "Error CopyEventType().");
     if (!AddProperty(*record, "EventType", eventType)) return false;
 
     const s_SDR_Mod_Units units = FindUnits(sensor);
-    message.event = Tolerated(RunCopy([&](char* out, unsigned length) {
-                                  return entry.CopyEventData(record->exported.context, out, length,
-                                                             &units, record->exported.mapping);
-                              }),
-                              "Error CopyEventData().");
+    message.event = LoggedOnly(RunCopy([&](char* out, unsigned length) {
+                                   return entry.CopyEventData(record->exported.context, out, length,
+                                                              &units, record->exported.mapping);
+                               }),
+                               "Error CopyEventData().");
     return AddSensor(*record, sensor, &message) &&
            AddProperty(*record, "Message", Compose(std::move(message)));
 }

@@ -60,7 +60,7 @@ constexpr std::array<TextRange, 25> kSensorTexts{{
 }};
 
 /// Texts of offsets firstOffset and up that are held here, as they stand.
-struct HeldTexts {
+struct BuiltInTexts {
     std::uint8_t type;
     std::uint8_t firstOffset;
     std::span<const string_view> texts;
@@ -82,7 +82,7 @@ constexpr std::array<string_view, 9> kDriveTexts{"Drive Presence",
                                                  "normally)"};
 constexpr std::array<string_view, 2> kLoggingTexts{"SEL Full. ", "SEL Almost Full. "};
 // Compatibility: the cable text stands at a microcontroller's offset as well
-// (SensorOffset.HeldTexts).
+// (SensorOffset.BuiltInTexts).
 constexpr std::array<string_view, 1> kMicrocontrollerTexts{"Cable is connected"};
 constexpr std::array<string_view, 2> kCableTexts{
     "Cable/Interconnect is connected",
@@ -109,7 +109,7 @@ constexpr std::array<string_view, 7> kOemCpuTexts{
     "Vtt Enable Check", "CPU Cache Size", "Old VRM",  "Cache VID mismatch",
     "CPU Mismatch",     "CPU Speed",      "CPU Cores"};
 
-constexpr std::array<HeldTexts, 10> kHeldTexts{{
+constexpr std::array<BuiltInTexts, 10> kBuiltInTexts{{
     {0x07, 10, kProcessorTexts},
     {0x0C, 6, kMemoryTexts},
     {0x0D, 0, kDriveTexts},
@@ -240,7 +240,7 @@ EventData OffsetOnly(int offset) { return {static_cast<std::uint8_t>(offset), 0,
 
 std::string HeldOffsetText(std::uint8_t sensorType, int offset) {
     if (sensorType == kSelFullnessType) return "SEL Fullness";
-    for (const HeldTexts& row : kHeldTexts) {
+    for (const BuiltInTexts& row : kBuiltInTexts) {
         const int index = offset - row.firstOffset;
         if (row.type == sensorType && index >= 0 && index < static_cast<int>(row.texts.size())) {
             return std::string(row.texts[static_cast<std::size_t>(index)]);

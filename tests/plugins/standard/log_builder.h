@@ -49,7 +49,7 @@ public:
         facts.sensor.assertionMask = facts.sensor.deassertionMask = 0x7000;
         return facts;
     }
-    /// As Sensor, in degrees C, a count a degree.
+    /// As Sensor, in degrees C, a degree per count.
     SensorFacts& Temperature(std::uint8_t number, const std::string& name,
                              ipmi::Entity entity = {}) {
         SensorFacts& facts = Sensor(number, 0x01, 0x01, name, entity);

@@ -28,7 +28,7 @@ public:
         milliseconds service{0};
         bool oneAtATime = false;
         bool slowerTogether = false;
-        unsigned mostOutstanding = 1000;  ///< the rest is dropped
+        unsigned maxOutstanding = 1000;  ///< the rest is dropped
         unsigned sequenceWindow = 15;
         /// Whether a packet is lost, by its number; requests and answers are numbered together.
         std::function<bool(unsigned number, Clock::time_point now)> isLost{};
@@ -109,7 +109,7 @@ private:
         const auto arrives = now + character_.roundTrip / 2;
         const auto served = [&](const auto& other) { return other > arrives; };
         std::erase_if(inService_, [&](const auto& other) { return !served(other); });
-        if (inService_.size() >= character_.mostOutstanding) return;
+        if (inService_.size() >= character_.maxOutstanding) return;
         const Bytes answer = bmc_.Answer({packet.bytes().begin(), packet.bytes().end()});
         outside = bmc_.OutsideWindow();
         if (answer.empty()) return;
@@ -194,11 +194,11 @@ TEST(SessionRequests, WhateverABmcOrALineDoesItIsNotSlowerThanOneAtATime) {
         Line::Character character;
         unsigned outside = 0;
     } cases[] = {
-        {"takes 1", {.mostOutstanding = 1}},
-        {"takes 1, slowly", {.service = milliseconds(5), .mostOutstanding = 1}},
-        {"takes 2", {.service = milliseconds(5), .mostOutstanding = 2}},
-        {"takes 4", {.service = milliseconds(5), .mostOutstanding = 4}},
-        {"takes 8", {.service = milliseconds(5), .mostOutstanding = 8}},
+        {"takes 1", {.maxOutstanding = 1}},
+        {"takes 1, slowly", {.service = milliseconds(5), .maxOutstanding = 1}},
+        {"takes 2", {.service = milliseconds(5), .maxOutstanding = 2}},
+        {"takes 4", {.service = milliseconds(5), .maxOutstanding = 4}},
+        {"takes 8", {.service = milliseconds(5), .maxOutstanding = 8}},
         {"slower together",
          {.service = milliseconds(200), .oneAtATime = true, .slowerTogether = true}},
         {"window of 8", {.sequenceWindow = 8, .isLost = Lost(0.02)}, 50},

@@ -75,7 +75,7 @@ TEST_F(SensorOffset, OffsetsEndWithTheirSensorType) {
     }
 }
 
-TEST_F(SensorOffset, HeldTexts) {
+TEST_F(SensorOffset, BuiltInTexts) {
     const std::tuple<int, int, const char*> cases[] = {
         {0x07, 9, "<259>. "},
         {0x07, 10, "Processor Automatically Throttled. "},
