@@ -21,6 +21,11 @@ function __ipmisel_sources
     if string match -q -- 'lan:*' (commandline -ct)
         printf 'lan:%s\n' (__ipmisel_hosts $argv[1] | string match -v -- '%*')
     end
+    for kind in sim: replay:
+        if string match -q -- "$kind*" (commandline -ct)
+            printf "$kind%s\n" (__fish_complete_path (string replace -- $kind '' (commandline -ct)))
+        end
+    end
 end
 
 function __ipmisel_complete

@@ -97,6 +97,11 @@ std::optional<Configuration>& InUse() {
     return configuration;
 }
 
+std::vector<ConfiguredOption>& Applied() {
+    static std::vector<ConfiguredOption> options;
+    return options;
+}
+
 }  // namespace
 
 Configuration::Configuration(const std::vector<std::string>& files,
@@ -200,7 +205,8 @@ const ConfiguredOption* Configuration::Find(const std::string& command,
     return found;
 }
 
-void Configuration::ApplyTo(CLI::App* command) const {
+std::vector<ConfiguredOption> Configuration::ApplyTo(CLI::App* command) const {
+    std::vector<ConfiguredOption> applied;
     for (CLI::Option* const option : command->get_options()) {
         if (option->count() > 0 || option->get_lnames().empty()) continue;
         const std::string name = option->get_lnames().front();
@@ -212,11 +218,13 @@ void Configuration::ApplyTo(CLI::App* command) const {
                 option->add_result(isFlag ? option->get_flag_value(name, value) : value);
             }
             option->run_callback();
+            applied.push_back(*configured);
         } catch (const CLI::ParseError& error) {
             throw Failure(kExitUsage,
                           configured->origin + ": " + error.what() + "; correct it there");
         }
     }
+    return applied;
 }
 
 std::optional<HostGroup> Configuration::Group(const std::string& name) const {
@@ -276,8 +284,14 @@ std::vector<std::string> ConfigurationFiles() {
 }
 
 void UseConfiguration(const Configuration& configuration, CLI::App* command) {
-    configuration.ApplyTo(command);
+    Applied() = configuration.ApplyTo(command);
     InUse() = configuration;
+}
+
+std::string OptionWithOrigin(const std::string& name) {
+    const auto found = std::find_if(Applied().begin(), Applied().end(),
+                                    [&](const ConfiguredOption& one) { return one.name == name; });
+    return "--" + name + (found == Applied().end() ? "" : " (of " + found->origin + ")");
 }
 
 std::optional<HostGroup> FindConfiguredGroup(const std::string& name) {

@@ -29,8 +29,8 @@ public:
     Configuration(const std::vector<std::string>& files, const std::vector<Command>& commands);
 
     /// Gives a parsed command what its command line left out: what the environment has, else the
-    /// files. Throws Failure.
-    void ApplyTo(CLI::App* command) const;
+    /// files. What was given, an entry each. Throws Failure.
+    std::vector<ConfiguredOption> ApplyTo(CLI::App* command) const;
 
     std::optional<HostGroup> Group(const std::string& name) const;
 
@@ -68,6 +68,9 @@ void UseConfiguration(const Configuration& configuration, CLI::App* command);
 
 /// A group of the configuration in use; empty when there is none of this name.
 std::optional<HostGroup> FindConfiguredGroup(const std::string& name);
+
+/// An option for a message about it: "--NAME", and where it is from when nobody typed it.
+std::string OptionWithOrigin(const std::string& name);
 
 /// `ipmisel config`. `commands` are those whose options can be configured.
 Command AddConfigCommand(CLI::App* program, std::function<Configuration()> configuration);

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "program/commands/arguments.h"
+#include "program/commands/configuration.h"
 #include "program/commands/failure.h"
 #include "program/commands/stop_signals.h"
 #include "program/reports/event_filter.h"
@@ -95,9 +96,10 @@ std::unique_ptr<ReportWriter> ReportOutput::Make(const ReportHead& head) {
     const FormatInfo& format = *FindFormat(options_.format);
     const EventWish wish = WishOf(options_);
     if (!wish.Everything() && !format.forPeople) {
+        const char* const given = wish.since ? "since" : wish.severity ? "severity" : "last";
         throw Failure(kExitUsage,
-                      "--since, --severity and --last go with a report for people; leave them out "
-                      "with --format " +
+                      OptionWithOrigin(given) +
+                          " goes with a report for people; leave it out with --format " +
                           options_.format);
     }
     const bool toFile = options_.output.has_value() && *options_.output != "-";

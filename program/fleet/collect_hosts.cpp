@@ -40,16 +40,16 @@ constexpr std::chrono::seconds kStorePause{60};
 void RefuseOptions(const CollectOptions& options) {
     const auto refuse = [](bool given, const char* option) {
         if (!given) return;
-        throw Failure(kExitUsage, std::string(option) +
+        throw Failure(kExitUsage, OptionWithOrigin(option) +
                                       " goes with one collection; leave it out, or collect from "
                                       "this controller alone with --from");
     };
-    refuse(options.record.has_value(), "--record");
-    refuse(options.log.file.has_value(), "--log-file");
-    refuse(!options.names.empty(), "--name");
-    refuse(options.report.since.has_value(), "--since");
-    refuse(options.report.severity.has_value(), "--severity");
-    refuse(options.report.last.has_value(), "--last");
+    refuse(options.record.has_value(), "record");
+    refuse(options.log.file.has_value(), "log-file");
+    refuse(!options.names.empty(), "name");
+    refuse(options.report.since.has_value(), "since");
+    refuse(options.report.severity.has_value(), "severity");
+    refuse(options.report.last.has_value(), "last");
 }
 
 std::vector<HostEntry> HostsOf(const CollectOptions& options, const HostsOptions& hosts) {

@@ -119,6 +119,7 @@ class Completion(unittest.TestCase):
     def test_bash(self):
         self.offers(bash, "bash")
         self.assertEqual(bash(["ipmisel", "collect", "--from", "lan", ":", "no"]), list(HOSTS))
+        self.assertEqual(bash(["ipmisel", "collect", "--from", "sim", ":", "examples/tw"]), ["examples/two-node.json"])
 
     def test_zsh(self):
         if shutil.which("zsh") is None:
@@ -133,6 +134,7 @@ class Completion(unittest.TestCase):
     def test_fish(self):
         self.offers(fish, "fish")
         self.assertLessEqual({f"lan:{host}" for host in HOSTS}, set(fish(["ipmisel", "doctor", "lan:"])))
+        self.assertIn("sim:examples/two-node.json", fish(["ipmisel", "collect", "--from", "sim:examples/tw"]))
 
 
 if __name__ == "__main__":

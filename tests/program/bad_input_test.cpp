@@ -91,6 +91,15 @@ TEST_F(BadInput, WrongUsage) {
     ExpectRefused({"collect", "--from", "sim:"}, 2, "names no place");
 }
 
+TEST_F(BadInput, AnOptionOfAFileIsNamedWithTheFile) {
+    const std::string file = folder.Write("ipmisel.conf", "last = 3\n");
+    setting.environment["XDG_CONFIG_HOME"] = std::filesystem::path(file).parent_path();
+    std::vector<std::string> arguments{"collect", "--from", Write(Server()), "--format", "json"};
+    ExpectRefused(arguments, 2, "--last (of " + file + ") goes with a report for people; ");
+    arguments.insert(arguments.end(), {"--last", "2"});
+    ExpectRefused(arguments, 2, "--last goes with a report for people; leave it out");
+}
+
 TEST_F(BadInput, SourcesThatDoNotOpen) {
     const auto refused = [this](const std::string& source, int exitStatus, const char* part,
                                 std::vector<std::string> more = {}) {
