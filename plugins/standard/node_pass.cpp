@@ -94,6 +94,8 @@ const std::vector<Finding>& NodePass::Findings() {
     if (findings_) return *findings_;
     const Events& events = GetEvents();
     for (SensorFacts& facts : facts_.sensors) ReadSensorOf(&facts);
+    // They grade what sensors say now, too, also where the log has no event.
+    if (!facts_.sensors.empty()) facts_.filters = node_.Filters();
     findings_ = DeriveFindings(facts_, events, Tools());
     return *findings_;
 }

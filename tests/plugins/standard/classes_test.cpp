@@ -467,5 +467,18 @@ TEST_F(StandardClasses, AFindingNamesItsEventsAndWhatItIsConcludedFrom) {
     EXPECT_EQ(all[1].count("FirstTime") + all[1].count("StillPresent"), 0u);
 }
 
+TEST_F(StandardClasses, TheControllersFiltersGradeASensorWithoutAnEventToo) {
+    const auto all = Collect(R"({"bmcs": [{
+  "pef": {"filters": ["01 80 00 00 10 ff ff 01 ff 01 ff 0f 000000 000000 000000"]},
+  "sdr": {"records": [
+    "0100 51 01 32 20 00 30 03 01 7f 68 01 01 00 00 00 70 3f 00 00 01 00 00 01 00 f6 c0 00 00 00 00 00 00 00 00 64 5f 5a 0f 0a 05 00 00 00 00 00 c7 43505520546d70"]},
+  "sensors": {"30": {"reading": "69", "states": "c0 c8"}}
+}]})",
+                             {"IPMI_Finding"});
+    ASSERT_EQ(all.size(), 1u);
+    EXPECT_EQ(all[0].at("Severity"), "critical");  // of itself a warning
+    EXPECT_EQ(all[0].at("Count"), "0");
+}
+
 }  // namespace
 }  // namespace standard
