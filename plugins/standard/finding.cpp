@@ -359,7 +359,7 @@ std::optional<Finding> FindingOfSensor(const NodeFacts& node, const SensorFacts&
     finding.part = worst->part;
     finding.title = TitleOf(*worst);
     finding.evidence.push_back("now: " + worst->sentence);
-    finding.evidence.emplace_back("no event of it in the log");
+    finding.evidence.emplace_back("no open event of it in the log");
     AddOrigin(*worst, &finding);
     finding.stillPresent = true;
     return finding;
@@ -395,7 +395,6 @@ std::vector<Finding> DeriveFindings(const NodeFacts& node, const Events& events,
     const ExpansionSlots slots(node);
     std::map<std::string, std::vector<std::size_t>> groups;
     std::map<std::size_t, std::size_t> causeOf;  // by burst
-    std::set<ipmi::SensorKey> toldBy;
     for (std::size_t i = 0; i < logged.size(); ++i) {
         const LoggedEvent& event = logged[i];
         if (IsLogCleared(event)) {
@@ -412,11 +411,11 @@ std::vector<Finding> DeriveFindings(const NodeFacts& node, const Events& events,
         }
         groups[(isOpen ? "open " : "momentary ") + GroupOf(events, i, bursts[i], slots)].push_back(
             i);
-        if (isOpen && event.agreeingSensor() != nullptr) toldBy.insert(event.sensorKey());
     }
 
     std::vector<Finding> findings;
     std::map<unsigned, std::size_t> openSlots;  // findings of expansion slots, by their number
+    std::map<ipmi::SensorKey, std::size_t> worstOf;  // of a sensor that has open events
     for (auto& [name, indices] : groups) {
         const LoggedEvent& first = logged[indices.front()];
         if (const auto number = slots.NumberOf(first);
@@ -426,11 +425,27 @@ std::vector<Finding> DeriveFindings(const NodeFacts& node, const Events& events,
         Finding& finding =
             findings.emplace_back(FindingOf(events, std::move(indices), tools.convert));
         finding.firstCause = causeOf.at(bursts[finding.events.front()]);
+        if (!finding.isOpen) continue;
+        for (const std::size_t i : finding.events) {
+            if (logged[i].agreeingSensor() == nullptr) continue;
+            std::size_t& worst =
+                worstOf.try_emplace(logged[i].sensorKey(), findings.size() - 1).first->second;
+            if (findings[worst].severity < finding.severity) worst = findings.size() - 1;
+        }
     }
     for (const SensorFacts& facts : node.sensors) {
-        if (toldBy.contains(facts.sensor.key)) continue;
         auto finding = FindingOfSensor(node, facts, tools);
         if (!finding) continue;
+        if (const auto known = worstOf.find(facts.sensor.key); known != worstOf.end()) {
+            // It has grown worse since its last event, which a full log may have dropped.
+            Finding& told = findings[known->second];
+            if (told.severity >= finding->severity) continue;
+            told.severity = finding->severity;
+            told.title = std::move(finding->title);
+            told.evidence.push_back(std::move(finding->evidence.front()));
+            told.stillPresent = true;
+            continue;
+        }
         const auto number = slots.NumberOf(facts.sensor.key);
         const auto known = number ? openSlots.find(*number) : openSlots.end();
         if (known == openSlots.end()) {

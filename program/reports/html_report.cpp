@@ -168,6 +168,7 @@ public:
     void Finish(const ReportEnd& end) override {
         outcome_ = OutcomeOf(end);
         hidden_ = end.hiddenEvents;
+        noEvents_ = Element("p", NoEventsText(end), "class=\"soft\"") + "\n";
         WriteTop();
         WriteProblems();
         WriteParts();
@@ -480,8 +481,7 @@ private:
                 "short, as grey fields. A dashed line is a clock that went back. Each mark leads "
                 "to its event; a larger one stands for several.</p>\n";
         }
-        Section("timeline", "Timeline",
-                content.empty() ? "<p class=\"soft\">No events.</p>\n" : content);
+        Section("timeline", "Timeline", content.empty() ? noEvents_ : content);
     }
 
     void WriteFilters() {
@@ -520,7 +520,7 @@ private:
         if (any) {
             WriteFilters();
         } else {
-            out_.Write("<p class=\"soft\">No events.</p>\n");
+            out_.Write(noEvents_);
         }
         for (std::size_t i = 0; i < logs_.size(); ++i) {
             if (logs_[i].count == 0) continue;
@@ -688,6 +688,7 @@ private:
     std::vector<Log> logs_;
     std::unordered_map<std::string, Integer> records_;  ///< IDs by the keys of their events
     Outcome outcome_{};
+    std::string noEvents_;    ///< what stands in the place of events
     std::size_t hidden_ = 0;  ///< events that are not wanted
     bool zoneUnknown_ = false;
 };

@@ -309,8 +309,7 @@ private:
 
     void PrintEvents(std::size_t index, const ReportEnd& end) {
         if (!events_[index]) {
-            if (Shows(kEventClass))
-                PrintLine(end.hiddenEvents > 0 ? "\nNo such events." : "\nNo events.");
+            if (Shows(kEventClass)) PrintLine("\n" + NoEventsText(end, index));
             return;
         }
         PrintLine("");

@@ -98,6 +98,16 @@ std::string VerdictText(const std::vector<Finding>& findings, bool inPart) {
            (inPart ? "; not everything could be read" : "");
 }
 
+std::string NoEventsText(const ReportEnd& end, std::optional<std::size_t> node) {
+    if (end.hiddenEvents > 0) return "No such events.";
+    if (OutcomeOf(end).exitStatus == 0) return "No events.";
+    bool empty = !end.completeness.empty();
+    for (std::size_t i = 0; i < end.completeness.size(); ++i) {
+        if (!node || *node == i) empty = empty && end.completeness[i].log.announced == 0u;
+    }
+    return empty ? "No events." : "No event could be read.";
+}
+
 std::string ShownText(std::size_t shown, std::size_t hidden) {
     return Format("Shown: %zu of %zu events, as --since, --severity and --last ask.", shown,
                   shown + hidden);

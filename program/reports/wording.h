@@ -1,7 +1,9 @@
 #pragma once
 
+#include <optional>
 #include <string>
 
+#include "program/reports/report.h"
 #include "program/reports/view.h"
 
 // How the reports for people put the values of the view into words. The texts are those of the
@@ -30,6 +32,9 @@ std::string OrderText(const std::string& partNumber, const std::string& serialNu
 std::string CourseText(const Finding& finding);
 /// "No problem found", "2 problems, the worst critical"; says so when not everything was read.
 std::string VerdictText(const std::vector<Finding>& findings, bool inPart);
+/// Why no event is shown, of a node (from 0) or of all of them: there is none, none could be read,
+/// or none is wanted.
+std::string NoEventsText(const ReportEnd& end, std::optional<std::size_t> node = {});
 /// How many events are shown, of all that there are.
 std::string ShownText(std::size_t shown, std::size_t hidden);
 /// A controller's clock beside the collector's.

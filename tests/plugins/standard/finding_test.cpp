@@ -201,7 +201,7 @@ TEST(Finding, ASensorThatIsBadNowIsOneWithoutAnEvent) {
     EXPECT_THAT(findings[0].evidence,
                 ElementsAre("now: Processor 1, CPU1 Temp: above the upper critical threshold "
                             "(reading 96 degrees C, threshold 95 degrees C)",
-                            "no event of it in the log"));
+                            "no open event of it in the log"));
 }
 
 TEST(Finding, OfAnOpenEventSaysWhatTheSensorReadsNow) {
@@ -213,6 +213,30 @@ TEST(Finding, OfAnOpenEventSaysWhatTheSensorReadsNow) {
     ASSERT_EQ(findings.size(), 1u);
     EXPECT_EQ(findings[0].evidence.back(), "CPU1 Temp reads 97 degrees C now");
     EXPECT_EQ(findings[0].stillPresent, true);
+}
+
+TEST(Finding, IsAsBadAsItsSensorIsNowWhateverTheLogHasOfIt) {
+    const struct {
+        std::uint8_t offset;  // of the only event
+        std::uint8_t present;
+        ipmi::Severity severity;
+        const char* title;
+    } cases[] = {
+        {7, 0b011000, ipmi::Severity::kCritical, "CPU1 Temp: above the upper critical threshold"},
+        {11, 0b111000, ipmi::Severity::kFatal,
+         "CPU1 Temp: above the upper non-recoverable threshold"}};
+    for (const auto& c : cases) {
+        LogBuilder log;
+        SensorFacts& temperature = log.Temperature(0x30, "CPU1 Temp");
+        LogBuilder::Reads(&temperature, 97, c.present);
+        log.Event(0x01, 0x30, 0x01, Offset(c.offset));
+        const auto findings = Findings(log);
+        ASSERT_EQ(findings.size(), 1u) << c.title;
+        EXPECT_EQ(findings[0].title, c.title);
+        EXPECT_EQ(findings[0].severity, c.severity) << c.title;
+        EXPECT_EQ(findings[0].stillPresent, true) << c.title;
+        EXPECT_EQ(findings[0].events.size(), 1u) << c.title;
+    }
 }
 
 TEST(Finding, AnEventOfNoDateSaysHowLongAfterTheStartItWas) {

@@ -197,6 +197,29 @@ TEST(Wording, SaysHowAClockGoes) {
     EXPECT_EQ(ClockText(controller), "time zone UTC-05:30");
 }
 
+TEST(Wording, SaysWhyThereIsNoEvent) {
+    const struct {
+        std::optional<unsigned> first, second;  ///< announced, and none read
+        int exitStatus;
+        const char *ofFirst, *ofSecond, *ofAll;
+    } cases[] = {
+        {0, 0, 4, "No events.", "No events.", "No events."},
+        {0, 3, 4, "No events.", "No event could be read.", "No event could be read."},
+        {std::nullopt, 0, 4, "No event could be read.", "No events.", "No event could be read."},
+        {std::nullopt, 3, 0, "No events.", "No events.", "No events."},  // nobody wanted to
+    };
+    for (const auto& c : cases) {
+        ipmisel::ReportEnd end;
+        end.recorded = ipmisel::Outcome{c.exitStatus, "", ""};
+        end.completeness = {{"a", {c.first}, {}, {}}, {"b", {c.second}, {}, {}}};
+        EXPECT_EQ(ipmisel::NoEventsText(end, 0), c.ofFirst);
+        EXPECT_EQ(ipmisel::NoEventsText(end, 1), c.ofSecond);
+        EXPECT_EQ(ipmisel::NoEventsText(end), c.ofAll);
+        end.hiddenEvents = 2;
+        EXPECT_EQ(ipmisel::NoEventsText(end, 0), "No such events.");
+    }
+}
+
 TEST(Severities, AreOrderedAndNamedOnce) {
     EXPECT_EQ(ipmisel::ParseSeverity("fatal"), ipmisel::Severity::kFatal);
     EXPECT_EQ(ipmisel::ParseSeverity("Fatal"), std::nullopt);
