@@ -18,19 +18,6 @@ using ipmisel::JsonValue;
 constexpr std::uint32_t kMost16 = std::numeric_limits<std::uint16_t>::max();
 constexpr std::uint32_t kMost32 = std::numeric_limits<std::uint32_t>::max();
 
-/// "yyyymmddhhmmss.mmmmmm+utc", the form of a CIM date-time (DSP0004).
-std::string LocalTime(const JsonValue& value) {
-    constexpr std::string_view kForm = "dddddddddddddd.ddddddsddd";
-    std::string text = value.Text();
-    const bool fits =
-        std::equal(text.begin(), text.end(), kForm.begin(), kForm.end(), [](char c, char form) {
-            if (form == 'd') return c >= '0' && c <= '9';
-            return form == 's' ? c == '+' || c == '-' : c == form;
-        });
-    if (!fits) value.Refuse("must be a time as in 20240305120000.000000+060");
-    return text;
-}
-
 std::uint8_t NetFn(const JsonValue& value) {
     const std::uint8_t netFn = value.HexByte();
     if (netFn > 0x3F) value.Refuse("a NetFn has six bits, 00 to 3f");
@@ -283,7 +270,7 @@ void ReadServer(const JsonValue& value, ServerDescription* server) {
         {"integrated_bmc", [&](const JsonValue& v) { server->integratedBmc = v.Flag(); }},
         {"ipmi_driver", [&](const JsonValue& v) { server->ipmiDriver = v.Flag(); }},
         {"ipmi_lan", [&](const JsonValue& v) { server->ipmiLan = v.Flag(); }},
-        {"local_time", [&](const JsonValue& v) { server->localTime = LocalTime(v); }},
+        {"local_time", [&](const JsonValue& v) { server->localTime = v.TimeText(); }},
         {"smbios",
          [&](const JsonValue& v) {
              v.List([&](const JsonValue& s) { server->smbios.push_back(s.Hex()); });

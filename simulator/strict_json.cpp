@@ -11,6 +11,7 @@
 #include <optional>
 #include <set>
 #include <sstream>
+#include <string_view>
 #include <utility>
 
 #include "base/hex.h"
@@ -163,6 +164,18 @@ bool JsonValue::IsNull() const { return value_.is_null(); }
 std::string JsonValue::Text() const {
     if (!value_.is_string()) RefuseKind("a text");
     return value_.get<std::string>();
+}
+
+std::string JsonValue::TimeText() const {
+    constexpr std::string_view kForm = "dddddddddddddd.ddddddsddd";
+    std::string text = Text();
+    const bool fits =
+        std::equal(text.begin(), text.end(), kForm.begin(), kForm.end(), [](char c, char form) {
+            if (form == 'd') return c >= '0' && c <= '9';
+            return form == 's' ? c == '+' || c == '-' : c == form;
+        });
+    if (!fits) Refuse("must be a time as in 20240305120000.000000+060");
+    return text;
 }
 
 bool JsonValue::Flag() const {

@@ -35,6 +35,8 @@ public:
 
     bool IsNull() const;
     std::string Text() const;
+    /// A text in the form of a CIM date-time (DSP0004): "yyyymmddhhmmss.mmmmmm+utc".
+    std::string TimeText() const;
     bool Flag() const;
     /// Not below 0, and finite.
     double Real() const;

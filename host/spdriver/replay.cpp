@@ -193,7 +193,7 @@ std::size_t ReadFacts(const JsonValue& line, Source* source) {
         {"ipmi_lan", [&](const JsonValue& v) { facts.ipmiLan = v.Flag(); }},
         {"local_time",
          [&](const JsonValue& v) {
-             if (!v.IsNull()) facts.localTime = v.Text();
+             if (!v.IsNull()) facts.localTime = v.TimeText();
          }},
         {"smbios",
          [&](const JsonValue& v) {

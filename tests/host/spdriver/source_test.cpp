@@ -174,6 +174,8 @@ TEST(Capture, ABadFileIsRefusedByLineKeyAndReason) {
         {"", ": is empty, not a capture"},
         {"{\"ipmisel_capture\": 2, \"nodes\": 1}", ":1: ipmisel_capture: must be 1 to 1, not 2"},
         {"{\"ipmisel_capture\": 1}", ":1: nodes: is missing"},
+        {"{\"ipmisel_capture\": 1, \"nodes\": 1, \"local_time\": \"noon\"}",
+         ":1: local_time: must be a time as in"},
         {exchange("0,"), ":2: not JSON: "},
         {exchange("1, \"request\": \"\", \"response\": null}"),
          ":2: node: the first line announces"},
