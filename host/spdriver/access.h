@@ -1,6 +1,7 @@
 #pragma once
 
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
 #include <functional>
 #include <optional>
@@ -28,6 +29,9 @@ struct SourceError : std::runtime_error {
 struct SourceUsageError : SourceError {
     using SourceError::SourceError;
 };
+
+/// Longest HOST or HOST:PORT of a `lan:` source: a name of the DNS (RFC 1035, 2.3.4) and more.
+constexpr std::size_t kMaxPlace = 300;
 
 /// What the user said about access, as it was said.
 struct SourceOptions {

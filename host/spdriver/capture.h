@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <memory>
 #include <string>
 #include <vector>
@@ -7,6 +8,10 @@
 #include "host/spdriver/source.h"
 
 namespace NQORTQR20 {
+
+/// Greatest length of a line without its end. Far more than a machine's SMBIOS takes, which stands
+/// in the first one.
+constexpr std::size_t kMaxCaptureLine = std::size_t{4} << 20;
 
 /// A capture file in the making; docs/capture.md has its format. It is complete when the transports
 /// that write to it are gone.

@@ -56,6 +56,15 @@ LookupResult Look(const NameLookup& lookup, Clock::time_point deadline) {
     }
 }
 
+/// When the opening is given up. One that stays silent leaves the others half of what the
+/// collection has, to be read in.
+Clock::time_point OpeningDeadline(std::size_t nodes, std::chrono::milliseconds timeout) {
+    const auto now = Clock::now();
+    const auto stop = StopTime();
+    if (nodes == 1 || stop == Clock::time_point::max()) return now + timeout;
+    return std::min(now + timeout, now + (stop - now) / 2);
+}
+
 void BeginOpening(Candidate* candidate, const LanSessionOptions& options,
                   Clock::time_point deadline) {
     const LookupResult found = Look(candidate->lookup, deadline);
@@ -63,7 +72,7 @@ void BeginOpening(Candidate* candidate, const LanSessionOptions& options,
     if (found.error) return;
     try {
         candidate->session = std::make_unique<LanSession>(candidate->name, options);
-        candidate->session->Open(found.endpoints, Clock::now());
+        candidate->session->Open(found.endpoints, Clock::now(), deadline);
     } catch (OpeningError error) {
         candidate->error = error;
     }
@@ -85,10 +94,10 @@ Source OpenLan(const std::vector<std::string>& places, const Access& access) {
     }
     const LanSessionOptions options = OptionsOf(access);
     std::vector<LanSession*> opening;
-    const auto began = Clock::now();
+    const auto deadline = OpeningDeadline(candidates.size(), options.timeout);
     try {
         for (Candidate& candidate : candidates) {
-            BeginOpening(&candidate, options, began + options.timeout);
+            BeginOpening(&candidate, options, deadline);
             if (!candidate.error) opening.push_back(candidate.session.get());
         }
         OpenTogether(opening);

@@ -9,7 +9,7 @@
 
 #include "host/spdriver/stop.h"
 
-namespace tqrhost {
+namespace NQORTQR20 {
 namespace {
 
 using Clock = RequestPipeline::Clock;
@@ -75,4 +75,4 @@ std::optional<Response> ExchangeOver(RequestPipeline& pipeline, ipmi::Command co
     return std::move(answer->response);
 }
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

@@ -48,10 +48,6 @@ public:
     virtual void Advance(Clock::time_point now) = 0;
 };
 
-}  // namespace NQORTQR20
-
-namespace tqrhost {
-
 enum class RunResult { kDone, kIdle, kStopped };
 
 /// Advances several pipelines together until `done` says so (kDone), nothing is pending in any of
@@ -64,4 +60,4 @@ RunResult RunPipelines(std::span<RequestPipeline* const> pipelines,
 /// when the collection is to stop.
 std::optional<Response> ExchangeOver(RequestPipeline& pipeline, ipmi::Command command);
 
-}  // namespace tqrhost
+}  // namespace NQORTQR20

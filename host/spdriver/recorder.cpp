@@ -47,11 +47,17 @@ class CaptureFile : public CaptureWriter {
 public:
     CaptureFile(const std::string& name, const Source& source,
                 const std::vector<std::string>& classes) {
-        // A symbolic link to a file is replaced, not followed; what is there before is emptied, and
-        // no one's to remove. A new file is for the user alone.
+        const std::string facts = FactsLine(source, classes);
+        if (facts.size() > NQORTQR20::kMaxCaptureLine) {
+            throw SourceError("the capture " + name + " cannot be written: the machine's SMBIOS " +
+                              "is longer than a line of it may be; collect without --record");
+        }
+        // A symbolic link to a file or to nothing is replaced, not followed; what is there before
+        // is emptied, and no one's to remove. A new file is for the user alone.
         std::error_code error;
+        const auto target = std::filesystem::status(name, error);
         if (!name.starts_with("/dev/") && std::filesystem::is_symlink(name, error) &&
-            std::filesystem::is_regular_file(name, error)) {
+            (std::filesystem::is_regular_file(target) || !std::filesystem::exists(target))) {
             unlink(name.c_str());
         }
         int file = open(name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600);
@@ -62,7 +68,7 @@ public:
         if (file >= 0) file_.reset(fdopen(file, "w"));
         if (file_) {
             setvbuf(file_.get(), nullptr, _IOLBF, BUFSIZ);
-            Write(FactsLine(source, classes));
+            Write(facts);
         }
         if (file_ && !failed_) return;
         const std::string reason =
@@ -76,7 +82,8 @@ public:
         return !failed_;
     }
     void Write(const std::string& line) {
-        if (!failed_ && std::fputs(line.c_str(), file_.get()) == EOF) failed_ = true;
+        failed_ = failed_ || line.size() > NQORTQR20::kMaxCaptureLine ||
+                  std::fputs(line.c_str(), file_.get()) == EOF;
     }
 
 private:

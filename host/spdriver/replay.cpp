@@ -15,6 +15,7 @@
 #include <vector>
 
 #include "base/text.h"
+#include "host/spdriver/capture.h"
 #include "host/spdriver/kinds.h"
 #include "host/spdriver/stop_gate.h"
 #include "simulator/strict_json.h"
@@ -27,13 +28,12 @@ namespace tqrhost {
 namespace {
 
 using ipmisel::JsonValue;
+using NQORTQR20::kMaxCaptureLine;
 using NQORTQR20::TCIMDateTime;
 using Bytes = std::span<const std::uint8_t>;
 
 constexpr std::uint32_t kVersion = 1;
 constexpr std::uint32_t kMaxNodes = 1024;
-/// Far more than a machine's SMBIOS takes, which stands in the first line.
-constexpr std::size_t kMaxLine = std::size_t{4} << 20;
 constexpr std::size_t kMaxMissing = 100;
 
 std::string TextOf(std::int64_t microseconds, short utcOffsetMinutes) {
@@ -247,8 +247,8 @@ void ReadExchange(const JsonValue& line, const Nodes& nodes, ReplayClock* clock)
     nodes[node]->Add(*request, response);
 }
 
-/// The next line without its end, at most kMaxLine bytes and one more; empty at the end of the
-/// file. `whole` says whether the line has its end.
+/// The next line without its end, at most kMaxCaptureLine bytes and one more; empty at the end of
+/// the file. `whole` says whether the line has its end.
 std::optional<std::string> ReadLine(std::istream& in, bool* whole) {
     std::string line;
     for (int c = in.get(); c != std::istream::traits_type::eof(); c = in.get()) {
@@ -257,7 +257,7 @@ std::optional<std::string> ReadLine(std::istream& in, bool* whole) {
             return line;
         }
         line += static_cast<char>(c);
-        if (line.size() > kMaxLine) break;
+        if (line.size() > kMaxCaptureLine) break;
     }
     *whole = false;
     if (line.empty()) return std::nullopt;
@@ -287,9 +287,9 @@ Source OpenReplay(const std::vector<std::string>& places, const Access& /*access
     bool whole = true;
     while (const auto line = ReadLine(in, &whole)) {
         ++number;
-        if (line->size() > kMaxLine) {
+        if (line->size() > kMaxCaptureLine) {
             Refuse(ipmisel::Format("%s:%zu: the line is longer than %zu bytes", place.c_str(),
-                                   number, kMaxLine),
+                                   number, kMaxCaptureLine),
                    "name another file with --from");
         }
         // The last line of a recording that was ended from outside.

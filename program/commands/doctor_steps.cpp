@@ -1,7 +1,5 @@
 #include "program/commands/doctor_steps.h"
 
-#include <poll.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <cstdio>
@@ -22,7 +20,6 @@ namespace ipmisel {
 namespace {
 
 using Clock = std::chrono::steady_clock;
-using NQORTQR20::RequestPipeline;
 using NQORTQR20::Response;
 
 struct ReadCommand {
@@ -160,27 +157,10 @@ std::string Milliseconds(Clock::duration time) {
     return Format("%.2f ms", std::chrono::duration<double, std::milli>(time).count());
 }
 
-void RunPipeline(RequestPipeline* pipeline) {
-    constexpr std::chrono::milliseconds kMaxWait{100};
-    pipeline->Advance(Clock::now());
-    while (pipeline->Pending() > 0) {
-        const auto now = Clock::now();
-        const auto until = std::max(now, std::min(now + kMaxWait, pipeline->NextTimer()));
-        pollfd wait{pipeline->Descriptor(), POLLIN, 0};
-        const auto rest = std::chrono::ceil<std::chrono::milliseconds>(until - now).count();
-        if (pipeline->Descriptor() >= 0) poll(&wait, 1, static_cast<int>(rest));
-        pipeline->Advance(Clock::now());
-    }
-}
-
 std::optional<Response> DoctorController::Exchange(const ipmi::Command& command) {
     const NQORTQR20::SourceNode& node = source_.nodes.front();
     if (node.transport) return node.transport->Exchange(NQORTQR20::RequestFrame(command));
-    std::optional<Response> answer;
-    node.pipeline->Submit(command,
-                          [&](std::optional<Response> found) { answer = std::move(found); });
-    RunPipeline(node.pipeline.get());
-    return answer;
+    return NQORTQR20::ExchangeOver(*node.pipeline, command);
 }
 
 bool TryCommands(DoctorController* controller, Steps* steps) {

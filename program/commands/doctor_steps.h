@@ -51,9 +51,6 @@ private:
 
 std::string Milliseconds(std::chrono::steady_clock::duration time);
 
-/// Runs a pipeline until nothing is pending.
-void RunPipeline(NQORTQR20::RequestPipeline* pipeline);
-
 /// Each command that a report is made of, once; what a sensor is asked for with the first sensor of
 /// the repository. False when the BMC does not work at all.
 bool TryCommands(DoctorController* controller, Steps* steps);

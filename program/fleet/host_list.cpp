@@ -10,6 +10,7 @@
 
 #include "base/sha256.h"
 #include "base/text.h"
+#include "host/spdriver/access.h"
 #include "program/commands/failure.h"
 #include "program/commands/text_file.h"
 
@@ -218,6 +219,9 @@ private:
 
     void Add(const HostEntry& entry, const std::string& host) {
         if (hosts_.size() == kMaxHosts) RefuseNumber(entry);
+        if (host.size() > NQORTQR20::kMaxPlace) {
+            Refuse(entry.origin, Quoted(host) + " and so on is too long for a host");
+        }
         const std::string source = std::string(kLan) + host;
         const auto [place, isNew] = index_.try_emplace(source, hosts_.size());
         if (isNew) {

@@ -50,7 +50,7 @@ protected:
                                             access.window,
                                             access.timeout});
         const auto found = NameLookup(place.host, place.port).Wait(Clock::now());
-        session->Open(found->endpoints, Clock::now());
+        session->Open(found->endpoints, Clock::now(), Clock::now() + access.timeout);
         LanSession* const opening[] = {session.get()};
         OpenTogether(opening);
         EXPECT_EQ(session->error(), std::nullopt);
@@ -168,6 +168,21 @@ TEST_F(Session, TheDeadlineHoldsWhileASessionIsOpenedAndAllThatFailedAreNamed) {
     EXPECT_LT(took, 1.2);
     EXPECT_THAT(reason,
                 AllOf(HasSubstr(one.Place() + ": "), HasSubstr("; " + other.Place() + ": ")));
+}
+
+TEST_F(Session, OneOfTwoThatIsSilentLeavesHalfOfTheDeadlineToTheOther) {
+    const NetworkBmc good(bmc, {});
+    const NetworkBmc silent(
+        bmc,
+        {.receive = [](NetworkBmc&, std::vector<ipmisim::Packet>* packets) { packets->clear(); }});
+    options.timeoutSeconds = 20;
+    const auto deadline = Clock::now() + milliseconds(1000);
+    StopAt(deadline);
+    const NQORTQR20::Source source = OpenSources({good.Place(), silent.Place()}, options);
+    EXPECT_LT(Clock::now(), deadline);
+    ASSERT_EQ(source.nodes.size(), 1u);
+    ASSERT_EQ(source.unreachable.size(), 1u);
+    EXPECT_THAT(source.unreachable[0].reason, HasSubstr(silent.Place() + ": no answer"));
 }
 
 TEST_F(Session, AFloodOfPacketsHoldsNoDeadlineUp) {

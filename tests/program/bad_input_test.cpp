@@ -206,9 +206,12 @@ TEST_F(BadInput, WhatAKilledRunLeftIsTakenAwayByTheNext) {
 TEST_F(BadInput, ASymbolicLinkIsReplacedAndNotFollowed) {
     const std::string other = place.Write("other", "precious");
     std::filesystem::create_symlink(other, InPlace("report"));
-    EXPECT_EQ(Run(Good({})).exitStatus, 0);
+    std::filesystem::create_symlink(InPlace("nothing"), InPlace("capture"));
+    EXPECT_EQ(Run(Good({"--record", InPlace("capture")})).exitStatus, 0);
     EXPECT_EQ(ReadText(other), "precious");
+    EXPECT_THAT(Left(), ElementsAre("capture", "other", "report"));
     EXPECT_FALSE(std::filesystem::is_symlink(InPlace("report")));
+    EXPECT_FALSE(std::filesystem::is_symlink(InPlace("capture")));
     EXPECT_THAT(ReadText(InPlace("report")), StartsWith("server: SIM-T"));
 }
 

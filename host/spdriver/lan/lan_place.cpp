@@ -10,6 +10,8 @@ namespace {
 
 constexpr std::string_view kRmcpPort = "623";  // IPMI 2.0, clause 13.1.2
 
+constexpr std::size_t kShownOfLongPlace = 80;
+
 [[noreturn]] void RefusePlace(const std::string& place, const char* reason) {
     throw SourceUsageError("lan:" + place + ": " + reason +
                            "; write lan:HOST, lan:HOST:PORT or lan:[ADDRESS]:PORT");
@@ -18,6 +20,9 @@ constexpr std::string_view kRmcpPort = "623";  // IPMI 2.0, clause 13.1.2
 }  // namespace
 
 LanPlace ParseLanPlace(const std::string& place) {
+    if (place.size() > NQORTQR20::kMaxPlace) {
+        RefusePlace(place.substr(0, kShownOfLongPlace) + "...", "it is too long for a host");
+    }
     std::string host = place;
     std::string port(kRmcpPort);
     const auto bracket = place.rfind(']');

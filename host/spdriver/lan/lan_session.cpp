@@ -46,16 +46,17 @@ LanSession::~LanSession() {
     Wipe(options_.credentials.kg);
 }
 
-void LanSession::Open(std::span<const Endpoint> endpoints, Clock::time_point now) {
+void LanSession::Open(std::span<const Endpoint> endpoints, Clock::time_point now,
+                      Clock::time_point deadline) {
     socket_.emplace(endpoints);
-    BeginOpening(false, now);
+    BeginOpening(false, now, deadline);
 }
 
-void LanSession::BeginOpening(bool again, Clock::time_point now) {
-    opening_.emplace(options_.credentials,
-                     SessionOpening::Options{.cipherSuites = options_.cipherSuites,
-                                             .deadline = now + options_.timeout,
-                                             .again = again});
+void LanSession::BeginOpening(bool again, Clock::time_point now, Clock::time_point deadline) {
+    opening_.emplace(
+        options_.credentials,
+        SessionOpening::Options{
+            .cipherSuites = options_.cipherSuites, .deadline = deadline, .again = again});
     opening_->Start(now);
     opening_->TakePackets(&toSend_);
     socket_->Send(std::exchange(toSend_, {}));
@@ -145,7 +146,7 @@ void LanSession::CheckSilence(Clock::time_point now) {
         return;
     }
     const auto reopenAt = ReopenAt();
-    if (reopenAt && now >= *reopenAt) BeginOpening(true, now);
+    if (reopenAt && now >= *reopenAt) BeginOpening(true, now, now + options_.timeout);
 }
 
 Clock::time_point LanSession::NextTimer() const {

@@ -37,8 +37,10 @@ public:
     LanSession(const LanSession&) = delete;
     LanSession& operator=(const LanSession&) = delete;
 
-    /// Begins to open. Throws OpeningError when there is no socket for any of the endpoints.
-    void Open(std::span<const Endpoint> endpoints, Clock::time_point now);
+    /// Begins to open, which fails at the deadline. Throws OpeningError when there is no socket for
+    /// any of the endpoints.
+    void Open(std::span<const Endpoint> endpoints, Clock::time_point now,
+              Clock::time_point deadline);
     bool IsOpening() const { return opening_ && !codec_; }
     /// Why the first opening failed; empty when it did not.
     std::optional<OpeningError> error() const { return error_; }
@@ -56,7 +58,7 @@ public:
     void Advance(Clock::time_point now) override;
 
 private:
-    void BeginOpening(bool again, Clock::time_point now);
+    void BeginOpening(bool again, Clock::time_point now, Clock::time_point deadline);
     void Receive(Clock::time_point now);
     void HandleOpening(Clock::time_point now);
     std::optional<Clock::time_point> ReopenAt() const;

@@ -40,8 +40,10 @@ protected:
 
 TEST_F(Lan, APlaceThatCannotBeIsRefusedAtOnce) {
     const struct {
-        const char *place, *reason;
+        std::string place;
+        const char* reason;
     } cases[] = {{":623", "no host is named"},
+                 {std::string(301, 'h'), "hhh...: it is too long for a host"},
                  {"host:", "the port is no number from 1 to 65535"},
                  {"host:65536", "the port is no number from 1 to 65535"},
                  {"host:6x", "the port is no number from 1 to 65535"},

@@ -161,6 +161,16 @@ TEST(Capture, WhatCannotBeWrittenIsTold) {
         Source source;
         EXPECT_THROW(NQORTQR20::RecordTo(file, source), SourceError) << file;
     }
+    // Half of the longest line, which the other text of it makes too long.
+    const ipmiseltest::TemporaryFolder folder;
+    const std::string file = folder.Write("capture", "before");
+    Source source;
+    source.facts.smbios = {std::vector<std::uint8_t>(NQORTQR20::kMaxCaptureLine / 2)};
+    EXPECT_THROW(NQORTQR20::RecordTo(file, source), SourceError);
+    EXPECT_EQ(ipmiseltest::ReadText(file), "before");
+    source.facts.smbios[0].resize(NQORTQR20::kMaxCaptureLine / 2 - 1000);
+    EXPECT_TRUE(NQORTQR20::RecordTo(file, source)->Finish());
+    EXPECT_EQ(OpenSources({"replay:" + file}, {}).facts.smbios, source.facts.smbios);
 }
 
 TEST(Capture, ABadFileIsRefusedByLineKeyAndReason) {

@@ -54,6 +54,8 @@ TEST(HostList, WhatIsNoListIsRefusedWithItsPlace) {
           ",", "[fe80::1", "n[1-1234567890]", "n[1-1000001]", "@/no/such/file", "%rack"}) {
         EXPECT_NE(Refusal({list}), "") << list;
     }
+    EXPECT_THAT(Refusal({std::string(301, 'h')}),
+                AllOf(HasSubstr("too long for a host"), SizeIs(testing::Lt(150u))));
     EXPECT_THAT(Refusal({"n[3-1]"}), AllOf(HasSubstr("n[3-1]"), HasSubstr("is no range")));
 }
 
