@@ -69,6 +69,28 @@ function(ipmisel_part name)
   target_precompile_headers(${name} REUSE_FROM ${ARG_PRECOMPILED})
 endfunction()
 
+# ipmisel_add_plugin(NAME PART KEPT SYMBOL...)
+# lib/ipmisel/libNAME.pi, target NAME_plugin: registration.cpp over PART, which does the work. It exports what
+# libNAME.map lists; KEPT are those that nothing in the library uses.
+function(ipmisel_add_plugin name part)
+  cmake_parse_arguments(ARG "" "" "KEPT" ${ARGN})
+  list(TRANSFORM ARG_KEPT PREPEND LINKER:--undefined=)
+  set(exports ${CMAKE_CURRENT_SOURCE_DIR}/lib${name}.map)
+  add_library(${name}_plugin SHARED registration.cpp)
+  target_link_libraries(${name}_plugin PRIVATE ${part})
+  target_link_options(${name}_plugin PRIVATE "LINKER:--version-script=${exports}" ${ARG_KEPT})
+  set_target_properties(${name}_plugin PROPERTIES
+                        OUTPUT_NAME ${name}
+                        PREFIX lib
+                        SUFFIX .pi
+                        LIBRARY_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/lib/ipmisel
+                        BUILD_WITH_INSTALL_RPATH ON
+                        INSTALL_RPATH "\$ORIGIN"
+                        CXX_VISIBILITY_PRESET hidden
+                        VISIBILITY_INLINES_HIDDEN ON
+                        LINK_DEPENDS ${exports})
+endfunction()
+
 # The configuration that is measured and installed is not the one whose tests anybody debugs or times:
 # there they are compiled for a short build. The presets for a debugger keep their flags.
 set(IPMISEL_TEST_FLAGS $<$<CONFIG:RelWithDebInfo>:-O0> $<$<CONFIG:RelWithDebInfo>:-g0>)
