@@ -68,6 +68,14 @@ files >"$work/before"
 mkdir "$root/tmp/packages"
 cp "${packages[@]}" "$root/tmp/packages/"
 inside "$root" sh -c 'apt-get -qq install -y --no-install-recommends /tmp/packages/*.deb >/dev/null'
+# As docs/plugin-authors.md has it, with the compiler of this machine.
+if [ "$(dpkg-deb -f "$folder"/ipmisel_*.deb Architecture)" = "$(dpkg --print-architecture)" ]; then
+    read -r -a flags < <(PKG_CONFIG_SYSROOT_DIR=$work/tree PKG_CONFIG_PATH=$work/tree/usr/share/pkgconfig \
+        pkg-config --cflags --libs ipmisel)
+    g++ -std=c++20 -shared -fPIC -fvisibility=hidden "$work/tree/usr/share/doc/ipmisel-dev/examples/plugin/self_test.cpp" \
+        -o "$root/tmp/self_test.pi" "${flags[@]}"
+    [[ $(inside "$root" ipmisel classes --plugin /tmp/self_test.pi) == *EXAMPLE_SelfTest* ]] || fail "no example plug-in"
+fi
 report=$(inside "$root" ipmisel collect --from sim:/usr/share/doc/ipmisel-simulator/examples/rack-server.json)
 [[ $report == *"DIMM 5: uncorrectable memory error"* ]] || fail "the installed program says: $report"
 inside "$root" gzip -t /usr/share/man/man1/ipmisel.1.gz /usr/share/man/man1/ipmisel-collect.1.gz \
