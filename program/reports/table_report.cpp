@@ -228,6 +228,15 @@ private:
         PrintEvents(index, end);
     }
 
+    static std::string LabelOf(const Fru& f) {
+        return f.name.empty() && f.deviceId ? "FRU " + std::to_string(*f.deviceId) : f.name;
+    }
+    /// Whether nothing tells the part apart, though it has an inventory.
+    static bool IsBare(const Fru& f) {
+        return f.manufacturer.empty() && f.product.empty() && f.partNumber.empty() &&
+               f.serialNumber.empty();
+    }
+
     void PrintParts(std::size_t index) {
         TextTable table({{"Part"},
                          {"Manufacturer"},
@@ -238,11 +247,9 @@ private:
         for (const Fru& f : machine_.frus) {
             if (IndexOf(f.node) != index) continue;
             TextTable::Row row;
-            row.cells = {
-                f.name.empty() && f.deviceId ? "FRU " + std::to_string(*f.deviceId) : f.name,
-                f.manufacturer.empty() ? f.moduleManufacturer : f.manufacturer, f.product,
-                f.partNumber.empty() ? f.modulePartNumber : f.partNumber,
-                f.serialNumber.empty() ? f.moduleSerialNumber : f.serialNumber};
+            row.cells = {LabelOf(f), f.manufacturer.empty() ? f.moduleManufacturer : f.manufacturer,
+                         f.product, f.partNumber.empty() ? f.modulePartNumber : f.partNumber,
+                         f.serialNumber.empty() ? f.moduleSerialNumber : f.serialNumber};
             for (std::string& cell : row.cells) cell = TerminalText(cell);
             table.Add(row);
         }
@@ -316,6 +323,16 @@ private:
         events_[index]->Print(out_, look_);
     }
 
+    bool HasFault(const ReportEnd& end, const Fru& f) const {
+        const std::size_t index = IndexOf(f.node);
+        if (!f.deviceId || index >= end.completeness.size()) return false;
+        const std::string device = Format("%04x", static_cast<unsigned>(*f.deviceId));
+        return std::ranges::any_of(end.completeness[index].faults,
+                                   [&](const NQORTQR20::ReadFault& fault) {
+                                       return !fault.ofLogOrSensors && fault.record == device;
+                                   });
+    }
+
     void PrintEnd(const ReportEnd& end) {
         bool headed = false;
         const auto line = [&](const std::string& text) {
@@ -327,6 +344,12 @@ private:
             for (const NQORTQR20::ReadFault& fault : end.completeness[i].faults) {
                 const std::string node = systems_.All().size() > 1 ? Format("node %zu", i + 1) : "";
                 line(Listed({node, Listed({fault.what, fault.record}, " "), fault.problem}, ": "));
+            }
+        }
+        for (const Fru& f : machine_.frus) {
+            if (IsBare(f) && !f.problems.empty() && !HasFault(end, f)) {
+                line(
+                    Listed({systems_.LabelOf(f.node), LabelOf(f), Listed(f.problems, "; ")}, ": "));
             }
         }
         PrintLine("");

@@ -74,7 +74,8 @@ TEST_F(Collecting, FormatsAndPlacesAgree) {
 
     const Ended table = Collect(source);
     EXPECT_THAT(Lines(table.out), Each(SizeIs(Lt(101U))));
-    EXPECT_THAT(table.out, AllOf(HasSubstr("\nNode 2: two-node\n"), EndsWith("Complete.\n")));
+    EXPECT_THAT(table.out, AllOf(HasSubstr("\nNode 2: two-node\n"),
+                                 EndsWith("Event log and sensors are complete.\n")));
     EXPECT_EQ(Collect(source, {"--output", "-"}).out, table.out);
 
     const std::string file = InPlace("report");
