@@ -9,6 +9,7 @@
 #include "base/hex.h"
 #include "base/text.h"
 #include "ipmi/sel_info.h"
+#include "program/reports/saved_report.h"
 #include "program/reports/severity.h"
 #include "program/reports/view.h"
 
@@ -661,26 +662,36 @@ std::vector<StoredVisit> Store::LastVisits(const std::vector<std::string>& names
     return visits;
 }
 
-std::size_t Store::Acknowledge(const std::string& key, const std::string& who,
-                               const std::string& note, std::int64_t now) {
+std::size_t Store::Acknowledge(const std::string& key, const std::vector<std::string>& names,
+                               const std::string& who, const std::string& note, std::int64_t now) {
     Transaction transaction(*database_);
-    // The list of a finding's events stands in its properties.
-    const auto rows = database_->Query(
-        "UPDATE findings SET acknowledged = $2 WHERE gone IS NULL AND (key = $1"
-        " OR first_event = $1 OR last_event = $1 OR properties LIKE $3) RETURNING id",
-        SqlText(key), now, "%\"" + SqlText(key) + "\"%");
-    for (const SqlRow& row : rows) {
+    // The list of a finding's events stands in its properties, where other keys stand too.
+    std::size_t count = 0;
+    for (const SqlRow& row :
+         database_->Query("SELECT f.id, f.key, f.properties, s.name FROM findings f"
+                          " JOIN systems s ON s.id = f.system"
+                          " WHERE f.gone IS NULL AND (f.key = $1 OR f.properties LIKE $2)",
+                          SqlText(key), "%\"" + SqlText(key) + "\"%")) {
+        const auto has = [](const std::vector<std::string>& list, const std::string& text) {
+            return std::find(list.begin(), list.end(), text) != list.end();
+        };
+        const auto finding = ParseInstance(std::string(kFindingClass), TextOf(row.at(2)));
+        const bool isMeant = TextOf(row.at(1)) == key || has(FindingOf(finding).events, key);
+        if (!isMeant || !(names.empty() || has(names, TextOf(row.at(3))))) continue;
+        const std::int64_t id = IntegerOf(row.at(0));
+        database_->Query("UPDATE findings SET acknowledged = $2 WHERE id = $1", id, now);
         database_->Query(
             "UPDATE acknowledgements SET ended = $2"
             " WHERE finding = $1 AND ended IS NULL",
-            IntegerOf(row.at(0)), now);
+            id, now);
         database_->Query(
             "INSERT INTO acknowledgements (finding, given, who, note)"
             " VALUES ($1, $2, $3, $4)",
-            IntegerOf(row.at(0)), now, SqlText(who), SqlText(note));
+            id, now, SqlText(who), SqlText(note));
+        ++count;
     }
     transaction.Commit();
-    return rows.size();
+    return count;
 }
 
 std::optional<std::int64_t> Store::VisitAt(const std::string& name, std::int64_t time) {

@@ -127,10 +127,11 @@ public:
     std::vector<StoredFinding> OpenFindings(const std::vector<std::string>& names);
     /// The last visit of each of these systems, of all when none is named, by their names.
     std::vector<StoredVisit> LastVisits(const std::vector<std::string>& names);
-    /// Takes the open findings that have this key, or an event of this key, out of what is still
-    /// to be looked at, until they come anew: with a further event, or worse. The number of them.
-    std::size_t Acknowledge(const std::string& key, const std::string& who, const std::string& note,
-                            std::int64_t now);
+    /// Takes the open findings of these systems, of all when none is named, that have this key, or
+    /// an event of this key, out of what is still to be looked at, until they come anew: with a
+    /// further event, or worse. The number of them.
+    std::size_t Acknowledge(const std::string& key, const std::vector<std::string>& names,
+                            const std::string& who, const std::string& note, std::int64_t now);
 
     /// The number of a system's last visit at a time or before it; empty when there is none.
     std::optional<std::int64_t> VisitAt(const std::string& name, std::int64_t time);

@@ -119,7 +119,7 @@ protected:
         acknowledged_ = std::move(still);
         if (open.empty() || Pick(random, 2) == 0) return;
         const ipmisel::StoredFinding& one = open[Pick(random, open.size())];
-        EXPECT_EQ(ipmisel::Store(uri).Acknowledge(one.key, "test", "", 1), 1U);
+        EXPECT_EQ(ipmisel::Store(uri).Acknowledge(one.key, {}, "test", "", 1), 1U);
         acknowledged_[one.key] = LastEvent(one);
     }
     static std::string LastEvent(const ipmisel::StoredFinding& finding) {

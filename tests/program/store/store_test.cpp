@@ -99,6 +99,11 @@ TEST_P(StoreOf, AnAcknowledgementHoldsUntilTheFindingComesAnew) {
     ASSERT_THAT(open(), SizeIs(1));
     EXPECT_TRUE(open()[0].acknowledged);
     EXPECT_EQ(open()[0].note, "it's ordered");
+    ::testing::internal::CaptureStdout();
+    EXPECT_EQ(Run({"ack", "--store", uri}).exitStatus, 0);
+    EXPECT_EQ(::testing::internal::GetCapturedStdout(),
+              key + "  critical  bmc  Power Supply 1, PSU1 Status: power supply failed" +
+                  " (acknowledged: it's ordered)\n");
     Visit(bmc.Server(), {});
     EXPECT_TRUE(open()[0].acknowledged);
     bmc.Grow(true);
@@ -106,6 +111,23 @@ TEST_P(StoreOf, AnAcknowledgementHoldsUntilTheFindingComesAnew) {
     ASSERT_THAT(open(), SizeIs(1));
     EXPECT_FALSE(open()[0].acknowledged);
     EXPECT_THAT(Column("SELECT note FROM acknowledgements WHERE ended IS NOT NULL"), SizeIs(1));
+}
+
+TEST_P(StoreOf, AnAcknowledgementIsOfTheFindingsThatHaveTheEventAndOfTheSystemsMeant) {
+    for (const char* const name : {"one", "two"}) {
+        Run({"collect", "--from", "sim:" IPMISEL_EXAMPLES "/rack-server.json", "--store", uri,
+             "--name", name, "--output", (folder.path() / name).string()});
+    }
+    // It is the first cause of others.
+    const std::string key = Column("SELECT key FROM findings WHERE severity = 'fatal'").at(0);
+    const auto acknowledge = [&](const std::string& name) {
+        return Run({"ack", key, "--store", uri, "--system", name}).exitStatus;
+    };
+    EXPECT_EQ(acknowledge("nobody"), 2);
+    EXPECT_EQ(acknowledge("two"), 0);
+    EXPECT_THAT(Column("SELECT s.name || f.severity FROM findings f JOIN systems s"
+                       " ON s.id = f.system WHERE f.acknowledged IS NOT NULL"),
+                ElementsAre("twofatal"));
 }
 
 TEST_P(StoreOf, CheckAndDiffTellWhatTheStoreHas) {
