@@ -63,6 +63,7 @@ int List(const AckOptions& options) {
 }
 
 int Acknowledge(const AckOptions& options) {
+    RequireStore(!options.store.empty(), "ipmisel ack");
     if (options.keys.empty()) {
         if (options.note.empty()) return List(options);
         throw Failure(kExitUsage,
@@ -100,9 +101,7 @@ Command AddAckCommand(CLI::App* program) {
                      "Key of a finding, or of any of its events; none lists what is "
                      "open, the worst first")
         ->check(isKey);
-    command->add_option("--store", options->store, "The store that has them")
-        ->type_name("URI")
-        ->required();
+    command->add_option("--store", options->store, "The store that has them")->type_name("URI");
     command->add_option("--note", options->note, "Why, or what is done about it")
         ->type_name("TEXT");
     command->add_option("--system", options->systems, "System that is meant; all when left out")

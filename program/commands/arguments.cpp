@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "base/text.h"
+#include "program/commands/failure.h"
 
 namespace ipmisel {
 
@@ -59,5 +60,12 @@ CLI::Validator NotEmpty(const std::string& message) {
 }
 
 CLI::Validator FileName() { return NotEmpty("the name is empty; name a file"); }
+
+void RequireStore(bool hasStore, const char* option) {
+    if (hasStore) return;
+    throw Failure(kExitUsage, std::string(option) +
+                                  " goes with a store; name it with --store, or in the "
+                                  "configuration");
+}
 
 }  // namespace ipmisel

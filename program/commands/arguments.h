@@ -19,6 +19,9 @@ CLI::Validator Number();
 CLI::Validator NotEmpty(const std::string& message);
 CLI::Validator FileName();
 
+/// That this option goes with --store, which may also stand in the configuration. Throws Failure.
+void RequireStore(bool hasStore, const char* option);
+
 constexpr double kSecondsPerDay = 24 * 60 * 60;
 
 /// The names of a table whose rows have one.

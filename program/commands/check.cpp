@@ -100,6 +100,7 @@ std::vector<SystemSummary> Stored(const std::string& uri, const std::vector<std:
 int Check(CheckOptions options) {
     if (options.store)
         return Print(CheckSystems(Stored(*options.store, options.systems, options.maxAgeSeconds)));
+    RequireStore(options.systems.empty(), "--system");
     const bool live = !options.collect.access.sources.empty() || !options.hosts.lists.empty();
     if (!options.files.empty()) {
         if (live) {
@@ -130,15 +131,13 @@ Command AddCheckCommand(CLI::App* program) {
             ->check(NotEmpty("the store is empty; give sqlite:FILE or postgresql://..."));
     command->add_option("--system", options->systems, "A system of the store; else all")
         ->type_name("NAME")
-        ->allow_extra_args(false)
-        ->needs(store);
+        ->allow_extra_args(false);
     command
         ->add_option("--max-age", options->maxAgeSeconds,
                      "Seconds after which a last visit of the store tells nothing any more")
         ->type_name("SECONDS")
         ->capture_default_str()
-        ->check(Seconds(365 * kSecondsPerDay))
-        ->needs(store);
+        ->check(Seconds(365 * kSecondsPerDay));
     AddAccessOptions(command, &options->collect.access);
     for (const char* other : {"FILE", "--from"}) store->excludes(command->get_option(other));
     AddHostsOptions(command, &options->hosts);

@@ -445,16 +445,13 @@ void AddPassOptions(CLI::App* command, CollectOptions* options) {
 }
 
 void AddStoreOptions(CLI::App* command, CollectOptions* options) {
-    CLI::Option* const store =
-        command
-            ->add_option("--store", options->store,
-                         "Keep what is collected: sqlite:FILE or postgresql://HOST/DATABASE")
-            ->type_name("URI")
-            ->check(NotEmpty("the store is empty; give sqlite:FILE or postgresql://..."));
     command
-        ->add_flag("--new", options->onlyNew,
-                   "Read and report only events that the store does not have")
-        ->needs(store);
+        ->add_option("--store", options->store,
+                     "Keep what is collected: sqlite:FILE or postgresql://HOST/DATABASE")
+        ->type_name("URI")
+        ->check(NotEmpty("the store is empty; give sqlite:FILE or postgresql://..."));
+    command->add_flag("--new", options->onlyNew,
+                      "Read and report only events that the store does not have");
 }
 
 Command AddCollectCommand(CLI::App* program) {
@@ -480,6 +477,7 @@ Command AddCollectCommand(CLI::App* program) {
     AddStoreOptions(command, options.get());
     command->footer(FormatHelp() + WorkaroundHelp() + kExitStatusHelp);
     return {command, [options, hosts] {
+                RequireStore(options->store || !options->onlyNew, "--new");
                 RefuseNewOfAll(*options);
                 return hosts->lists.empty() ? Collect(*options) : CollectHosts(*options, *hosts);
             }};

@@ -209,6 +209,12 @@ std::vector<ConfiguredOption> Configuration::ApplyTo(CLI::App* command) const {
     std::vector<ConfiguredOption> applied;
     for (CLI::Option* const option : command->get_options()) {
         if (option->count() > 0 || option->get_lnames().empty()) continue;
+        // What stands on the command line may be instead of this.
+        const auto others = option->get_excludes();
+        const auto isGiven = [](const CLI::Option* other) { return other->count() > 0; };
+        if (!option->get_configurable() || std::any_of(others.begin(), others.end(), isGiven)) {
+            continue;
+        }
         const std::string name = option->get_lnames().front();
         const ConfiguredOption* const configured = Find(command->get_name(), name);
         if (configured == nullptr) continue;

@@ -189,9 +189,11 @@ Command AddDiffCommand(CLI::App* program) {
                      "visits by number, or by time")
         ->required()
         ->expected(2);
+    // A configured one would turn files into visits.
     CLI::Option* const store =
         command->add_option("--store", options->store, "The store that has the visits")
-            ->type_name("URI");
+            ->type_name("URI")
+            ->configurable(false);
     command->add_option("--system", options->system, "Whose visits a time means")
         ->type_name("NAME")
         ->needs(store);

@@ -61,6 +61,7 @@ int Report(const SavedOptions& options) {
         const bool past = format != "prometheus" && format != "redfish";
         return WriteSaved(StoreReport(store.database(), options.systems, past), options);
     }
+    RequireStore(options.systems.empty(), "--system");
     if (!options.file) {
         throw Failure(kExitUsage, "name a saved report or a capture, or a store with --store");
     }
@@ -82,17 +83,15 @@ Command AddReportCommand(CLI::App* program) {
         command
             ->add_option("FILE", options->file, "Report of --format json, or capture of --record")
             ->check(FileName());
-    CLI::Option* const store =
-        command
-            ->add_option("--store", options->store,
-                         "What a store has instead, with every event that was ever in a log")
-            ->type_name("URI")
-            ->check(NotEmpty("the store is empty; give sqlite:FILE or postgresql://..."))
-            ->excludes(file);
+    command
+        ->add_option("--store", options->store,
+                     "What a store has instead, with every event that was ever in a log")
+        ->type_name("URI")
+        ->check(NotEmpty("the store is empty; give sqlite:FILE or postgresql://..."))
+        ->excludes(file);
     command->add_option("--system", options->systems, "A system of the store; else all")
         ->type_name("NAME")
-        ->allow_extra_args(false)
-        ->needs(store);
+        ->allow_extra_args(false);
     AddReportOptions(command, &options->report);
     AddPluginOption(command, &options->plugins);
     command->footer(FormatHelp());

@@ -66,6 +66,7 @@ public:
           server_([&] { PrepareWorkers(options.collect); }, RunWorker),
           lostVisits_(options.collect.store),
           pool_(server_, options.hosts.jobs, PassLogLine) {
+        options_.collect.onlyNew = options_.collect.store.has_value();
         options_.collect.report.format = WorkerFormat("json");
         options_.collect.report.classes = {std::string(kControllerClass), std::string(kEventClass)};
         Load();

@@ -71,6 +71,8 @@ const std::vector<Migration>& Migrations() {
               PRIMARY KEY (system, key)))",
           "CREATE INDEX events_position ON events (system, position)",
           "CREATE INDEX events_first_seen ON events (first_seen)",
+          R"(CREATE INDEX events_faults ON events (part, system)
+              WHERE part <> '' AND severity IN ('warning', 'critical', 'fatal'))",
           R"(CREATE TABLE parts (
               id ID_COLUMN,
               system BIGINT NOT NULL REFERENCES systems (id),

@@ -22,7 +22,7 @@ using testing::HasSubstr;
 class ConfigurationTest : public testing::Test {
 protected:
     ConfigurationTest() {
-        collect->add_option("--user", user);
+        collect->add_option("--guest", guest)->excludes(collect->add_option("--user", user));
         collect->add_option("--window", window)->check(CLI::Range(1, 32));
         collect->add_option("--class", classes)->allow_extra_args(false);
         collect->add_flag("!--no-pager", pager);
@@ -59,7 +59,7 @@ protected:
     CLI::App app{"", "ipmisel"};
     CLI::App* collect = app.add_subcommand("collect");
     CLI::App* watch = app.add_subcommand("watch");
-    std::string user, watchUser;
+    std::string user, guest, watchUser;
     std::vector<std::string> classes;
     int window = 0, every = 0;
     bool pager = true;
@@ -86,6 +86,12 @@ TEST_F(ConfigurationTest, CommandLineThenEnvironmentThenTheFirstFileCounts) {
     Collect(files);
     EXPECT_EQ(user, "environment");
     Collect(files, {"--user", "line"});
+    EXPECT_EQ(user, "line");
+}
+
+TEST_F(ConfigurationTest, WhatTheCommandLineHasInsteadGoesBeforeTheFile) {
+    Collect({"guest = file\n"}, {"--user", "line"});
+    EXPECT_EQ(guest, "");
     EXPECT_EQ(user, "line");
 }
 
