@@ -351,9 +351,14 @@ void ControllerReader::Check() {
     Send(ipmi::GetSelInfo(), [this](std::optional<Response> info) { Checked(std::move(info)); });
 }
 
+bool ControllerReader::MoreThanAnnounced() const {
+    return !joined_ && log_ &&
+           log_->store().size() > CountIn(memory_.logInfo).value_or(kUnknownCount);
+}
+
 void ControllerReader::Checked(std::optional<Response> info) {
     if (phase_ == Phase::kCheck) {
-        if (!Changed(memory_.logInfo, info)) {
+        if (!Changed(memory_.logInfo, info) && !MoreThanAnnounced()) {
             phase_ = Phase::kDone;
         } else if (!Completed(info)) {
             memory_.laterLogInfo.emplace();  // whether it has changed is not known

@@ -66,6 +66,9 @@ private:
     void Check();
     void CheckSensors();
     void Checked(std::optional<Response> info);
+    /// More records came than there are: some were added, and as many dropped, within the second
+    /// that the time stamps count by.
+    bool MoreThanAnnounced() const;
     std::shared_ptr<RecordReader> Reader(ipmi::CommandCode command);
 
     RequestPipeline* pipeline_;

@@ -242,20 +242,22 @@ TEST_F(Reading, AChangedLogIsReadOnceMore) {
         const char* what;
         std::vector<int> log;  ///< sensor numbers of the events after the change
         bool renumbered;       ///< their IDs begin anew
+        std::uint8_t time = 1;  ///< the last byte of the time stamps, B0h before
     };
     const Change changes[] = {{"one added", {1, 2, 3, 4, 5, 6}, false},
                               {"some erased", {1, 2, 5}, false},
                               {"cleared", {}, false},
                               {"cleared and one added", {9}, true},
-                              {"wrapped", {4, 5, 6, 7, 8}, false}};
-    const auto describe = [&](const Change& change, std::uint32_t time) {
+                              {"wrapped", {4, 5, 6, 7, 8}, false},
+                              {"wrapped within a second", {2, 3, 4, 5, 6}, false, 0xB0}};
+    const auto describe = [&](const Change& change) {
         ipmisim::BmcDescription later = bmc;
         later.selEntries.clear();
         for (std::size_t i = 0; i < change.log.size(); ++i) {
             const auto sensor = static_cast<std::uint8_t>(change.log[i]);
             SelRecord record = SystemEvent(
                 static_cast<std::uint16_t>(change.renumbered ? i + 1 : sensor), 1, sensor);
-            record[3] = static_cast<std::uint8_t>(time);
+            record[3] = change.time;
             later.selEntries.push_back(record);
         }
         return later;
@@ -273,12 +275,12 @@ TEST_F(Reading, AChangedLogIsReadOnceMore) {
                               ipmisim::SimulatedBmc* of) {
                               if (command.code() == ipmi::kGetSelInfo) ++infos;
                               if (number == at && infos == 1) {
-                                  *of = ipmisim::SimulatedBmc(describe(change, 1));
+                                  *of = ipmisim::SimulatedBmc(describe(change));
                                   changed = true;
                               }
                               if (twice && changed && infos == 3) {
                                   *of = ipmisim::SimulatedBmc(
-                                      describe({"", {7, 8, 9, 10, 11, 12, 13}, true}, 2));
+                                      describe({"", {7, 8, 9, 10, 11, 12, 13}, true, 2}));
                               }
                           }},
                      {.log = true, .sensors = false});
