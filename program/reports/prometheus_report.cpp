@@ -81,13 +81,8 @@ public:
     }
 
 private:
-    /// A series stands once: nodes of one name have their number behind it.
-    std::string Name(Integer node) const {
-        const std::string& name = systems_.Of(node).name;
-        const std::string label = systems_.LabelOf(node);
-        if (label.empty() || label == name) return name;
-        return name.empty() ? label : name + ' ' + label;
-    }
+    /// A series stands once.
+    std::string Name(Integer node) const { return systems_.UniqueNameOf(node); }
     static Integer NodeAt(std::size_t index) { return static_cast<std::int64_t>(index + 1); }
 
     void AddEvent(const Event& event) {

@@ -223,9 +223,10 @@ public:
     }
     void Finish(const ReportEnd&) override {
         for (std::size_t i = 0; i < logs_.size(); ++i) {
+            const std::string name = NameOf(i);
             out_.Write("{\"@odata.id\": " + JsonText(Folder(i)) +
                        ", \"@odata.type\": \"#LogEntryCollection.LogEntryCollection\", \"Name\": " +
-                       JsonText("Event log of " + systems_.All()[i].name) +
+                       JsonText(name.empty() ? "Event log" : "Event log of " + name) +
                        ", \"Members@odata.count\": " + std::to_string(logs_[i].count) +
                        ", \"Members\": [");
             logs_[i].entries.CopyTo(out_);
@@ -239,8 +240,10 @@ private:
         unsigned count = 0;
     };
     std::string Folder(std::size_t index) const {
-        return "/redfish/v1/Systems/" + UriSegment(systems_.All()[index].name) +
-               "/LogServices/SEL/Entries";
+        return "/redfish/v1/Systems/" + UriSegment(NameOf(index)) + "/LogServices/SEL/Entries";
+    }
+    std::string NameOf(std::size_t index) const {
+        return systems_.UniqueNameOf(static_cast<std::int64_t>(index + 1));
     }
 
     OutputFile& out_;

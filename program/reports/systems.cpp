@@ -33,6 +33,13 @@ std::string Systems::LabelOf(Integer node) const {
     return isUnique || !node ? name : "node " + std::to_string(*node);
 }
 
+std::string Systems::UniqueNameOf(Integer node) const {
+    const std::string& name = Of(node).name;
+    const std::string label = LabelOf(node);
+    if (label.empty() || label == name) return name;
+    return name.empty() ? label : name + ' ' + label;
+}
+
 Json Systems::AsJson() const {
     Json list = Json::array();
     for (const SystemInfo& system : std::span(systems_).first(known_)) {

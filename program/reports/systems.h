@@ -23,6 +23,8 @@ public:
     /// What tells a node from the others: its name, "node 2" where another has the same name; empty
     /// when there is only one.
     std::string LabelOf(Integer node) const;
+    /// The name, with the node's number behind it where another has the same.
+    std::string UniqueNameOf(Integer node) const;
     /// `systems` of a report.
     Json AsJson() const;
 
