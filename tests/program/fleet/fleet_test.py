@@ -8,6 +8,8 @@ import io
 import json
 import os
 import pathlib
+import re
+import shlex
 import signal
 import socket
 import sqlite3
@@ -180,10 +182,10 @@ class Fleet(unittest.TestCase):
             out, err = self.watch(all_of_them.sources, new[1], lambda _: store.execute(unchanged).fetchone()[0] == 2)
             self.assertEqual((out, err), ("", ""))
 
-    def watch(self, hosts, uri, is_done):
+    def watch(self, hosts, uri, is_done, command=None):
         """What a service writes until then, and what it says."""
-        command = [IPMISEL, "watch", "--hosts", ",".join(hosts), "--user", "root", "--password-file", self.password,
-                   "--store", uri]
+        command = command or [IPMISEL, "watch", "--hosts", ",".join(hosts), "--user", "root", "--password-file",
+                              self.password, "--store", uri]
         file = pathlib.Path(self.folder.name, "watched")
         with file.open("w") as out, subprocess.Popen(command, stdout=out, stderr=subprocess.PIPE, text=True,
                                                      env=self.environment) as run:
@@ -195,6 +197,50 @@ class Fleet(unittest.TestCase):
             err = run.communicate(timeout=60)[1]
         self.assertEqual(run.returncode, 0)
         return file.read_text(), err
+
+    def test_the_commands_of_the_documents_and_the_units_run(self):
+        texts = [(pathlib.Path(TREE, file), r"^(?:    (?:  command_line )?(?:\S*/sudo )?|ExecStart=)\S*ipmisel +(\w+ .*)$") for file in
+                 ("README.md", "docs/fleet.md", "docs/store.md", "examples/fleet/ipmisel-collect.service",
+                  "examples/fleet/ipmisel-watch.service")]
+        found = [(file.name, shlex.split(command, comments=True)) for file, pattern in texts
+                 for command in re.findall(pattern, file.read_text().replace("\\\n", ""), re.MULTILINE)]
+        found = [(name, words) for name, words in found if name != "README.md" or {"--hosts", "--store"} & set(words)]
+        self.assertGreater(len(found), 20)
+        server = f"{TREE}/examples/rack-server.json"
+        with Controllers(3, "--server", server) as three:
+            names = ("node017-bmc", "bmc17", "rack7-bmc")
+            hosts = self.write("bmcs", "".join(f"{host} name={name}\n" for host, name in zip(three.names, names)))
+            database = pathlib.Path(self.folder.name, "events.db")
+            uri = f"sqlite:{database}"
+            self.collect("@" + hosts, "--store", uri, "--format", "events")
+            sql = sqlite3.connect(database, isolation_level=None)
+            self.addCleanup(sql.close)
+            sql.execute("UPDATE visits SET started = 0")  # long ago
+            key = sql.execute("SELECT key FROM findings").fetchone()[0]
+            self.environment["IPMISEL_PASSWORD"] = SECRET
+            for document, words in found:
+                command = words[0]
+                for option, value in (("--hosts", "@" + hosts), ("--from", three.sources[0]), ("--user", "root"),
+                                      ("--password-file", self.password), ("--store", uri), ("--system", "node017-bmc"),
+                                      ("--output", self.folder.name + "/out")):
+                    words = [value if i > 0 and words[i - 1] == option else word for i, word in enumerate(words)]
+                if command == "collect" and "--from" in words:
+                    words += ["--name", "bmc17"]
+                words = [key if re.fullmatch("[0-9a-f]{32}", word) else word for word in words]
+                with self.subTest(document=document, command=" ".join(words)):
+                    if command == "watch":
+                        visits = "SELECT SUM(times) FROM visits"
+                        wanted = sql.execute(visits).fetchone()[0] + 3
+                        out, err = self.watch((), "", lambda _: sql.execute(visits).fetchone()[0] == wanted,
+                                              [IPMISEL, *words, *(() if "--user" in words else ("--user", "root"))])
+                        self.assertEqual((out, err), ("", ""))
+                        continue
+                    ended = subprocess.run([IPMISEL, *words, *(("--user", "root") if "--user" not in words and
+                                                              command in ("collect", "check") else ())],
+                                           capture_output=True, text=True, timeout=120, env=self.environment)
+                    self.assertIn(ended.returncode, {"check": (2,), "diff": (0, 1)}.get(command, (0,)), ended.stderr)
+                    self.assertEqual(ended.stderr, "")
+            self.assertEqual({name for name, in sql.execute("SELECT name FROM systems")}, set(names))
 
     def workers(self, pid, count):
         """The worker processes, once there are so many."""
