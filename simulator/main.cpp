@@ -15,6 +15,7 @@
 #include <memory>
 #include <optional>
 #include <random>
+#include <ratio>
 #include <string>
 #include <utility>
 #include <vector>
@@ -116,7 +117,9 @@ void Serve(const std::vector<std::unique_ptr<BmcPort>>& ports) {
         for (const auto& port : ports) due = std::min(due, port->NextDue());
         const auto rest =
             std::max(std::chrono::nanoseconds(due - now), std::chrono::nanoseconds(0));
-        const timespec wait{rest.count() / 1'000'000'000, rest.count() % 1'000'000'000};
+        constexpr auto kSecond = std::nano::den;
+        const timespec wait{static_cast<std::time_t>(rest.count() / kSecond),
+                            static_cast<long>(rest.count() % kSecond)};
         ppoll(waits.data(), waits.size(), &wait, nullptr);
         for (std::size_t i = 0; i < ports.size(); ++i) {
             if (waits[i].revents != 0 || ports[i]->NextDue() <= BmcPort::Clock::now()) {

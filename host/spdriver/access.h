@@ -16,7 +16,7 @@
 namespace NQORTQR20 {
 
 /// What a BMC took exception to when a session was to be opened.
-enum class Refusal { kOther, kUser, kPassword, kKey, kPrivilege };
+enum class Refusal { kOther, kUser, kPassword, kKey, kPrivilege, kSessionNumbers };
 
 /// Why a source could not be opened; what() is one line for the user that says what to do.
 struct SourceError : std::runtime_error {

@@ -32,6 +32,7 @@ std::string Joined(const std::vector<int>& numbers) {
 
 constexpr std::chrono::milliseconds kPatience{3000};
 constexpr std::string_view kLan = "lan:";
+constexpr std::string_view kAnyNumbers = "sessionnumbers";  ///< the workaround
 constexpr double kAttemptSeconds = 3;  ///< for one of several ways to open a session
 
 /// A session that was opened, or why it was not.
@@ -41,7 +42,12 @@ struct Attempt {
     Refusal refusal = Refusal::kOther;
 
     /// It is open, and the BMC answers in it.
-    bool Works() { return controller && controller->Exchange(ipmi::GetDeviceId()).has_value(); }
+    bool Works() {
+        if (!controller) return false;
+        if (controller->Exchange(ipmi::GetDeviceId())) return true;
+        if (controller->Pipeline()->WronglyNumbered() > 0) refusal = Refusal::kSessionNumbers;
+        return false;
+    }
 };
 
 Attempt TryOpening(const AccessOptions& access) {
@@ -80,6 +86,7 @@ std::optional<std::string> FindWorkaround(const AccessOptions& access, Refusal r
         const bool looksLikeIt = std::find(kLikeWrongPassword.begin(), kLikeWrongPassword.end(),
                                            workaround.name) != kLikeWrongPassword.end();
         if (IsOfCredentials(refused) && !looksLikeIt) continue;
+        if (refused == Refusal::kSessionNumbers && workaround.name != kAnyNumbers) continue;
         AccessOptions with = Quickly(access);
         with.source.workarounds.emplace_back(workaround.name);
         Attempt attempt = TryOpening(with);
@@ -139,7 +146,8 @@ Attempt TryWorkarounds(AccessOptions* access, Refusal refused, Steps* steps) {
 void TrySessionNumbers(AccessOptions* access, Attempt* session, Steps* steps) {
     constexpr unsigned kAnswers = 256;  // they may be counted in a byte
     constexpr unsigned kCertain = 2;    // of a good line, one may be an old packet
-    constexpr const char* kWorkaround = "sessionnumbers";
+    const auto& given = access->source.workarounds;
+    if (std::find(given.begin(), given.end(), kAnyNumbers) != given.end()) return;
     const RequestPipeline* const pipeline = session->controller->Pipeline();
     const auto until = Clock::now() + kPatience;
     unsigned answers = 0;
@@ -156,8 +164,8 @@ void TrySessionNumbers(AccessOptions* access, Attempt* session, Steps* steps) {
         "known deviation",
         Format("the BMC numbers its answers wrongly, here after %u, and each time the session has "
                "to be opened anew; give --workaround %s, or look for newer firmware of the BMC",
-               answers, kWorkaround));
-    access->source.workarounds.emplace_back(kWorkaround);
+               answers, std::string(kAnyNumbers).c_str()));
+    access->source.workarounds.emplace_back(kAnyNumbers);
     Attempt with = TryOpening(*access);
     if (with.Works()) *session = std::move(with);
 }
@@ -328,10 +336,12 @@ int ExamineLan(AccessOptions access, Steps* steps) {
     if (session.Works()) {
         steps->Good("session", "opened in " + took);
     } else {
-        steps->Bad("session", session.controller
-                                  ? "opened, but nothing is answered in it; reset the "
-                                    "BMC, or look for newer firmware"
-                                  : session.problem);
+        const bool isWronglyNumbered = session.refusal == Refusal::kSessionNumbers;
+        steps->Bad("session", !session.controller ? session.problem
+                              : isWronglyNumbered
+                                  ? "opened, but the BMC numbers its answers wrongly; see below"
+                                  : "opened, but nothing is answered in it; reset the BMC, or look "
+                                    "for newer firmware");
         session.controller.reset();
         const Refusal refusal = session.refusal;
         if (refusal == Refusal::kPrivilege) session = TryLowerPrivileges(&access, steps);

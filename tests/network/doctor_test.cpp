@@ -99,6 +99,8 @@ TEST(Doctor, AKnownDeviationIsRecognisedByTheWorkaroundThatHelps) {
         const Finding with =
             ExamineBmc({.deviations = c.deviations}, {"--workaround", c.workaround});
         EXPECT_EQ(with.exitStatus, 0) << c.workaround << "\n" << with.lines;
+        const bool looksAtNumbers = c.deviations.numbers == Numbers::kRight;
+        EXPECT_EQ(with.lines.find("session numbers") != std::string::npos, looksAtNumbers);
     }
 }
 

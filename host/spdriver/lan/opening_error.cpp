@@ -74,6 +74,8 @@ NQORTQR20::Refusal RefusalOf(OpeningError error) {
             return Refusal::kKey;
         case OpeningError::kPrivilegeRefused:
             return Refusal::kPrivilege;
+        case OpeningError::kSessionNumbers:
+            return Refusal::kSessionNumbers;
         default:
             return Refusal::kOther;
     }
