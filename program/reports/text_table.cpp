@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <numeric>
 #include <string_view>
+#include <utility>
 
 #include "base/text.h"
 #include "program/reports/terminal_text.h"
@@ -96,6 +97,10 @@ std::size_t TextTable::Cost(std::size_t column, std::size_t width) const {
     return std::accumulate(broken, words.end(), ExtraLines(column, width));
 }
 
+std::size_t TextTable::MinWidth(std::size_t column) const {
+    return std::max(kMinWidth, Columns(columns_[column].title));
+}
+
 std::vector<std::size_t> TextTable::Widths(std::size_t width) const {
     std::vector<std::size_t> widths(columns_.size());
     std::size_t columns = 0;
@@ -105,11 +110,13 @@ std::vector<std::size_t> TextTable::Widths(std::size_t width) const {
         ++columns;
     }
     const std::size_t space = columns == 0 ? 0 : (columns - 1) * kGap;
+    bool keepsTitles = true;
     while (std::accumulate(widths.begin(), widths.end(), space) > width) {
         std::optional<std::size_t> least;
         std::size_t leastCost = 0;
         for (std::size_t i = 0; i < widths.size(); ++i) {
-            if (!columns_[i].yields || widths[i] <= kMinWidth) continue;
+            if (!columns_[i].yields || widths[i] <= (keepsTitles ? MinWidth(i) : kMinWidth))
+                continue;
             const std::size_t cost = Cost(i, widths[i] - 1) - Cost(i, widths[i]);
             if (least && (cost > leastCost || (cost == leastCost && widths[i] <= widths[*least]))) {
                 continue;
@@ -117,7 +124,8 @@ std::vector<std::size_t> TextTable::Widths(std::size_t width) const {
             least = i;
             leastCost = cost;
         }
-        if (!least) break;
+        if (!least && !std::exchange(keepsTitles, false)) break;
+        if (!least) continue;
         --widths[*least];
     }
     Balance(&widths);
@@ -130,7 +138,7 @@ void TextTable::Balance(std::vector<std::size_t>* widths) const {
         std::size_t& wide = widths->at(from);
         std::size_t& narrow = widths->at(to);
         const std::size_t before = Cost(from, wide) + Cost(to, narrow);
-        for (std::size_t moved = 1; moved <= kMaxMoved && wide >= kMinWidth + moved; ++moved) {
+        for (std::size_t moved = 1; moved <= kMaxMoved && wide >= MinWidth(from) + moved; ++moved) {
             if (Cost(from, wide - moved) + Cost(to, narrow + moved) >= before) continue;
             wide -= moved;
             narrow += moved;

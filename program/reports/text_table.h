@@ -42,6 +42,8 @@ private:
                   const Row& row) const;
 
     std::size_t Longest(std::size_t column) const;
+    /// A column does not give way beyond it while others can: its title would be cut.
+    std::size_t MinWidth(std::size_t column) const;
     std::size_t ExtraLines(std::size_t column, std::size_t width) const;
     /// What a width costs: lines, and a word that is broken is as bad as one.
     std::size_t Cost(std::size_t column, std::size_t width) const;

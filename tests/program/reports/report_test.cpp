@@ -3,6 +3,7 @@
 #include "program/commands/failure.h"
 #include "program/reports/output_file.h"
 #include "program/reports/report.h"
+#include "program/reports/text_table.h"
 #include "program/reports/timeline.h"
 
 namespace {
@@ -57,6 +58,25 @@ protected:
         return text;
     }
 };
+
+TEST(TextTable, ATitleIsNotCutWhileAnotherColumnCanGiveWay) {
+    const struct {
+        std::size_t width;
+        const char* titles;
+    } cases[] = {{40, "What is wrong              Serial number\n"},
+                 {22, "What is wron  Serial n\n"}};
+    for (const auto& c : cases) {
+        ipmisel::TextTable table({{"What is wrong"}, {"Serial number"}}, 0);
+        table.Add({.cells = {std::string(30, 'a') + " " + std::string(30, 'b'), "7"}});
+        testing::internal::CaptureStdout();
+        {
+            ipmisel::OutputFile out(std::nullopt);
+            table.Print(out, {.width = c.width});
+            out.Commit();
+        }
+        EXPECT_THAT(testing::internal::GetCapturedStdout(), testing::StartsWith(c.titles));
+    }
+}
 
 TEST_F(Table, AnEventIsOneLineWhereItFits) {
     Instance hot = Event(1, "critical", "upper critical high");
