@@ -4,17 +4,12 @@ usage: equal_instances_test.py PROGRAM SOURCE_FOLDER  (exit status 77: a facilit
 """
 import json
 import os
-import pathlib
-import shutil
 import subprocess
-import sys
 import tempfile
 import unittest
 
-PROGRAM = pathlib.Path(sys.argv[1]).resolve()
-SOURCE = pathlib.Path(sys.argv[2]).resolve()
-sys.path.insert(0, str(SOURCE / "tests/guest"))
-import equal_instances  # noqa: E402
+from side_by_side import PROGRAM, SOURCE, main
+import equal_instances  # its folder is known now
 
 SIMULATOR = PROGRAM.parent / "ipmisel-simulator"
 IPMI_DEVICE = "26"  # SMBIOS type 38, which says that there is a BMC
@@ -75,8 +70,4 @@ class EqualInstances(unittest.TestCase):
 
 
 if __name__ == "__main__":
-    for needed, package in ("ipmi_sim", "openipmi"), ("ipmitool", "ipmitool"):
-        if not shutil.which(needed):
-            print(f"SKIPPED: no {needed} (package {package})")
-            sys.exit(77)
-    unittest.main(argv=sys.argv[:1], verbosity=2)
+    main()

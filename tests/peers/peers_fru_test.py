@@ -9,16 +9,11 @@ import json
 import os
 import pathlib
 import re
-import shutil
-import subprocess
-import sys
 import tempfile
 import unittest
 
-PROGRAM = pathlib.Path(sys.argv[1]).resolve()
-SOURCE = pathlib.Path(sys.argv[2]).resolve()
-sys.path.insert(0, str(SOURCE / "tests/guest"))
-import guest  # noqa: E402
+from side_by_side import Peers, main
+import guest  # its folder is known now
 
 MOST_DEVICES = 64
 # What each calls a property. ipmi-fru has one name for the file IDs of board and product.
@@ -158,9 +153,9 @@ def fields(lines: list[str], names: dict[str, str], separator: str) -> dict[str,
     return found
 
 
-def devices(output: str, heading: str) -> dict[int, list[str]]:
+def devices(lines: list[str], heading: str) -> dict[int, list[str]]:
     """The lines of each device, by its ID."""
-    parts = re.split(heading, output)
+    parts = re.split(heading, "\n".join(lines))
     return {int(parts[at], 0 if "0x" in parts[at] else 16 if "h" in heading else 10):
             parts[at + 1].splitlines() for at in range(1, len(parts), 2)}
 
@@ -193,23 +188,10 @@ class SideBySide(unittest.TestCase):
             " ".join(f"0x{byte:02x}" for byte in data) for device, data in enumerate(cls.images))
         sdrs = [locator(device) for device in range(1, len(cls.images))]
         with guest.ipmi_sim([], sdrs, commands) as (port, _), tempfile.TemporaryDirectory() as home:
-            def run(*command: str) -> str:
-                environment = dict(os.environ, IPMISEL_PASSWORD="secret", HOME=home, TZ="UTC")
-                return subprocess.run(["timeout", "120", *command], capture_output=True,
-                                      check=False, text=True, errors="replace",
-                                      env=environment).stdout
-            report = json.loads(run(
-                str(PROGRAM), "collect", "--from", f"lan:127.0.0.1:{port}", "--user", "root",
-                "--workaround", "opensesspriv", "--format", "json", "--class", "IPMI_FRU"))
-            cls.ours = {one["properties"]["DeviceID"]: one["properties"]
-                        for one in report["instances"]}
-            cls.tool = devices(run(
-                "ipmitool", "-I", "lanplus", "-C", "3", "-H", "127.0.0.1", "-p", str(port), "-U",
-                "root", "-P", "secret", "-v", "fru"), r"FRU Device Description : .*\(ID (\d+)\)")
-            cls.free = devices(run(
-                "ipmi-fru", "-D", "LAN_2_0", "-I", "3", "-h", f"127.0.0.1:{port}", "-u", "root",
-                "-p", "secret", "-W", "opensesspriv", "--quiet-cache"),
-                r"FRU Inventory Device: .*\(ID ([0-9A-F]+)h\)")
+            peers = Peers(port, home)
+            cls.ours = {one["DeviceID"]: one for one in peers.ours("IPMI_FRU")}
+            cls.tool = devices(peers.ipmitool("-v", "fru"), r"FRU Device Description : .*\(ID (\d+)\)")
+            cls.free = devices(peers.freeipmi("ipmi-fru"), r"FRU Inventory Device: .*\(ID ([0-9A-F]+)h\)")
 
     def test_every_device_is_there(self):
         expected = set(range(len(self.images)))
@@ -263,9 +245,4 @@ class SideBySide(unittest.TestCase):
 
 
 if __name__ == "__main__":
-    for needed, package in ("ipmi_sim", "openipmi"), ("ipmitool", "ipmitool"), (
-            "ipmi-fru", "freeipmi-tools"):
-        if not shutil.which(needed):
-            print(f"SKIPPED: no {needed} (package {package})")
-            sys.exit(77)
-    unittest.main(argv=sys.argv[:1], verbosity=2)
+    main("ipmi-fru:freeipmi-tools")

@@ -8,16 +8,12 @@ import csv
 import json
 import os
 import pathlib
-import shutil
 import subprocess
-import sys
 import tempfile
 import unittest
 
-PROGRAM = pathlib.Path(sys.argv[1]).resolve()
-SOURCE = pathlib.Path(sys.argv[2]).resolve()
-sys.path.insert(0, str(SOURCE / "tests/guest"))
-import guest  # noqa: E402
+from side_by_side import PROGRAM, Peers, main
+import guest  # its folder is known now
 
 UNSIGNED, ONES, TWOS = 0x00, 0x40, 0x80
 # Name, sensor type, format and rate and percentage, base unit, linearization, M, B, exponents of B
@@ -70,6 +66,14 @@ def number(text: str) -> float | None:
         return None
 
 
+def sensors_of(peers: Peers, folder: str, *more: str) -> tuple[list[list[str]], list[list[str]]]:
+    """The rows of ipmitool and of ipmi-sensors."""
+    tool = [[cell.strip() for cell in line.split("|")] for line in peers.ipmitool("sensor")]
+    return tool, list(csv.reader(peers.freeipmi(
+        "ipmi-sensors", "--comma-separated-output", "--no-header-output", "--output-sensor-thresholds",
+        "--sdr-cache-directory", folder, "--non-abbreviated-units", *more)))
+
+
 class SideBySide(unittest.TestCase):
     @classmethod
     def setUpClass(cls):
@@ -87,22 +91,9 @@ class SideBySide(unittest.TestCase):
                 + " ".join(["000000000000000"] * 4)]
         with guest.ipmi_sim([], records, tuple(commands)) as (port, _), \
                 tempfile.TemporaryDirectory() as folder:
-            def run(*command: str) -> str:
-                environment = dict(os.environ, IPMISEL_PASSWORD="secret", HOME=folder, TZ="UTC")
-                return subprocess.run(["timeout", "60", *command], capture_output=True, check=True,
-                                      text=True, errors="replace", env=environment).stdout
-            cls.ours = [instance["properties"] for instance in json.loads(
-                run(str(PROGRAM), "collect", "--from", f"lan:127.0.0.1:{port}", "--user", "root",
-                    "--workaround", "opensesspriv", "--format", "json", "--class",
-                    "IPMI_Sensor"))["instances"]]
-            cls.tool = [[cell.strip() for cell in line.split("|")] for line in
-                run("ipmitool", "-I", "lanplus", "-C", "3", "-H", "127.0.0.1", "-p", str(port),
-                    "-U", "root", "-P", "secret", "sensor").splitlines()]
-            cls.free = list(csv.reader(
-                run("ipmi-sensors", "-D", "LAN_2_0", "-I", "3", "-h", f"127.0.0.1:{port}", "-u",
-                    "root", "-p", "secret", "-W", "opensesspriv", "--comma-separated-output",
-                    "--no-header-output", "--output-sensor-thresholds", "--quiet-cache",
-                    "--sdr-cache-directory", folder, "--non-abbreviated-units").splitlines()))
+            peers = Peers(port, folder, check=True)
+            cls.ours = peers.ours("IPMI_Sensor")
+            cls.tool, cls.free = sensors_of(peers, folder)
 
     def test_every_sensor_is_told_of_by_all(self):
         count = len(ANALOG) + len(NAMES)
@@ -167,31 +158,15 @@ class RealMachines(unittest.TestCase):
             bmc["sensors"] = simulated_sensors([bytes.fromhex(one) for one in bmc["sdr"]["records"]])
         file = pathlib.Path(folder) / "server.json"
         file.write_text(json.dumps(server))
-        environment = dict(os.environ, IPMISEL_PASSWORD="secret", HOME=folder, TZ="UTC")
-
-        def run(*command: str) -> str:
-            return subprocess.run(["timeout", "120", *command], capture_output=True, check=False,
-                                  text=True, errors="replace", env=environment).stdout
         with subprocess.Popen([PROGRAM.parent / "ipmisel-simulator", "--server", file, "--port", "0",
                                "--cipher-suite", "3"], stdout=subprocess.PIPE,
                               text=True) as simulator:
             try:
-                port = simulator.stdout.readline().strip().rpartition(":")[2]
-                free = list(csv.reader(run(
-                    "ipmi-sensors", "-D", "LAN_2_0", "-I", "3", "-h", f"127.0.0.1:{port}", "-u",
-                    "root", "-p", "secret", "--comma-separated-output", "--no-header-output",
-                    "--output-sensor-thresholds", "--output-sensor-state", "--quiet-cache",
-                    "--sdr-cache-directory", folder, "--shared-sensors",
-                    "--non-abbreviated-units").splitlines()))
-                tool = [[cell.strip() for cell in line.split("|")] for line in run(
-                    "ipmitool", "-I", "lanplus", "-C", "3", "-H", "127.0.0.1", "-p", port, "-U",
-                    "root", "-P", "secret", "sensor").splitlines()]
+                peers = Peers(simulator.stdout.readline().strip().rpartition(":")[2], folder)
+                tool, free = sensors_of(peers, folder, "--output-sensor-state", "--shared-sensors")
             finally:
                 simulator.terminate()
-        ours = [one["properties"] for one in json.loads(run(
-            str(PROGRAM), "collect", "--from", f"sim:{file}", "--format", "json", "--class",
-            "IPMI_Sensor"))["instances"]]
-        return ours, free, tool
+        return peers.ours("IPMI_Sensor", source=("--from", f"sim:{file}")), free, tool
 
     def values(self, mine: dict, names: list[str], cells: list[str]):
         """Each number that another has is ours; ours alone is no fault."""
@@ -244,9 +219,4 @@ class RealMachines(unittest.TestCase):
 
 
 if __name__ == "__main__":
-    for needed, package in ("ipmi_sim", "openipmi"), ("ipmitool", "ipmitool"), (
-            "ipmi-sensors", "freeipmi-tools"):
-        if not shutil.which(needed):
-            print(f"SKIPPED: no {needed} (package {package})")
-            sys.exit(77)
-    unittest.main(argv=sys.argv[:1], verbosity=2)
+    main("ipmi-sensors:freeipmi-tools")

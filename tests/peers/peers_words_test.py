@@ -11,16 +11,11 @@ import json
 import os
 import pathlib
 import re
-import shutil
-import subprocess
-import sys
 import tempfile
 import unittest
 
-PROGRAM = pathlib.Path(sys.argv[1]).resolve()
-SOURCE = pathlib.Path(sys.argv[2]).resolve()
-sys.path.insert(0, str(SOURCE / "tests/guest"))
-import guest  # noqa: E402
+from side_by_side import Peers, main
+import guest  # its folder is known now
 
 SENSOR_SPECIFIC, DEASSERTION = 0x6F, 0x80
 UNSPECIFIED = 0xFF
@@ -63,32 +58,20 @@ def any_sensor() -> bytes:
                   0xC0, 0, 0, 1, *[0] * 7, 0xC4]) + b"Else"
 
 
-class Peers:
+class Readings:
     """One log and repository by each of the three: rows by record ID."""
 
     def __init__(self, log: list[bytes], sensors: list[bytes]):
         with guest.ipmi_sim(log, sensors) as (port, _), tempfile.TemporaryDirectory() as home:
-            def run(*command: str) -> str:
-                environment = dict(os.environ, IPMISEL_PASSWORD="secret", HOME=home, TZ="UTC")
-                return subprocess.run(["timeout", "300", *command], capture_output=True, check=False,
-                                      text=True, errors="replace", env=environment).stdout
-            tool = ("ipmitool", "-I", "lanplus", "-C", "3", "-H", "127.0.0.1", "-p", str(port), "-U",
-                    "root", "-P", "secret")
-            report = json.loads(run(
-                str(PROGRAM), "collect", "--from", f"lan:127.0.0.1:{port}", "--user", "root",
-                "--workaround", "opensesspriv", "--format", "json", "--class", "IPMI_Event"))
-            self.ours = {one["properties"]["RecordID"]: one["properties"]
-                         for one in report["instances"]}
-            self.tool = {int(row[0], 16): row for row in
-                         csv.reader(run(*tool, "-c", "sel", "elist").splitlines())}
-            self.free = {int(line.split(",")[0]): line.split(",", 6) for line in run(
-                "ipmi-sel", "-D", "LAN_2_0", "-I", "3", "-h", f"127.0.0.1:{port}", "-u", "root",
-                "-p", "secret", "-W", "opensesspriv", "--output-event-state",
-                "--comma-separated-output", "--no-header-output", "--quiet-cache").splitlines()}
+            peers = Peers(port, home)
+            self.ours = {one["RecordID"]: one for one in peers.ours("IPMI_Event")}
+            self.tool = {int(row[0], 16): row for row in csv.reader(peers.ipmitool("-c", "sel", "elist"))}
+            self.free = {int(line.split(",")[0]): line.split(",", 6) for line in peers.freeipmi(
+                "ipmi-sel", "--output-event-state", "--comma-separated-output", "--no-header-output")}
 
 
 class Words(unittest.TestCase):
-    def hold(self, peers: Peers, records: int) -> int:
+    def hold(self, peers: Readings, records: int) -> int:
         """Holds each event against what the others say; how many of their words were compared."""
         self.assertEqual(len(peers.ours), records)
         self.assertEqual(len(peers.tool), records)
@@ -135,11 +118,11 @@ class Words(unittest.TestCase):
 
     def test_every_type_offset_and_direction(self):
         log = offsets_and_directions()
-        self.assertGreaterEqual(self.hold(Peers(log, [any_sensor()]), len(log)), 490)
+        self.assertGreaterEqual(self.hold(Readings(log, [any_sensor()]), len(log)), 490)
 
     def test_every_meaning_of_event_data(self):
         log = event_data()
-        self.assertGreaterEqual(self.hold(Peers(log, [any_sensor()]), len(log)), len(log))
+        self.assertGreaterEqual(self.hold(Readings(log, [any_sensor()]), len(log)), len(log))
 
     def test_the_logs_of_real_machines(self):
         folder = os.environ.get("IPMISEL_REAL_MACHINES")
@@ -150,13 +133,8 @@ class Words(unittest.TestCase):
                 log = [bytes.fromhex(text) for text in bmc.get("sel", {}).get("entries", [])]
                 sensors = [bytes.fromhex(text) for text in bmc.get("sdr", {}).get("records", [])]
                 if log:
-                    self.hold(Peers(log, sensors or [any_sensor()]), len(log))
+                    self.hold(Readings(log, sensors or [any_sensor()]), len(log))
 
 
 if __name__ == "__main__":
-    for needed, package in ("ipmi_sim", "openipmi"), ("ipmitool", "ipmitool"), (
-            "ipmi-sel", "freeipmi-tools"):
-        if not shutil.which(needed):
-            print(f"SKIPPED: no {needed} (package {package})")
-            sys.exit(77)
-    unittest.main(argv=sys.argv[:1], verbosity=2)
+    main("ipmi-sel:freeipmi-tools")
