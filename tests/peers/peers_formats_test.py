@@ -21,9 +21,11 @@ import time
 import unittest
 import uuid
 
-PROGRAM, TREE = sys.argv[1], pathlib.Path(sys.argv[2]).resolve()
+from side_by_side import PROGRAM, SOURCE as TREE, eventually
+
 sys.path.insert(0, str(TREE / "tests/program/reports"))
 from formats_support import EXAMPLES, Page, collect, hostile_report, run, set_program, tool  # noqa: E402
+from guest import free_port  # noqa: E402
 
 set_program(PROGRAM)
 
@@ -45,21 +47,6 @@ def to_nul(value):
     if isinstance(value, list):
         return [to_nul(each) for each in value]
     return {k: to_nul(v) for k, v in value.items()} if isinstance(value, dict) else value
-
-
-def free_port(kind=socket.SOCK_STREAM):
-    with socket.socket(socket.AF_INET, kind) as free:
-        free.bind(("127.0.0.1", 0))
-        return free.getsockname()[1]
-
-
-def wait_until(condition, seconds=20):
-    end = time.monotonic() + seconds
-    while not condition():
-        if time.monotonic() > end:
-            return False
-        time.sleep(0.1)
-    return True
 
 
 class Folder(unittest.TestCase):
@@ -144,7 +131,7 @@ class TakenByPrograms(Folder):
                 return ""
             finally:
                 connection.close()
-        self.assertTrue(wait_until(fetch))
+        self.assertTrue(eventually(fetch))
         served = fetch()
         self.assertIn("node_textfile_scrape_error 0", served)
 
@@ -181,13 +168,13 @@ class TakenByPrograms(Folder):
 
         def kept():
             return lines_of(output.read_text()) if output.exists() else []
-        self.assertTrue(wait_until(lambda: len(kept()) >= len(wanted) or daemon.poll() is not None, 40))
+        self.assertTrue(eventually(lambda: len(kept()) >= len(wanted) or daemon.poll() is not None, 40))
         self.assertEqual([json.loads(line) for line in kept()], wanted)
         with socket.create_connection(("127.0.0.1", port), timeout=10) as line:
             for event in wanted:  # RFC 5424 in the frames of RFC 6587
                 message = "<133>1 - - ipmisel - - - " + json.dumps(event)
                 line.sendall(f"{len(message)} {message}".encode())
-        self.assertTrue(wait_until(lambda: len(kept()) >= 2 * len(wanted), 40), len(kept()))
+        self.assertTrue(eventually(lambda: len(kept()) >= 2 * len(wanted), 40), len(kept()))
         self.assertEqual([json.loads(line) for line in kept()[len(wanted):]], wanted)
 
     def test_the_journal_keeps_the_lines(self):
@@ -202,7 +189,7 @@ class TakenByPrograms(Folder):
             out = subprocess.run([journalctl, "-o", "json", "-t", tag], capture_output=True, text=True).stdout
             return [json.loads(json.loads(line)["MESSAGE"]) for line in out.splitlines()]
         wanted = [json.loads(line) for line in lines_of(text)]
-        self.assertTrue(wait_until(lambda: len(kept()) >= len(wanted)))
+        self.assertTrue(eventually(lambda: len(kept()) >= len(wanted)))
         self.assertEqual(kept(), wanted)
 
 

@@ -13,8 +13,8 @@ import tempfile
 import time
 import unittest
 
-PROGRAM = pathlib.Path(sys.argv[1]).resolve()
-SOURCE = pathlib.Path(sys.argv[2]).resolve()
+from side_by_side import PROGRAM, SOURCE, skip
+
 USER = pwd.getpwuid(os.geteuid()).pw_name
 # Service, arguments, and the state that Nagios has for it.
 SERVICES = (
@@ -98,11 +98,6 @@ define service {{
   contacts nobody
 }}
 """
-
-
-def skip(why):
-    print(f"SKIPPED: {why}")
-    sys.exit(77)
 
 
 class Nagios(unittest.TestCase):

@@ -14,8 +14,8 @@ import tempfile
 import time
 import unittest
 
-PROGRAM = pathlib.Path(sys.argv[1]).resolve()
-SOURCE = pathlib.Path(sys.argv[2]).resolve()
+from side_by_side import PROGRAM, SOURCE, eventually, skip
+
 SIMULATOR = PROGRAM.parent / "ipmisel-simulator"
 FLEET = SOURCE / "examples/fleet"
 CONTROLLERS = 200
@@ -48,26 +48,12 @@ PartitionName=all Nodes=n1,n2 Default=YES MaxTime=INFINITE State=UP
 """
 
 
-def skip(why):
-    print(f"SKIPPED: {why}")
-    sys.exit(77)
-
-
 def free_ports(count):
     sockets = [socket.create_server(("127.0.0.1", 0)) for _ in range(count)]
     ports = [each.getsockname()[1] for each in sockets]
     for each in sockets:
         each.close()
     return ports
-
-
-def eventually(condition, seconds=60):
-    end = time.monotonic() + seconds
-    while time.monotonic() < end:
-        if condition():
-            return True
-        time.sleep(0.2)
-    return False
 
 
 class Slurm(unittest.TestCase):

@@ -1,4 +1,4 @@
-"""One BMC, read by ipmisel, by ipmitool and by a program of FreeIPMI: what the tests of this folder share.
+"""What the tests of this folder share: one BMC read by ipmisel, ipmitool and a program of FreeIPMI, and waiting.
 
 The first argument is the program, the second the folder of the sources.
 """
@@ -8,6 +8,7 @@ import pathlib
 import shutil
 import subprocess
 import sys
+import time
 import unittest
 
 PROGRAM = pathlib.Path(sys.argv[1]).resolve()
@@ -46,10 +47,23 @@ class Peers:
                         "-p", "secret", "-W", "opensesspriv", "--quiet-cache", *arguments).splitlines()
 
 
+def skip(why: str):
+    print(f"SKIPPED: {why}")
+    sys.exit(77)
+
+
+def eventually(condition, seconds: float = 60) -> bool:
+    end = time.monotonic() + seconds
+    while not condition():
+        if time.monotonic() > end:
+            return False
+        time.sleep(0.1)
+    return True
+
+
 def main(*needed: str):
     """Runs the tests; exit status 77 where a program, named as PROGRAM:PACKAGE, is missing."""
     for program, package in (one.split(":") for one in ("ipmi_sim:openipmi", "ipmitool:ipmitool", *needed)):
         if not shutil.which(program):
-            print(f"SKIPPED: no {program} (package {package})")
-            sys.exit(77)
+            skip(f"no {program} (package {package})")
     unittest.main(argv=sys.argv[:1], verbosity=2)
