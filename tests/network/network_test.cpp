@@ -198,7 +198,6 @@ TEST_F(Network, ALineThatSpoilsPacketsCostsNothingOfTheReport) {
         Peer::Character character;
         unsigned sessions = 1;
     } cases[] = {
-        {"lost", Losing(3), 0},
         {"requests lost for a while",
          Receiving([gone = Outage()](Peer&, Packets* packets, unsigned number) mutable {
              if (gone(number)) packets->clear();
@@ -208,17 +207,11 @@ TEST_F(Network, ALineThatSpoilsPacketsCostsNothingOfTheReport) {
              return Packets(gone(number) ? 0 : 1, answer);
          }),
          0},
-        {"doubled",
-         Sending([](Peer&, const Packet& answer, unsigned) { return Packets(2, answer); })},
         {"reordered", Receiving(
                           [](Peer&, Packets* packets, unsigned number) {
                               std::shuffle(packets->begin(), packets->end(), std::mt19937(number));
                           },
                           2)},
-        {"answered in reverse",
-         Receiving([](Peer&, Packets* packets,
-                      unsigned) { std::reverse(packets->begin(), packets->end()); },
-                   2)},
         {"late", Sending([held = Packets()](Peer&, const Packet& answer, unsigned number) mutable {
              held.push_back(answer);
              return number % 10 == 6 ? Packets() : std::exchange(held, {});
