@@ -12,6 +12,8 @@ namespace standard {
 struct ClassEntry {
     NQORTQR20::fdrClassInfo info;
     void (*write)(NodePass& pass, Output& output);
+    /// Says what of it will be asked, before the first class is written; null for nothing.
+    void (*announce)(NodePass& pass) = nullptr;
 };
 
 /// Null for a class that the plug-in does not have.

@@ -58,11 +58,15 @@ const char* OrderName(ipmi::GuidOrder order) {
     return "";
 }
 
-void Write(NodePass& pass, Output& output) {
-    Node& node = pass.node();
-    node.controller().Announce(std::to_array(
+void Announce(NodePass& pass) {
+    // Not Get SEL Time: what matters of it is when it was answered.
+    pass.node().controller().Announce(std::to_array(
         {ipmi::GetSystemGuid(), ipmi::GetFruInventoryAreaInfo(kOwnFruDevice), ipmi::GetDeviceId(),
          ipmi::GetSelfTestResults(), ipmi::GetSelTimeUtcOffset(), ipmi::GetChassisStatus()}));
+}
+
+void Write(NodePass& pass, Output& output) {
+    Node& node = pass.node();
     if (!output.Begin(kName)) return;
     output.Integer("Node", node.number());
     const auto& system = pass.Smbios().system;
@@ -118,6 +122,7 @@ GuidReading ReadGuid(const std::optional<ipmi::Guid>& guid,
 const ClassEntry kControllerClass{
     {kName, "the management controller, its clock, and the power of the chassis",
      NQORTQR20::kByDefault, "Node", nullptr, kProperties, std::size(kProperties)},
-    Write};
+    Write,
+    Announce};
 
 }  // namespace standard

@@ -193,6 +193,7 @@ const ClassEntry kEventClass{
              .exporter = nullptr,
              .properties = kProperties,
              .propertyCount = std::size(kProperties)},
-    .write = WriteEvents};
+    .write = WriteEvents,
+    .announce = [](NodePass& pass) { pass.AnnounceEvents(); }};
 
 }  // namespace standard

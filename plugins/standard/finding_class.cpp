@@ -69,6 +69,7 @@ const ClassEntry kFindingClass{
              .exporter = nullptr,
              .properties = kProperties,
              .propertyCount = std::size(kProperties)},
-    .write = WriteFindings};
+    .write = WriteFindings,
+    .announce = [](NodePass& pass) { pass.AnnounceEvents(); }};
 
 }  // namespace standard

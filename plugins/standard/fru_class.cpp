@@ -140,6 +140,7 @@ const ClassEntry kFruClass{
              .exporter = nullptr,
              .properties = kProperties,
              .propertyCount = std::size(kProperties)},
-    .write = WriteDevices};
+    .write = WriteDevices,
+    .announce = [](NodePass& pass) { pass.AnnounceInventory(); }};
 
 }  // namespace standard

@@ -16,6 +16,18 @@ NodePass::NodePass(unsigned number, std::string systemName, NQORTQR20::SPLibrary
       rules_(rules),
       smbios_(std::move(smbios)) {}
 
+void NodePass::AnnounceEvents() {
+    AnnounceInventory();
+    node_.controller().Announce(
+        std::to_array({ipmi::GetPefConfigurationParameters(ipmi::kPefEventFilterCount)}));
+}
+
+void NodePass::AnnounceInventory() {
+    // The repository is in the host's memory then.
+    if (!node_.controller().TakesAnnouncements()) return;
+    node_.controller().Announce(FruAreaCommands(node_.Repository()));
+}
+
 const std::vector<FruDevice>& NodePass::FruDevices() {
     if (!fruDevices_) {
         fruDevices_ = ReadFruDevices(node_.controller(), node_.Repository(), OwnFruDevice());
@@ -56,11 +68,6 @@ const Events& NodePass::GetEvents() {
     facts_.number = node_.number();
     facts_.systemName = systemName_;
     facts_.log = node_.ReadLog();
-    if (!facts_.log.empty()) {
-        node_.controller().Announce(
-            std::to_array({ipmi::GetPefConfigurationParameters(ipmi::kPefEventFilterCount)}));
-    }
-    if (!fruDevices_) node_.controller().Announce(FruAreaCommands(node_.Repository()));
     facts_.guid = node_.Guid();
     const Clock& clock = node_.GetClock();
     facts_.utcOffsetMinutes = clock.utcOffsetMinutes;

@@ -25,6 +25,10 @@ public:
     NodePass(const NodePass&) = delete;
     NodePass& operator=(const NodePass&) = delete;
 
+    /// Events() and what is derived from it will be wanted.
+    void AnnounceEvents();
+    /// FruDevices() will be wanted.
+    void AnnounceInventory();
     Node& node() { return node_; }
     const SmbiosFacts& Smbios() const { return smbios_; }
     const std::vector<FruDevice>& FruDevices();

@@ -64,9 +64,15 @@ TTQRStatusCode Collect(TCPluginCallbacks* context, Output output,
     SeverityRules rules;
     if (!ReadRules(context, &rules)) return {kStatusFailed};
     const std::vector<std::unique_ptr<NodePass>> nodes = Nodes(context, rules);
+    std::vector<const ClassEntry*> entries;
     for (const std::string_view name : classNames) {
-        const ClassEntry* const entry = FindClass(name);
-        if (entry == nullptr) continue;
+        if (const ClassEntry* const entry = FindClass(name)) entries.push_back(entry);
+    }
+    for (const ClassEntry* const entry : entries) {
+        if (entry->announce == nullptr) continue;
+        for (const std::unique_ptr<NodePass>& node : nodes) entry->announce(*node);
+    }
+    for (const ClassEntry* const entry : entries) {
         for (const std::unique_ptr<NodePass>& node : nodes) entry->write(*node, output);
     }
     return {output.failed() ? kStatusFailed : kStatusOk};

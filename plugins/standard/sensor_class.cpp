@@ -225,7 +225,8 @@ const ClassEntry kSensorClass{
     {kName, "sensors of the repository, their readings, limits and states",
      NQORTQR20::kByDefault | NQORTQR20::kReadsSensors, "Node", nullptr, kProperties,
      std::size(kProperties)},
-    Write};
+    Write,
+    [](NodePass& pass) { pass.AnnounceInventory(); }};
 
 std::vector<std::string> StateTexts(const ipmi::Sensor& sensor,
                                     const ipmi::SensorReading& reading) {

@@ -201,7 +201,7 @@ ForkServer::~ForkServer() {
     }
 }
 
-pid_t ForkServer::Start(const std::string& name, const std::array<int, 4>& descriptors) {
+void ForkServer::Ask(const std::string& name, const std::array<int, 4>& descriptors) {
     std::string shown = name.empty() ? "?" : name.substr(0, kMaxName);
     Datagram request(shown);
     cmsghdr* const rights = CMSG_FIRSTHDR(&request.header);
@@ -210,6 +210,9 @@ pid_t ForkServer::Start(const std::string& name, const std::array<int, 4>& descr
     rights->cmsg_len = CMSG_LEN(sizeof descriptors);
     std::memcpy(CMSG_DATA(rights), descriptors.data(), sizeof descriptors);
     if (sendmsg(socket_.get(), &request.header, MSG_NOSIGNAL) < 0) Fail(errno);
+}
+
+pid_t ForkServer::Answer() {
     std::int32_t answer = 0;
     ssize_t length = 0;
     while ((length = recv(socket_.get(), &answer, sizeof answer, 0)) < 0 && errno == EINTR) {

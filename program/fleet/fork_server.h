@@ -3,6 +3,7 @@
 #include <sys/types.h>
 
 #include <array>
+#include <cstddef>
 #include <functional>
 #include <string>
 
@@ -25,8 +26,14 @@ public:
     ForkServer(const ForkServer&) = delete;
     ForkServer& operator=(const ForkServer&) = delete;
 
-    /// Starts a worker in a process group of its own, with these as its descriptors 0 to 3.
-    pid_t Start(const std::string& name, const std::array<int, 4>& descriptors);
+    /// Asks for a worker in a process group of its own, with these as its descriptors 0 to 3, and
+    /// does not wait for it: several are started as fast as the server can.
+    void Ask(const std::string& name, const std::array<int, 4>& descriptors);
+    /// The process of the first of those asked for that has not been answered; waits for it.
+    pid_t Answer();
+
+    /// More than that are not to be asked for before an answer is taken.
+    static constexpr std::size_t kMaxAsked = 32;
 
 private:
     FileDescriptor socket_;

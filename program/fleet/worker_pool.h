@@ -42,23 +42,27 @@ public:
 
     bool HasRoom() const { return workers_.size() < jobs_; }
     std::size_t Running() const { return workers_.size(); }
-    /// Starts one, and kills it when it still runs at `limit`.
+    /// Starts one, and kills it when it still runs at `limit`. That it could not be started may
+    /// show in the next operation.
     void Start(std::size_t id, const std::string& name, const std::string& request,
                Clock::time_point limit);
     /// Those that have ended; waits for one until then, or until a signal comes.
     std::vector<WorkerEnd> Wait(Clock::time_point until);
     /// Asks all of them to end in good order.
-    void Stop() const;
+    void Stop();
 
 private:
     struct Worker;
 
     WorkerEnd End(Worker& worker);
+    /// Learns the processes of workers that were asked for, until as many are left to learn.
+    void TakeStarted(std::size_t most);
 
     ForkServer& server_;
     std::size_t jobs_;
     std::function<void(std::string_view)> log_;
     std::vector<std::unique_ptr<Worker>> workers_;
+    std::size_t starting_ = 0;  ///< the last so many of them have no process yet
 };
 
 }  // namespace ipmisel
