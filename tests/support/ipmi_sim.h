@@ -52,6 +52,9 @@ class IpmiSim {
 public:
     /// Why it cannot be run here; empty when it can.
     static std::string Missing() {
+#ifndef IPMISEL_LAN
+        return "built without access over the network";
+#endif
         return std::system("command -v ipmi_sim >/dev/null") == 0
                    ? ""
                    : "ipmi_sim is not installed (package openipmi)";

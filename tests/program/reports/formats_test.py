@@ -49,7 +49,8 @@ def validator(schema, store):
 
     resolver = Resolver(schema.get("$id", ""), schema, store=store,
                         handlers={"http": lambda uri: {}, "": lambda uri: store[uri]})
-    return jsonschema.validators.validator_for(schema)(schema, resolver=resolver)
+    return jsonschema.validators.validator_for(schema)(schema, resolver=resolver,
+                                                       format_checker=jsonschema.FormatChecker())
 
 
 def our_schema(name):
@@ -95,6 +96,22 @@ class Examples(unittest.TestCase):
             self.assertIn("summary", lines[-1])
             for each in lines:
                 events.validate(each)
+
+    def test_instances_are_as_the_plug_ins_declare_their_classes(self):
+        printed = run("classes", "--schema")
+        self.assertEqual(printed, (TREE / "docs/schema/classes.json").read_text(),
+                         "make it anew: ipmisel classes --schema")
+        classes = json.loads(printed)["$defs"]
+        # Readers take properties that they do not know; the plug-ins declare all that they write.
+        for definition in classes.values():
+            definition["properties"]["properties"]["additionalProperties"] = False
+        validators = {name: validator(definition, {}) for name, definition in classes.items()}
+        every = [word for name in classes for word in ("--class", name)]
+        for example in EXAMPLES:
+            report = json.loads(run("collect", "--from", f"sim:examples/{example}.json", "--format", "json", *every))
+            for instance in report["instances"]:
+                with self.subTest(example=example, instance=instance):
+                    validators[instance["class"]].validate(instance)
 
     def test_csv_has_what_events_has(self):
         for example, text in self.each("csv"):
