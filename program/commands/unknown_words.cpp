@@ -64,9 +64,10 @@ void RefuseUnknownCommand(const std::vector<Command>& commands, const CLI::App& 
         if (program.get_option_no_throw(option) != nullptr) return;
         for (const Command& command : commands) {
             if (command.arguments->get_option_no_throw(option) == nullptr) continue;
-            throw Failure(kExitUsage, option + " belongs behind a command, such as ipmisel " +
-                                          command.arguments->get_name() + " " + option +
-                                          "; see ipmisel --help");
+            std::string line = option;
+            line.append(" belongs behind a command, such as ipmisel ");
+            line.append(command.arguments->get_name()).append(" ").append(option);
+            throw Failure(kExitUsage, line + "; see ipmisel --help");
         }
         throw Failure(kExitUsage, "there is no option \"" + option + "\"; " +
                                       DidYouMean(program, option) + "see ipmisel --help");
