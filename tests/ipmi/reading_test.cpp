@@ -106,16 +106,16 @@ TEST(Reading, ANonLinearSensorIsConvertedByTheFactorsAskedFor) {
 }
 
 TEST(Reading, FactorsAreSignedAndSplitOverTheirBytes) {
-    // M = -2 (3FEh), tolerance 21; B = 341 (155h), accuracy 2B5h = 693 with exponent 2; K2 -3,
+    // M = -2 (3FEh), tolerance 21; B = 341 (155h), accuracy 2B5h = 693 with exponent 3; K2 -3,
     // K1 5.
-    const std::vector<std::uint8_t> bytes{0xFE, 0xD5, 0x55, 0x75, 0xA8, 0xD5};
+    const std::vector<std::uint8_t> bytes{0xFE, 0xD5, 0x55, 0x75, 0xAC, 0xD5};
     EXPECT_EQ(ReadingFactors::Parse(bytes), (ReadingFactors{.m = -2,
                                                             .b = 341,
                                                             .bExponent = 5,
                                                             .resultExponent = -3,
                                                             .toleranceHalfCounts = 21,
                                                             .accuracy = 693,
-                                                            .accuracyExponent = 2}));
+                                                            .accuracyExponent = 3}));
     EXPECT_EQ(ReadingFactors::Parse(std::span(bytes).first(5)), std::nullopt);
 }
 

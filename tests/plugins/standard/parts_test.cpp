@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include <set>
 #include <string>
 
 #include "plugins/standard/event.h"
@@ -300,6 +301,21 @@ TEST_F(PartsTest, ACardTakenOutOfABoardsSlotLeavesTheBoardItsNumbers) {
         Event(0x02, 1, 0x07, 0x02);
         Event(type, static_cast<std::uint8_t>(sensor), 0xEF, type == kSlotSensor ? 0x02 : 0x00);
         EXPECT_EQ(OfEvent().parts[0].serialNumber, gone ? "" : "BS01") << sensor;
+    }
+}
+
+TEST_F(PartsTest, WhatIsTakenOutIsTheEntityWhereThatIsExchangedAsAWhole) {
+    const std::set<unsigned> exchanged{3,    4,    5,    8,    9,    0x0A, 0x0B, 0x14, 0x1A, 0x1B,
+                                       0x1C, 0x1D, 0x20, 0x28, 0x29, 0x2A, 0x2B, 0x2C, 0x2D};
+    for (std::uint8_t entity = 1; entity < 0x43; ++entity) {
+        facts.devices = {Device("", {entity, 1}, WholeFruImage().Bytes())};
+        Sensors({SensorRecord(1, entity, 1, 0x02), SensorRecord(2, entity, 1, kSupplySensor)});
+        node.log.clear();
+        Event(0x02, 1, 0x07, 0x02);
+        Event(kSupplySensor, 2, 0xEF, 0x00);
+        const auto parts = OfEvent().parts;
+        if (parts.empty()) continue;  // no thing
+        EXPECT_EQ(parts[0].serialNumber.empty(), exchanged.contains(entity)) << int{entity};
     }
 }
 
