@@ -9,15 +9,14 @@ import contextlib
 import json
 import multiprocessing
 import os
-import pathlib
 import struct
 import subprocess
 import sys
 import tempfile
 import unittest
 
-PROGRAM = pathlib.Path(sys.argv[1]).resolve()
-SOURCE = pathlib.Path(sys.argv[2]).resolve()
+from side_by_side import PROGRAM, SOURCE, skip
+
 sys.path.insert(0, str(SOURCE / "bench"))
 import make_log  # noqa: E402
 from lan_peers import free_udp_port, wait_for_bmc  # noqa: E402
@@ -114,6 +113,5 @@ if __name__ == "__main__":
     try:
         import pyghmi  # noqa: F401
     except ImportError:
-        print("SKIPPED: no pyghmi (package python3-pyghmi)")
-        sys.exit(77)
+        skip("no pyghmi (package python3-pyghmi)")
     unittest.main(argv=sys.argv[:1], verbosity=2)
