@@ -23,8 +23,7 @@ void NodePass::AnnounceEvents() {
 }
 
 void NodePass::AnnounceInventory() {
-    // The repository is in the host's memory then.
-    if (!node_.controller().TakesAnnouncements()) return;
+    // Also where it makes no difference: a replay is asked in the order of the recording.
     node_.controller().Announce(FruAreaCommands(node_.Repository()));
 }
 
