@@ -3,6 +3,7 @@
 #include <poll.h>
 
 #include <algorithm>
+#include <exception>
 #include <utility>
 
 #include "host/spdriver/stop.h"
@@ -38,8 +39,12 @@ LanSession::LanSession(std::string name, LanSessionOptions options)
 LanSession::~LanSession() {
     // One packet, unanswered: a BMC that misses it drops the session by itself after a minute.
     if (codec_ && !dead_) {
-        const rmcpplus::Packet close = codec_->CloseRequest(requests_.NextSequence(), 0);
-        socket_->Send({&close, 1});
+        try {
+            const rmcpplus::Packet close = codec_->CloseRequest(requests_.NextSequence(), 0);
+            socket_->Send({&close, 1});
+        } catch (const std::exception&) {
+            // No memory for the packet: as good as lost.
+        }
     }
     std::string& password = options_.credentials.password;
     Wipe({reinterpret_cast<std::uint8_t*>(password.data()), password.size()});
