@@ -68,8 +68,6 @@ void Announce(NodePass& pass) {
 void Write(NodePass& pass, Output& output) {
     Node& node = pass.node();
     if (!output.Begin(kName)) return;
-    // First, while the controller has nothing else to answer.
-    const Clock& clock = node.GetClock();
     output.Integer("Node", node.number());
     const auto& system = pass.Smbios().system;
     const GuidReading guid = ReadGuid(node.Guid(), system ? system->uuid : std::nullopt);
@@ -95,6 +93,7 @@ void Write(NodePass& pass, Output& output) {
         output.Texts("Capabilities", Strings(ipmi::CapabilityNames(*id)));
     }
     output.Text("SelfTest", node.SelfTest().value_or(""));
+    const Clock& clock = node.GetClock();
     output.Time("Time", clock.time);
     output.Real("ClockOffsetSeconds", clock.offsetSeconds);
     output.Real("ClockUncertaintySeconds", clock.uncertaintySeconds);

@@ -210,11 +210,11 @@ SensorState Node::ReadState(const ipmi::Sensor& sensor) {
 Clock Node::ReadClock() {
     constexpr double kSecond = 1e6;  // microseconds
     Clock clock;
+    clock.utcOffsetMinutes =
+        Query(controller_, ipmi::GetSelTimeUtcOffset(), ipmi::ParseSelTimeUtcOffset);
     const std::int64_t before = NQORTQR20::TOSSpecific::GetLocalTime().TotalMicroseconds();
     const auto seconds = Query(controller_, ipmi::GetSelTime(), ipmi::ParseSelTime);
     const std::int64_t after = NQORTQR20::TOSSpecific::GetLocalTime().TotalMicroseconds();
-    clock.utcOffsetMinutes =
-        Query(controller_, ipmi::GetSelTimeUtcOffset(), ipmi::ParseSelTimeUtcOffset);
     if (!seconds || ipmi::KindOfTime(*seconds) != ipmi::TimeKind::kClock) return clock;
     clock.time = std::int64_t{*seconds} - std::int64_t{60} * clock.utcOffsetMinutes.value_or(0);
     // Halfway through the exchange. The controller's second has begun, half a second ago as likely

@@ -67,8 +67,8 @@ const Events& NodePass::GetEvents() {
     facts_.number = node_.number();
     facts_.systemName = systemName_;
     facts_.log = node_.ReadLog();
-    const Clock& clock = node_.GetClock();
     facts_.guid = node_.Guid();
+    const Clock& clock = node_.GetClock();
     facts_.utcOffsetMinutes = clock.utcOffsetMinutes;
     if (clock.offsetSeconds && clock.uncertaintySeconds) {
         facts_.clock = {.offset = *clock.offsetSeconds, .uncertainty = *clock.uncertaintySeconds};
