@@ -1,6 +1,4 @@
 """The rack server, simulated, behind a port, as a BMC of OpenIPMI, and captured: equal instances.
-
-usage: equal_instances_test.py PROGRAM SOURCE_FOLDER  (exit status 77: a facility is missing)
 """
 import json
 import os

@@ -1,7 +1,5 @@
 """The formats for programs, taken by the programs that they are for; the page, by a browser.
 
-usage: peers_formats_test.py PROGRAM TREE
-
 jq, sqlite3, promtool, a node exporter, rsyslog and the journal are run on loopback or on files of their
 own. What is not installed is skipped, and said.
 """

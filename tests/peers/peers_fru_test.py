@@ -1,7 +1,5 @@
 """FRU devices of one BMC, read by ipmisel, ipmitool and ipmi-fru: every field of every area.
 
-usage: peers_fru_test.py PROGRAM SOURCE_FOLDER        (exit status 77: a facility is missing)
-
 With IPMISEL_REAL_MACHINES the inventories of real machines are compared as well.
 """
 import datetime

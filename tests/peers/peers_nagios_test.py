@@ -1,6 +1,4 @@
 """`ipmisel check` as the service check of a real Nagios: state, text and performance data.
-
-usage: peers_nagios_test.py PROGRAM SOURCE_FOLDER        (exit status 77: a facility is missing)
 """
 import os
 import pathlib

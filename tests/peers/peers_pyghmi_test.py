@@ -1,7 +1,5 @@
 """A session with another's BMC side of RMCP+: the server of python3-pyghmi, cipher suite 3.
 
-usage: peers_pyghmi_test.py PROGRAM SOURCE_FOLDER     (exit status 77: a facility is missing)
-
 Session and packets are pyghmi's own; this file hands out the records. The report must be that of a
 simulated server with the same records.
 """

@@ -1,7 +1,5 @@
 """One repository, read by ipmisel, ipmitool and ipmi-sensors: names, units, readings, thresholds.
 
-usage: peers_sensors_test.py PROGRAM SOURCE_FOLDER    (exit status 77: a facility is missing)
-
 With IPMISEL_REAL_MACHINES the repositories of real machines are compared as well.
 """
 import csv

@@ -1,6 +1,4 @@
 """The files of examples/fleet with a real Slurm (a controller, two nodes on this machine, munge) and a real PostgreSQL.
-
-usage: peers_slurm_test.py PROGRAM SOURCE_FOLDER        (exit status 77: a facility is missing)
 """
 import json
 import os

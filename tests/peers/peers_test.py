@@ -1,7 +1,5 @@
 """One log, read by ipmisel, ipmitool and ipmi-sel: every standard sensor and event type and offset.
 
-usage: peers_test.py PROGRAM SOURCE_FOLDER            (exit status 77: a facility is missing)
-
 docs/event-phrases.tsv pairs what each says of an event; a difference has its reason there.
 """
 import csv

@@ -1,8 +1,6 @@
 """What an event says, beside ipmitool and ipmi-sel: every type, offset and direction, every meaning of
 event data 2 and 3, and the events and sensors of real machines. Neither may say more than we do.
 
-usage: peers_words_test.py PROGRAM SOURCE_FOLDER        (exit status 77: a facility is missing)
-
 With IPMISEL_REAL_MACHINES the logs and repositories of real machines are compared as well. docs/classes.md
 ("What others say") has the differences that are meant.
 """

@@ -1,6 +1,6 @@
 """What the tests of this folder share: one BMC read by ipmisel, ipmitool and a program of FreeIPMI, and waiting.
 
-The first argument is the program, the second the folder of the sources.
+usage of each: TEST.py PROGRAM SOURCE_FOLDER        (exit status 77: a facility is missing)
 """
 import json
 import os
