@@ -185,8 +185,6 @@ bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSi
     return true;
 }
 
-bool SPLibrary::takesAnnouncements() const { return impl_->announce != nullptr; }
-
 void SPLibrary::announceIPMICommand(const unsigned char* buffer, int bufferSize) {
     if (buffer == nullptr || bufferSize <= 0 || !impl_->announce) return;
     const auto request = RequestFrame::FromBuffer({buffer, static_cast<std::size_t>(bufferSize)});

@@ -75,8 +75,6 @@ public:
     /// BMC is the same. Only for requests that change nothing and that are sent unless the BMC
     /// fails. Since 1.1.
     void announceIPMICommand(const unsigned char* buffer, int bufferSize);
-    /// Whether it makes a difference to say so; not where the answers are at hand. Since 1.1.
-    bool takesAnnouncements() const;
 
 private:
     friend struct HostAccess;  // the host's own

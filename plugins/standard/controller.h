@@ -22,7 +22,6 @@ struct Answer {
 class Controller {
 public:
     explicit Controller(NQORTQR20::SPLibrary& library) : library_(library) {}
-    bool TakesAnnouncements() const { return library_.takesAnnouncements(); }
     /// Says what will be sent soon, so that the host may ask for all of it at once.
     void Announce(std::span<const ipmi::Command> commands);
     /// Empty when nothing came. An answer is cut at what a message can hold.
