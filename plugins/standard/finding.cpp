@@ -414,7 +414,7 @@ std::vector<Finding> DeriveFindings(const NodeFacts& node, const Events& events,
     }
 
     std::vector<Finding> findings;
-    std::map<unsigned, std::size_t> openSlots;  // findings of expansion slots, by their number
+    std::map<unsigned, std::size_t> openSlots;       // findings of expansion slots, by their number
     std::map<ipmi::SensorKey, std::size_t> worstOf;  // of a sensor that has open events
     for (auto& [name, indices] : groups) {
         const LoggedEvent& first = logged[indices.front()];

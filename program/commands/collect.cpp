@@ -212,6 +212,7 @@ private:
 std::vector<std::string> NamesOf(const std::vector<std::string>& unopened,
                                  const CollectOptions& options) {
     std::vector<std::string> names;
+    names.reserve(unopened.size());
     for (const std::string& source : unopened) names.push_back(NameOf(source, options));
     return names;
 }

@@ -27,8 +27,8 @@ private:
 
     CollectOptions common_;
     std::map<std::string, std::size_t> timesNamed_;  ///< by host
-    std::map<std::string, std::string> passwords_;  ///< by file
-    std::optional<std::string> password_;           ///< of those without one of their own
+    std::map<std::string, std::string> passwords_;   ///< by file
+    std::optional<std::string> password_;            ///< of those without one of their own
 };
 
 }  // namespace ipmisel

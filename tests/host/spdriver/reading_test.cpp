@@ -240,8 +240,8 @@ TEST_F(Reading, ARepositoryThatChangesWhileItIsReadIsTold) {
 TEST_F(Reading, AChangedLogIsReadOnceMore) {
     struct Change {
         const char* what;
-        std::vector<int> log;  ///< sensor numbers of the events after the change
-        bool renumbered;       ///< their IDs begin anew
+        std::vector<int> log;   ///< sensor numbers of the events after the change
+        bool renumbered;        ///< their IDs begin anew
         std::uint8_t time = 1;  ///< the last byte of the time stamps, B0h before
     };
     const Change changes[] = {{"one added", {1, 2, 3, 4, 5, 6}, false},
