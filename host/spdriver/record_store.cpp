@@ -20,7 +20,7 @@ bool RecordStore::Add(std::uint16_t id, std::uint16_t next, std::span<const std:
     if (used_ % kBlock + bytes.size() > kBlock) used_ += kBlock - used_ % kBlock;
     if (used_ + bytes.size() > kMaxBytes) return false;
     if (used_ / kBlock >= blocks_.size())
-        blocks_.push_back(std::make_unique<std::uint8_t[]>(kBlock));
+        blocks_.push_back(std::make_unique_for_overwrite<std::uint8_t[]>(kBlock));
     std::copy(bytes.begin(), bytes.end(), blocks_[used_ / kBlock].get() + used_ % kBlock);
     entries_.push_back(
         {static_cast<std::uint32_t>(used_), static_cast<std::uint16_t>(bytes.size()), next});

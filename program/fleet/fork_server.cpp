@@ -1,9 +1,9 @@
 #include "program/fleet/fork_server.h"
 
 #include <fcntl.h>
-#include <sys/mman.h>
-#include <sys/prctl.h>
+#include <sched.h>
 #include <sys/socket.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -23,9 +23,7 @@
 #include "program/commands/failure.h"
 
 // A request is a datagram with the worker's name and its descriptors (SCM_RIGHTS), the answer one
-// with the number of its process, or an error number below zero. The server makes a child that
-// makes the worker and ends: the worker is then a child of the nearest subreaper, which is whoever
-// made the server.
+// with the number of its process, or an error number below zero.
 
 namespace ipmisel {
 namespace {
@@ -125,27 +123,17 @@ private:
 }
 
 /// The number of the new worker's process, or an error number below zero.
-std::int32_t MakeWorker(const Work& work, const std::string& name, const Descriptors& descriptors,
-                        volatile std::int32_t* shared) {
-    *shared = -EAGAIN;
-    const pid_t child = fork();
-    if (child < 0) return -errno;
-    if (child == 0) {
-        const pid_t worker = fork();
-        if (worker == 0) BeWorker(work, name, descriptors);
-        *shared = worker < 0 ? -errno : static_cast<std::int32_t>(worker);
-        _exit(0);
-    }
-    while (waitpid(child, nullptr, 0) < 0 && errno == EINTR) {
-    }
-    return *shared;
+std::int32_t MakeWorker(const Work& work, const std::string& name, const Descriptors& descriptors) {
+    // As fork(), but the worker is a child of whoever made the server (clone(2), CLONE_PARENT). The
+    // server has one thread, and nothing here wants what fork() does for libraries.
+    const long worker =
+        syscall(SYS_clone, CLONE_PARENT | SIGCHLD, nullptr, nullptr, nullptr, nullptr);
+    if (worker == 0) BeWorker(work, name, descriptors);
+    return static_cast<std::int32_t>(worker < 0 ? -errno : worker);
 }
 
 /// Until the other end is closed.
 void Serve(const FileDescriptor& socket, const Title& title, const Work& work) {
-    void* const page = mmap(nullptr, sizeof(std::int32_t), PROT_READ | PROT_WRITE,
-                            MAP_SHARED | MAP_ANONYMOUS, -1, 0);
-    if (page == MAP_FAILED) return;
     const Work titled = [&](const std::string& name) {
         title.Set("ipmisel worker " + name);
         return work(name);
@@ -162,7 +150,7 @@ void Serve(const FileDescriptor& socket, const Title& title, const Work& work) {
             Descriptors descriptors;
             std::memcpy(descriptors.data(), CMSG_DATA(rights), sizeof descriptors);
             answer = MakeWorker(titled, std::string(name.data(), static_cast<std::size_t>(length)),
-                                descriptors, static_cast<volatile std::int32_t*>(page));
+                                descriptors);
             for (const int descriptor : descriptors) close(descriptor);
         }
         if (send(socket.get(), &answer, sizeof answer, MSG_NOSIGNAL) < 0) return;
@@ -176,7 +164,6 @@ ForkServer::ForkServer(const std::function<void()>& prepare, const Work& work) {
     if (socketpair(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC, 0, ends) != 0) Fail(errno);
     socket_ = FileDescriptor(ends[0]);
     FileDescriptor other(ends[1]);
-    if (prctl(PR_SET_CHILD_SUBREAPER, 1) != 0) Fail(errno);
     std::fflush(nullptr);  // what waits in a buffer is not to be written twice
     process_ = fork();
     if (process_ < 0) Fail(errno);
