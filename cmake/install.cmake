@@ -2,7 +2,8 @@
 # place, so that the whole may go under any prefix and be moved afterwards.
 install(TARGETS ipmisel RUNTIME DESTINATION bin)
 if(TARGET ipmisel-simulator)
-  install(TARGETS ipmisel-simulator RUNTIME DESTINATION bin)
+  # Where it was built: tools/demo builds what collects alone.
+  install(TARGETS ipmisel-simulator RUNTIME DESTINATION bin OPTIONAL)
 endif()
 install(TARGETS tqrcore spdriver smbios ipmisel_plugin ipmistandard_plugin
         LIBRARY DESTINATION lib/ipmisel)
