@@ -1,6 +1,7 @@
 #include "host/spdriver/command_predictor.h"
 
 #include <algorithm>
+#include <span>
 
 #include "base/bytes.h"
 #include "ipmi/sdr_record.h"
@@ -77,8 +78,8 @@ void CommandPredictor::RequestedOfFru(const ipmi::Command& command) {
     const FruPlace place{command.data[0], command.lun};
     const std::uint8_t chunk = command.data[3];
     std::erase(fruToCome_, place);
-    const auto known = fruSizes_.find(place);
-    if (OffsetOf(command) != 0 || known == fruSizes_.end()) return;
+    const auto known = fruAreas_.find(place);
+    if (OffsetOf(command) != 0 || known == fruAreas_.end()) return;
     // Asked for less the second time: the controller does not give so much.
     if (std::exchange(fruBegun_, place) == place && chunk < fruChunk_) {
         fruChunk_ = 0;
@@ -90,12 +91,11 @@ void CommandPredictor::RequestedOfFru(const ipmi::Command& command) {
 void CommandPredictor::Answered(const ipmi::Command& command, const Response& response) {
     if (command.code() != ipmi::kGetFruInventoryAreaInfo || command.data.size() != 1) return;
     const FruPlace place{command.data[0], command.lun};
-    ipmisel::ByteReader in(response);
-    const bool completed = in.U8() == ipmi::kCompleted;
-    FruSize size{.size = in.U16(), .byWords = (in.U8() & 0x01) != 0};
-    if (size.byWords) size.size /= 2;
-    if (completed && in.ok()) {
-        fruSizes_[place] = size;
+    const bool completed = !response.empty() && response.front() == ipmi::kCompleted;
+    const auto area = completed ? ipmi::ParseFruAreaInfo(std::span(response).subspan(1))
+                                : std::optional<ipmi::FruAreaInfo>();
+    if (area) {
+        fruAreas_[place] = *area;
     } else {
         std::erase(fruToCome_, place);
     }
@@ -126,8 +126,8 @@ void CommandPredictor::AddFruToCome(const Add& add) const {
     if (fruChunk_ == 0) return;
     for (const FruPlace& next : fruToCome_) {
         // How a device by words is read shows when it is.
-        const auto known = fruSizes_.find(next);
-        if (known == fruSizes_.end() || known->second.byWords) continue;
+        const auto known = fruAreas_.find(next);
+        if (known == fruAreas_.end() || known->second.byWords) continue;
         if (!AddFruChunksFrom(0, fruChunk_, next, add)) return;
     }
 }
@@ -135,11 +135,15 @@ void CommandPredictor::AddFruToCome(const Add& add) const {
 /// The chunks of a device from an offset on, as many as are wanted; false when no more are.
 bool CommandPredictor::AddFruChunksFrom(std::size_t offset, std::uint8_t chunk, FruPlace place,
                                         const Add& add) const {
-    const auto known = fruSizes_.find(place);
-    const std::size_t size = known != fruSizes_.end() ? known->second.size : kUnknownFruSize;
+    const auto known = fruAreas_.find(place);
+    std::size_t size = kUnknownFruSize;
+    if (known != fruAreas_.end()) {
+        // Offsets and counts are in words then, too.
+        size = known->second.byWords ? known->second.size / 2 : known->second.size;
+    }
     for (; offset < size; offset += chunk) {
         // A reader that knows the size asks for no more than is left.
-        const std::size_t rest = known != fruSizes_.end() ? size - offset : chunk;
+        const std::size_t rest = known != fruAreas_.end() ? size - offset : chunk;
         ipmi::Command next =
             ipmi::ReadFruData(place.device, static_cast<std::uint16_t>(offset),
                               static_cast<std::uint8_t>(std::min<std::size_t>(rest, chunk)));

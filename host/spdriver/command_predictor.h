@@ -11,6 +11,7 @@
 #include "host/spdriver/record_store.h"
 #include "host/spdriver/transport.h"
 #include "ipmi/command.h"
+#include "ipmi/fru_device_reader.h"
 
 namespace tqrhost {
 
@@ -51,10 +52,6 @@ private:
         std::uint8_t lun = 0;
         auto operator<=>(const FruPlace&) const = default;
     };
-    struct FruSize {
-        std::size_t size = 0;  ///< in the unit of offsets and counts
-        bool byWords = false;
-    };
 
     void RequestedOfFru(const ipmi::Command& command);
     void AddFruChunks(const Add& add) const;
@@ -68,7 +65,7 @@ private:
     std::vector<Sensor> sensors_;  ///< of the controller itself, in repository order
     std::map<std::pair<std::uint8_t, std::uint8_t>, std::size_t> positions_;  ///< by LUN and number
     std::optional<ipmi::Command> now_;
-    std::map<FruPlace, FruSize> fruSizes_;
+    std::map<FruPlace, ipmi::FruAreaInfo> fruAreas_;
     std::vector<FruPlace> fruToCome_;  ///< announced, and nothing of it read
     std::optional<FruPlace> fruBegun_;
     std::uint8_t fruChunk_ = 0;          ///< that a device is begun with; 0 when that is not known

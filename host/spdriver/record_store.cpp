@@ -10,7 +10,6 @@ namespace {
 
 constexpr std::size_t kBlock = std::size_t{1} << 16;
 constexpr std::size_t kMaxRecord = ipmi::kMaxSdrLength;  // an event is shorter
-constexpr std::size_t kIds = 0x10000;
 
 }  // namespace
 

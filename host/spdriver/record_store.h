@@ -44,9 +44,10 @@ private:
     std::size_t used_ = 0;  ///< of all blocks, gaps at their ends included
     std::vector<Entry> entries_;
     /// By ID: position plus 1; 0 for none. In pages, as most stores use few IDs.
+    static constexpr std::size_t kIds = 0x10000;
     static constexpr std::size_t kPage = 256;
     using Page = std::array<std::uint32_t, kPage>;
-    std::array<std::unique_ptr<Page>, 0x10000 / kPage> index_;
+    std::array<std::unique_ptr<Page>, kIds / kPage> index_;
 };
 
 }  // namespace tqrhost

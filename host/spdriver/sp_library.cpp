@@ -187,8 +187,13 @@ bool SPLibrary::sendIPMICommand(unsigned char* buffer, int* length, int bufferSi
 
 void SPLibrary::announceIPMICommand(const unsigned char* buffer, int bufferSize) {
     if (buffer == nullptr || bufferSize <= 0 || !impl_->announce) return;
-    const auto request = RequestFrame::FromBuffer({buffer, static_cast<std::size_t>(bufferSize)});
-    if (request) impl_->announce(request->ToCommand());
+    try {
+        const auto request =
+            RequestFrame::FromBuffer({buffer, static_cast<std::size_t>(bufferSize)});
+        if (request) impl_->announce(request->ToCommand());
+    } catch (const std::exception&) {
+        // Callers know no exceptions; it is asked when it is wanted.
+    }
 }
 
 }  // namespace NQORTQR20
