@@ -188,7 +188,7 @@ ForkServer::~ForkServer() {
     }
 }
 
-void ForkServer::Ask(const std::string& name, const std::array<int, 4>& descriptors) {
+void ForkServer::RequestWorker(const std::string& name, const std::array<int, 4>& descriptors) {
     std::string shown = name.empty() ? "?" : name.substr(0, kMaxName);
     Datagram request(shown);
     cmsghdr* const rights = CMSG_FIRSTHDR(&request.header);
@@ -199,7 +199,7 @@ void ForkServer::Ask(const std::string& name, const std::array<int, 4>& descript
     if (sendmsg(socket_.get(), &request.header, MSG_NOSIGNAL) < 0) Fail(errno);
 }
 
-pid_t ForkServer::Answer() {
+pid_t ForkServer::AwaitWorker() {
     std::int32_t answer = 0;
     ssize_t length = 0;
     while ((length = recv(socket_.get(), &answer, sizeof answer, 0)) < 0 && errno == EINTR) {

@@ -26,14 +26,14 @@ public:
     ForkServer(const ForkServer&) = delete;
     ForkServer& operator=(const ForkServer&) = delete;
 
-    /// Asks for a worker in a process group of its own, with these as its descriptors 0 to 3, and
+    /// Requests a worker in a process group of its own, with these as its descriptors 0 to 3, and
     /// does not wait for it: several are started as fast as the server can.
-    void Ask(const std::string& name, const std::array<int, 4>& descriptors);
-    /// The process of the first of those asked for that has not been answered; waits for it.
-    pid_t Answer();
+    void RequestWorker(const std::string& name, const std::array<int, 4>& descriptors);
+    /// The process of the worker that was requested first of those not awaited yet.
+    pid_t AwaitWorker();
 
-    /// More than that are not to be asked for before an answer is taken.
-    static constexpr std::size_t kMaxAsked = 32;
+    /// More are not to be requested before one is awaited: answers need room, too.
+    static constexpr std::size_t kMaxRequested = 32;
 
 private:
     FileDescriptor socket_;

@@ -75,8 +75,7 @@ struct WorkerPool::Worker {
     pid_t process = -1;
     Clock::time_point limit{};
     bool killed = false;
-    FileDescriptor requests, result, log, report;
-    std::string request;  ///< until it is handed over
+    FileDescriptor result, log, report;
     std::string message, line;
     std::size_t lines = 0;
 
@@ -125,37 +124,32 @@ void WorkerPool::Start(std::size_t id, const std::string& name, const std::strin
     worker->limit = limit;
     worker->report = NamelessFile();
     static_assert(kWorkerResult == 3);
-    TakeStarted(ForkServer::kMaxAsked - 1);
-    server_.Ask(name, {requests.out.get(), worker->report.get(), logs.in.get(), results.in.get()});
+    TakeStarted(ForkServer::kMaxRequested - 1);
+    server_.RequestWorker(
+        name, {requests.out.get(), worker->report.get(), logs.in.get(), results.in.get()});
     worker->result = std::move(results.out);
     worker->log = std::move(logs.out);
     for (const FileDescriptor* file : {&worker->result, &worker->log}) {
         fcntl(file->get(), F_SETFL, O_NONBLOCK);
     }
-    worker->requests = std::move(requests.in);
-    worker->request = request;
     workers_.push_back(std::move(worker));
     ++starting_;
+    requests.out.Close();
+    // Shorter than what a pipe holds; one that ended already shows as such.
+    if (write(requests.in.get(), request.data(), request.size()) < 0 && errno != EPIPE) {
+        Fail("hand a worker its request", errno);
+    }
 }
 
 void WorkerPool::TakeStarted(std::size_t most) {
     while (starting_ > most) {
         const auto first = workers_.end() - static_cast<std::ptrdiff_t>(starting_--);
-        Worker& worker = **first;
         try {
-            worker.process = server_.Answer();
+            (*first)->process = server_.AwaitWorker();
         } catch (const Failure&) {
             workers_.erase(first);
             throw;
         }
-        // Now it is a child of this process, whose end it has to follow. The request is shorter
-        // than what a pipe holds; one that ended already shows as such.
-        const auto& request = worker.request;
-        if (write(worker.requests.get(), request.data(), request.size()) < 0 && errno != EPIPE) {
-            Fail("hand a worker its request", errno);
-        }
-        worker.requests.Close();
-        worker.request.clear();
     }
 }
 
